@@ -1,0 +1,32 @@
+/**
+ * @file
+ * Service and job control. The work is done by the appliance's small scripts: /usr/kova/service/<name> with the verbs
+ * "status" (exit 0: running) and "reload" (does not wait for the service), and /sbin/stop for jobs.
+ */
+#ifndef KOVA_SERVICE_H
+#define KOVA_SERVICE_H
+
+#pragma GCC visibility push(default)
+#ifdef __cplusplus
+extern "C" {
+#endif
+
+/** Reloads a service ("ddns" ...). @return 0; -1 with 0xD00 (name), 0xBC00 (no such service) or 0x2A00 (the reload failed) */
+int KLIBServiceReload(const char *szService);
+/** @return 1 when a service runs, 0 when not; -1 with 0xD00 */
+int KLIBServiceIsRunning(const char *szService);
+/** Stops a job ("pppoerelay" ...). @return 0, also when it does not run; -1 with 0xD00 or 0x2A00 */
+int KLIBServicectlJobStop(const char *szJob);
+/**
+ * Reads whether a service is configured to run: key "run" ("yes") of /etc/kova/service/<name>.conf.
+ * @param pRun  receives 1 or 0
+ * @return 0; -1 with 0xD00, or 0x900 when the file is missing
+ */
+int KLIBServicecfgRunKeyGet(const char *szService, int *pRun);
+
+#ifdef __cplusplus
+}
+#endif
+#pragma GCC visibility pop
+
+#endif
