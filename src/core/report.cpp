@@ -1,0 +1,153 @@
+#include "core/report.h"
+
+#include "core/guards.h"
+
+#include <cstdarg>
+#include <cstdio>
+#include <cstring>
+#include <kova/core.h>
+
+namespace kova {
+
+namespace {
+
+/** The printf format of a line's beginning, and whether unit or function fills its text. */
+struct beginning {
+    const char *format;
+    bool names_function;
+};
+
+beginning beginning_of(lead begin) {
+    switch (begin) {
+    case lead::unit:
+        return {"%s:%d ", false};
+    case lead::unit_spaced:
+        return {"%s (%d) ", false};
+    case lead::function:
+        return {"%s(%d) ", true};
+    case lead::function_colon:
+        return {"%s(%d): ", true};
+    case lead::none:
+        break;
+    }
+    return {nullptr, false};
+}
+
+#pragma GCC diagnostic push
+#pragma GCC diagnostic ignored "-Wformat-nonliteral"
+/**
+ * The place becomes part of the format, so that a message of any length is logged in one piece. Unit and function names
+ * hold no percent sign.
+ */
+[[gnu::format(printf, 3, 0)]] void log_line(int level, const place &at, const char *format, va_list arguments) {
+    const errno_keeper keep;
+    char whole[1024] = "";
+    const beginning begin = beginning_of(at.begin);
+    if (begin.format != nullptr) {
+        snprintf(whole, sizeof whole, begin.format, begin.names_function ? at.function : at.unit, at.line);
+    }
+    const size_t used = strlen(whole);
+    snprintf(whole + used, sizeof whole - used, "%s", format);
+    keep.restore(); // for %m
+    vsyslog(level, whole, arguments);
+}
+#pragma GCC diagnostic pop
+
+/** Sets the register without losing errno. */
+void set_code(const place &at, uint32_t code) {
+    const errno_keeper keep;
+    KLIBCErrSetEx(code, at.unit, at.line);
+}
+
+} // namespace
+
+#define KOVA_LOG_LINE(level)                                                                                           \
+    va_list arguments;                                                                                                 \
+    va_start(arguments, format);                                                                                       \
+    log_line(level, at, format, arguments);                                                                            \
+    va_end(arguments)
+
+void log_err(const place &at, const char *format, ...) {
+    KOVA_LOG_LINE(LOG_ERR);
+}
+
+void log_warning(const place &at, const char *format, ...) {
+    KOVA_LOG_LINE(LOG_WARNING);
+}
+
+void log_info(const place &at, const char *format, ...) {
+    KOVA_LOG_LINE(LOG_INFO);
+}
+
+void log_debug(const place &at, const char *format, ...) {
+    KOVA_LOG_LINE(LOG_DEBUG);
+}
+
+int fail(const place &at, uint32_t code, int result, const char *format, ...) {
+    KOVA_LOG_LINE(LOG_ERR);
+    set_code(at, code);
+    return result;
+}
+
+int fail_keeping_code(const place &at, int result, const char *format, ...) {
+    KOVA_LOG_LINE(LOG_ERR);
+    return result;
+}
+
+int fail_quietly(const place &at, uint32_t code, int result) {
+    set_code(at, code);
+    return result;
+}
+
+bool refuses(const place &at, bool holds, const char *condition) {
+    if (!holds) {
+        fail(at, NET_ERR_BAD_PARAMETER, 0, "Invaild Argument (%s)=[%d]\n", condition, 0);
+    }
+    return !holds;
+}
+
+namespace {
+
+/** A condition about an argument's name. */
+[[gnu::format(printf, 3, 0)]] bool refuses_named(const place &at, bool holds, const char *condition, const char *name) {
+    if (holds) {
+        return false;
+    }
+    char text[128];
+#pragma GCC diagnostic push
+#pragma GCC diagnostic ignored "-Wformat-nonliteral"
+    snprintf(text, sizeof text, condition, name);
+#pragma GCC diagnostic pop
+    return refuses(at, false, text);
+}
+
+} // namespace
+
+bool refuses_null_text(const place &at, const char *name, const char *text) {
+    return refuses_named(at, text != nullptr, "((void *)0) != %s", name);
+}
+
+bool refuses_text(const place &at, const char *name, const char *text) {
+    return refuses_null_text(at, name, text) || refuses_named(at, *text != '\0', "'\\0' != *%s", name);
+}
+
+bool refuses_null(const place &at, const char *name, const void *pointer) {
+    return refuses_named(at, pointer != nullptr, "NULL != %s", name);
+}
+
+bool refuses_ifname(const place &at, const char *name, const char *text) {
+    return refuses_text(at, name, text) || refuses_named(at, is_interface_name(text), "is_interface_name(%s)", name);
+}
+
+bool is_interface_name(const char *text) {
+    constexpr size_t kLongest = 240; // with any prefix and suffix of ours still one file name
+    for (const char *c = text; *c != '\0'; ++c) {
+        const auto byte = static_cast<unsigned char>(*c);
+        if (byte <= ' ' || byte == 0x7f || byte == '/') {
+            return false;
+        }
+    }
+    return *text != '\0' && strcmp(text, ".") != 0 && strcmp(text, "..") != 0 && strlen(text) <= kLongest;
+}
+
+} // namespace kova
