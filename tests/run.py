@@ -1,0 +1,175 @@
+#!/usr/bin/env python3
+"""Runs the rings of the proof and adds up their results.
+
+usage: ./test [--list] [NAME...]
+
+A NAME is a ring (unit, platform, sanitize, valgrind, lab, gates), a test file (test_jobs, test_abi) or a source
+unit (net_set_ip); without a name everything runs. The last line counts the test cases.
+"""
+import argparse
+import concurrent.futures
+import os
+import pathlib
+import shutil
+import subprocess
+import sys
+import tempfile
+import time
+import xml.etree.ElementTree as xml
+
+ROOT = pathlib.Path(__file__).resolve().parent.parent
+BUILD = ROOT / "build"
+BOX = BUILD / "lab" / "kova-box"
+PYTHON = "/usr/bin/python3"
+UNIT_PROGRAMS = {"unit": "tests/kovanet-unit-tests", "platform": "tests/platform/kova-platform-tests"}
+SLOWEST = 900  # seconds for one step
+
+
+class Step:
+    """One test program in one box (or on the host), whose results come as a JUnit file."""
+
+    def __init__(self, ring, name, command, report, environment=None):
+        self.ring, self.name, self.command, self.report = ring, name, command, report
+        self.environment = {**os.environ, **(environment or {})}
+
+    def run(self):
+        begin = time.monotonic()
+        try:
+            done = subprocess.run(self.command, cwd=ROOT, env=self.environment, stdin=subprocess.DEVNULL,
+                                  stdout=subprocess.PIPE, stderr=subprocess.STDOUT, text=True, errors="replace",
+                                  timeout=SLOWEST)
+            self.output, self.status = done.stdout, done.returncode
+        except subprocess.TimeoutExpired as late:
+            self.output = (late.stdout or b"").decode(errors="replace") + f"\nstill running after {SLOWEST} s\n"
+            self.status = 124
+        self.seconds = time.monotonic() - begin
+        self.count()
+        return self
+
+    def count(self):
+        self.passed = self.failed = self.skipped = 0
+        self.reasons = []
+        try:
+            suites = xml.parse(self.report).getroot()
+        except (OSError, xml.ParseError):
+            self.failed = 1  # died before it could report
+            return
+        for case in suites.iter("testcase"):
+            skip = case.find("skipped")
+            if skip is not None or case.get("result") == "skipped":
+                self.skipped += 1
+                reason = skip.get("message") if skip is not None else ""
+                self.reasons.append(f"{case.get('classname')}.{case.get('name')}: {reason}")
+            elif case.find("failure") is not None or case.find("error") is not None:
+                self.failed += 1
+            elif case.get("status") != "notrun":
+                self.passed += 1
+        if self.status != 0 and self.failed == 0:
+            self.failed = 1  # a leak report, a crash after the last test
+        if self.passed + self.failed + self.skipped == 0:
+            self.failed = 1  # a step without a test proves nothing
+
+
+def boxed(out, options, command):
+    """A command inside the box, which may write to the directory of results."""
+    return [str(BOX), "--share", str(out), *options, "--", *command]
+
+
+def gtest_step(out, ring, kind, build, unit=None, wrapper=(), environment=None):
+    program = build / UNIT_PROGRAMS[kind]
+    report = out / f"{ring}-{kind}-{unit or 'all'}.xml"
+    command = [*wrapper, str(program), f"--gtest_output=xml:{report}", "--gtest_brief=1"]
+    if unit:
+        command.append(f"--gtest_filter={unit}.*")
+    return Step(ring, f"{kind}{'/' + unit if unit else ''}", boxed(out, [], command), report, environment)
+
+
+def units_of(kind):
+    folder = ROOT / "tests" / kind
+    return sorted(path.name.removesuffix("_test.cpp") for path in folder.glob("*_test.cpp"))
+
+
+def box_options(path):
+    """What a lab test asks of the box, from its first line: "# box: --link lan0"."""
+    first = path.read_text().splitlines()[0]
+    return first.removeprefix("# box:").split() if first.startswith("# box:") else []
+
+
+def pytest_step(out, ring, path, inside_box):
+    report = out / f"{path.stem}.xml"
+    command = [PYTHON, "-B", "-m", "pytest", "-q", "-p", "no:cacheprovider", f"--junitxml={report}", str(path)]
+    environment = {"KOVA_BUILD": str(BUILD), "KOVA_BOX_PROGRAM": str(BOX)}
+    if inside_box:
+        command = boxed(out, ["--tree", str(BUILD / "stage"), *box_options(path)], command)
+    return Step(ring, path.stem, command, report, environment)
+
+
+def all_steps(out):
+    for path in sorted((ROOT / "tests" / "gates").glob("test_*.py")):
+        yield pytest_step(out, "gates", path, inside_box=False)
+    for kind in UNIT_PROGRAMS:
+        yield gtest_step(out, kind, kind, BUILD)
+    for kind in UNIT_PROGRAMS:
+        yield gtest_step(out, "sanitize", kind, BUILD / "sanitize")
+    for kind in UNIT_PROGRAMS:
+        yield gtest_step(out, "valgrind", kind, BUILD, wrapper=VALGRIND, environment={"KOVA_SLOW": "1"})
+    for path in sorted((ROOT / "tests" / "lab").glob("test_*.py")):
+        yield pytest_step(out, "lab", path, inside_box=path.name != "test_box.py")
+
+
+VALGRIND = ["valgrind", "--quiet", "--error-exitcode=9", "--leak-check=full", "--errors-for-leak-kinds=definite",
+            "--trace-children=no", "--child-silent-after-fork=yes"]
+
+
+def chosen_steps(out, names):
+    steps = list(all_steps(out))
+    if not names:
+        return steps
+    chosen = []
+    for name in names:
+        found = [step for step in steps if name in (step.ring, step.name)]
+        for kind in UNIT_PROGRAMS:
+            if not found and name in units_of(kind):
+                found = [gtest_step(out, kind, kind, BUILD, unit=name)]
+        if not found:
+            sys.exit(f"./test: no ring, test file or unit is called {name!r}; ./test --list names them")
+        chosen += found
+    return chosen
+
+
+def show(step):
+    counts = f"{step.passed} passed" + (f", {step.failed} failed" if step.failed else "") \
+        + (f", {step.skipped} skipped" if step.skipped else "")
+    print(f"{'FAILED' if step.failed else 'ok':7}{step.ring}/{step.name}: {counts} ({step.seconds:.1f} s)", flush=True)
+    for reason in step.reasons:
+        print(f"       skipped {reason}")
+    if step.failed:
+        print(step.output, flush=True)
+
+
+def main():
+    parser = argparse.ArgumentParser(prog="./test", description=__doc__.split("\n\n")[0],
+                                     epilog=__doc__.split("\n\n")[2])
+    parser.add_argument("names", nargs="*", metavar="NAME")
+    parser.add_argument("--list", action="store_true", help="print the names")
+    asked = parser.parse_args()
+    out = pathlib.Path(tempfile.mkdtemp(prefix="kova-test-"))
+    try:
+        steps = chosen_steps(out, asked.names)
+        if asked.list:
+            print("\n".join(f"{step.ring}/{step.name}" for step in steps))
+            print("units:", *units_of("unit"), *units_of("platform"))
+            return 0
+        with concurrent.futures.ThreadPoolExecutor(max_workers=os.cpu_count()) as pool:
+            for future in concurrent.futures.as_completed([pool.submit(step.run) for step in steps]):
+                show(future.result())
+    finally:
+        shutil.rmtree(out, ignore_errors=True)
+    passed, failed, skipped = (sum(getattr(step, field) for step in steps) for field in ("passed", "failed", "skipped"))
+    print(f"{passed} passed, {failed} failed, {skipped} skipped")
+    lab_skipped = any(step.skipped for step in steps if step.ring == "lab")
+    return 1 if failed or (os.environ.get("CI") and lab_skipped) else 0
+
+
+if __name__ == "__main__":
+    sys.exit(main())
