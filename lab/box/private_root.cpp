@@ -1,0 +1,233 @@
+#include "private_root.h"
+
+#include "host_mounts.h"
+#include "layers.h"
+#include "system.h"
+
+#include <algorithm>
+#include <array>
+#include <fcntl.h>
+#include <filesystem>
+#include <sys/mount.h>
+#include <sys/stat.h>
+#include <sys/syscall.h>
+#include <unistd.h>
+
+namespace kova {
+
+namespace fs = std::filesystem;
+
+namespace {
+
+// The new root grows in memory over /tmp: every system has that directory, and the box gets its own one anyway. What
+// the caller names below the host's /tmp is opened before and reached through descriptors.
+const fs::path kStage = "/tmp";
+const fs::path kRoot = kStage / "root";
+const fs::path kUpper = kStage / "upper";
+const fs::path kWork = kStage / "work";
+
+constexpr unsigned long kKernelFlags = MS_NOSUID | MS_NODEV | MS_NOEXEC;
+
+// A directory of the host, reachable whatever is mounted over it.
+struct host_directory {
+    fs::path path;
+    unique_fd fd;
+};
+
+std::vector<host_directory> open_directories(const std::vector<std::string> &paths) {
+    std::vector<host_directory> directories;
+    for (const std::string &path : paths) {
+        directories.push_back({fs::canonical(path), open_file(path, O_PATH | O_DIRECTORY)});
+    }
+    return directories;
+}
+
+// Directories that the box makes anew instead of showing the host's.
+bool is_below_own_directory(const fs::path &path) {
+    constexpr std::array own{"proc", "sys", "dev", "run", "tmp"};
+    const std::string top = path.relative_path().begin()->string();
+    return std::find(own.begin(), own.end(), top) != own.end();
+}
+
+// ---- layers
+
+// One overlay cannot be laid over "/" itself with its layer below, so every directory at the top gets its own; so does
+// every mount below, because an overlay shows only the file system that its lower directory is on.
+std::vector<fs::path> directories_to_overlay() {
+    std::vector<fs::path> points;
+    for (const fs::directory_entry &entry : fs::directory_iterator("/")) {
+        if (entry.is_directory() && !entry.is_symlink() && !is_below_own_directory(entry.path())) {
+            points.push_back(entry.path());
+        }
+    }
+    for (const fs::path &point : host_mount_points()) {
+        if (point != "/" && point.parent_path() != "/" && fs::is_directory(point) && !is_below_own_directory(point)) {
+            points.push_back(point);
+        }
+    }
+    return points;
+}
+
+// A container's /etc/resolv.conf and the like are mounts of single files: an overlay would show what is below them.
+void copy_mounted_files(upper_layers &layers) {
+    for (const fs::path &point : host_mount_points()) {
+        if (fs::is_regular_file(point) && !is_below_own_directory(point) && access(point.c_str(), R_OK) == 0) {
+            layers.copy_entry(fs::directory_entry(point), point.parent_path());
+        }
+    }
+}
+
+// To an ordinary user the files of others stay foreign in an overlay, so what an appliance has to change is copied.
+void make_writable_for_user(upper_layers &layers) {
+    layers.copy_tree("/etc", "/etc", unreadable::skip);
+    for (const char *directory : {"/usr/bin", "/usr/sbin", "/usr/lib", "/usr/share", "/var/cache", "/var/lib/dhcp",
+                                  "/var/lib/misc", "/var/log", "/var/spool", "/var/tmp"}) {
+        layers.cover(directory);
+    }
+}
+
+// ---- mounts
+
+std::string overlay_escaped(const fs::path &path) {
+    std::string escaped;
+    for (const char c : path.string()) {
+        if (c == '\\' || c == ':' || c == ',') {
+            escaped += '\\';
+        }
+        escaped += c;
+    }
+    return escaped;
+}
+
+void bind_read_only(const fs::path &source, const fs::path &target) {
+    bind_mount(source, target);
+    struct mount_attr attributes = {};
+    attributes.attr_set = MOUNT_ATTR_RDONLY;
+    require(mount_setattr(AT_FDCWD, target.c_str(), AT_RECURSIVE, &attributes, sizeof attributes) == 0,
+            "cannot make " + target.string() + " read-only");
+}
+
+void mount_overlay(const fs::path &point, const fs::path &upper, bool mapped) {
+    const fs::path target = kRoot / point.relative_path();
+    const fs::path work = kWork / upper.filename();
+    make_directories(work);
+    const std::string options = "lowerdir=" + overlay_escaped(point) + ",upperdir=" + upper.string() +
+                                ",workdir=" + work.string() + (mapped ? ",userxattr" : "");
+    if (mount("overlay", target.c_str(), "overlay", 0, options.c_str()) == 0) {
+        return;
+    }
+    // some file systems cannot lie below an overlay; they can still be looked at when nothing is to be written there
+    require(fs::is_empty(upper), "cannot lay an overlay over " + point.string());
+    bind_read_only(point, target);
+}
+
+void copy_top_links() {
+    for (const fs::directory_entry &entry : fs::directory_iterator("/")) {
+        if (entry.is_symlink()) {
+            fs::copy_symlink(entry.path(), kRoot / entry.path().filename());
+        }
+    }
+}
+
+void mount_devices() {
+    const fs::path dev = kRoot / "dev";
+    mount_new("tmpfs", dev, MS_NOSUID, "mode=755");
+    for (const char *name : {"null", "zero", "full", "random", "urandom", "tty", "net/tun", "ppp", "fuse"}) {
+        const fs::path host = fs::path("/dev") / name;
+        if (fs::exists(host)) {
+            make_directories((dev / name).parent_path());
+            write_file(dev / name, "");
+            bind_mount(host, dev / name);
+        }
+    }
+    constexpr std::array<std::array<const char *, 2>, 5> links{{{"fd", "/proc/self/fd"},
+                                                                {"stdin", "/proc/self/fd/0"},
+                                                                {"stdout", "/proc/self/fd/1"},
+                                                                {"stderr", "/proc/self/fd/2"},
+                                                                {"ptmx", "pts/ptmx"}}};
+    for (const auto &[name, target] : links) {
+        fs::create_symlink(target, dev / name);
+    }
+    make_directories(dev / "pts");
+    make_directories(dev / "shm");
+    mount_new("devpts", dev / "pts", MS_NOSUID | MS_NOEXEC, "newinstance,ptmxmode=0666,mode=620");
+    mount_new("tmpfs", dev / "shm", MS_NOSUID | MS_NODEV, "mode=1777");
+}
+
+void mount_kernel_directories() {
+    for (const char *name : {"proc", "sys", "dev"}) {
+        make_directories(kRoot / name);
+    }
+    mount_new("proc", kRoot / "proc", kKernelFlags);
+    mount_new("sysfs", kRoot / "sys", kKernelFlags);
+    mount_devices();
+}
+
+void mount_own_directories(const fs::path &run, const fs::path &tmp) {
+    make_directories(kRoot / "run");
+    make_directories(kRoot / "tmp");
+    require(chmod(tmp.c_str(), 01777) == 0, "cannot open /tmp to all");
+    bind_mount(run, kRoot / "run");
+    bind_mount(tmp, kRoot / "tmp");
+    make_directories(kRoot / "run/lock");
+    // `ip netns exec` mounts a sysfs in place of /sys; a user may do that only while another whole one is mounted
+    make_directories(kRoot / "run/.sysfs");
+    mount_new("sysfs", kRoot / "run/.sysfs", kKernelFlags);
+}
+
+void mount_shares(const std::vector<host_directory> &shares) {
+    for (const host_directory &share : shares) {
+        const fs::path target = kRoot / share.path.relative_path();
+        make_directories(target);
+        bind_mount(path_of(share.fd), target);
+    }
+}
+
+void change_root() {
+    require(chdir(kRoot.c_str()) == 0, "cannot enter the new root");
+    // with the same directory for both, the old root ends up over the new one, where it is taken off
+    require(syscall(SYS_pivot_root, ".", ".") == 0, "cannot change the root");
+    require(umount2(".", MNT_DETACH) == 0, "cannot leave the host's root");
+}
+
+} // namespace
+
+void enter_private_root(const box_options &options, bool mapped) {
+    require(mount("", "/", nullptr, MS_REC | MS_PRIVATE, nullptr) == 0, "cannot part from the host's mounts");
+    const std::vector<host_directory> trees = open_directories(options.trees);
+    const std::vector<host_directory> shares = open_directories(options.shares);
+    const std::vector<fs::path> points = directories_to_overlay();
+
+    mount_new("tmpfs", kStage, MS_NODEV, "mode=755,size=" + options.size);
+    for (const fs::path &directory : {kRoot, kUpper, kWork}) {
+        make_directories(directory);
+    }
+    upper_layers layers(kUpper, kRoot);
+    std::vector<fs::path> uppers;
+    for (const fs::path &point : points) {
+        uppers.push_back(layers.add(point));
+    }
+    const fs::path run = layers.add("/run");
+    const fs::path tmp = layers.add("/tmp");
+
+    copy_mounted_files(layers);
+    if (mapped) {
+        make_writable_for_user(layers);
+    }
+    copy_top_links();
+    for (const host_directory &tree : trees) {
+        layers.copy_tree(path_of(tree.fd), "/", unreadable::fail);
+    }
+
+    bind_mount(kRoot, kRoot); // only a mount point can become the root
+    for (std::size_t i = 0; i < points.size(); ++i) {
+        make_directories(kRoot / points[i].relative_path());
+        mount_overlay(points[i], uppers[i], mapped);
+    }
+    mount_kernel_directories();
+    mount_own_directories(run, tmp);
+    mount_shares(shares);
+    change_root();
+}
+
+} // namespace kova
