@@ -1,0 +1,55 @@
+/* Every byte of the records is part of the interface: offsets and sizes, the same on every 64-bit machine. */
+#include <kovanetsdk/kovanetsdk.h>
+#include <stddef.h>
+
+#define AT(record, field, offset) _Static_assert(offsetof(record, field) == (offset), #record "." #field)
+#define SIZE(record, size) _Static_assert(sizeof(record) == (size), #record)
+
+AT(NETINFO, nIPSource, 0);
+AT(NETINFO, blLinkUp, 4);
+AT(NETINFO, szIfname, 8);
+AT(NETINFO, abMac, 24);
+AT(NETINFO, szIP, 30);
+AT(NETINFO, szMask, 50);
+SIZE(NETINFO, 72);
+
+AT(IFINFO, szIfname, 0);
+AT(IFINFO, abMac, 16);
+AT(IFINFO, szIP, 22);
+AT(IFINFO, nLink, 88);
+AT(IFINFO, nFlags, 92);
+AT(IFINFO, szMask, 96);
+SIZE(IFINFO, 116);
+
+AT(ETHINFO, nSpeed, 0);
+AT(ETHINFO, nDuplex, 4);
+AT(ETHINFO, nMTU, 8);
+AT(ETHINFO, nSupported, 12);
+AT(ETHINFO, nBestSpeed, 16);
+AT(ETHINFO, nBestDuplex, 20);
+AT(ETHINFO, szBestMode, 24);
+SIZE(ETHINFO, 40);
+
+AT(NETSTAT, blValid, 0);
+AT(NETSTAT, szIfname, 4);
+AT(NETSTAT, nRxBytes, 24);
+AT(NETSTAT, nTxBytes, 32);
+AT(NETSTAT, nRxPackets, 40);
+AT(NETSTAT, nTxPackets, 48);
+SIZE(NETSTAT, 56);
+
+AT(KOVAV6IP, szIP, 0);
+AT(KOVAV6IP, nPrefixLength, 48);
+AT(KOVAV6IP, nScope, 52);
+AT(KOVAV6IP, nFlags, 56);
+SIZE(KOVAV6IP, 60);
+
+AT(KOVALINKAGGROPT, szName, 0);
+AT(KOVALINKAGGROPT, mode, 16);
+AT(KOVALINKAGGROPT, blNoPartner, 20);
+AT(KOVALINKAGGROPT, cSlaves, 24);
+AT(KOVALINKAGGROPT, aszSlaves, 28);
+SIZE(KOVALINKAGGROPT, 540);
+
+AT(KLIBSZLIST, nCapacity, 0);
+AT(KLIBSZLIST, nItem, 4);
