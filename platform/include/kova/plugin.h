@@ -1,12 +1,13 @@
 /**
  * @file
- * Change events: a caller opens an event, sets its arguments and fires it; the executables registered for the event run.
+ * Change events: a caller opens an event, sets its arguments and fires it; the executables registered for the event
+ * run.
  *
  * Registered for event E are the executables in /usr/kova/plugins/E/ (E "net/dns_change" gives
- * /usr/kova/plugins/net/dns_change/), run one after the other in name order. Each gets PLUGIN_EVENT, PLUGIN_PHASE ("PRE"
- * for phase 4, "POST" for 5) and every argument in its environment and as key=value lines on its standard input. An array
- * KEY is given as KEY_COUNT and KEY_1, KEY_2 ... One that fails makes the action fail and does not stop the others; one
- * that outlives its time limit is killed.
+ * /usr/kova/plugins/net/dns_change/), run one after the other in name order. Each gets PLUGIN_EVENT, PLUGIN_PHASE
+ * ("PRE" for phase 4, "POST" for 5) and every argument in its environment and as key=value lines on its standard input.
+ * An array KEY is given as KEY_COUNT and KEY_1, KEY_2 ... One that fails makes the action fail and does not stop the
+ * others; one that outlives its time limit is killed.
  */
 #ifndef KOVA_PLUGIN_H
 #define KOVA_PLUGIN_H

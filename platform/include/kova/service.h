@@ -11,7 +11,8 @@
 extern "C" {
 #endif
 
-/** Reloads a service ("ddns" ...). @return 0; -1 with 0xD00 (name), 0xBC00 (no such service) or 0x2A00 (the reload failed) */
+/** Reloads a service ("ddns" ...). @return 0; -1 with 0xD00 (name), 0xBC00 (no such service) or 0x2A00 (the reload
+ * failed) */
 int KLIBServiceReload(const char *szService);
 /** @return 1 when a service runs, 0 when not; -1 with 0xD00 */
 int KLIBServiceIsRunning(const char *szService);
