@@ -81,14 +81,17 @@ void supervisor::on_signal() {
     }
 }
 
-// The command stopped: so does kova-box, as if the terminal had stopped it, until a shell lets it go on.
+// The command stopped: so does kova-box, as if the terminal had stopped it, until a shell lets it go on. A command that
+// only wanted the terminal gets it when kova-box was brought to the foreground meanwhile.
 void supervisor::on_message() {
     char message = 0;
     if (read(channel_.get(), &message, 1) != 1 || message != kStopped) {
         return;
     }
-    take_terminal_back();
-    kill(0, SIGTSTP);
+    if (use_ == terminal_use::foreground || terminal_of_caller() != terminal_use::foreground) {
+        take_terminal_back();
+        kill(0, SIGTSTP);
+    }
     use_ = terminal_of_caller();
     const char answer = use_ == terminal_use::foreground ? kContinueForeground : kContinue;
     if (write(channel_.get(), &answer, 1) != 1) {
