@@ -8,6 +8,7 @@
 #include <array>
 #include <fcntl.h>
 #include <filesystem>
+#include <optional>
 #include <sys/mount.h>
 #include <sys/stat.h>
 #include <sys/syscall.h>
@@ -51,21 +52,39 @@ bool is_below_own_directory(const fs::path &path) {
 
 // ---- layers
 
+// One directory of the host that the box shows through an overlay.
+struct overlay {
+    fs::path point; // where it is, on the host as in the box
+    fs::path lower; // where the host's directory can be reached
+    fs::path upper; // what is written above it
+};
+
 // One overlay cannot be laid over "/" itself with its layer below, so every directory at the top gets its own; so does
 // every mount below, because an overlay shows only the file system that its lower directory is on.
-std::vector<fs::path> directories_to_overlay() {
-    std::vector<fs::path> points;
+std::vector<overlay> overlays_of_system() {
+    std::vector<overlay> overlays;
     for (const fs::directory_entry &entry : fs::directory_iterator("/")) {
         if (entry.is_directory() && !entry.is_symlink() && !is_below_own_directory(entry.path())) {
-            points.push_back(entry.path());
+            overlays.push_back({entry.path(), entry.path(), {}});
         }
     }
     for (const fs::path &point : host_mount_points()) {
         if (point != "/" && point.parent_path() != "/" && fs::is_directory(point) && !is_below_own_directory(point)) {
-            points.push_back(point);
+            overlays.push_back({point, point, {}});
         }
     }
-    return points;
+    return overlays;
+}
+
+// Of the host's /tmp and /run only the working directory is kept, so that programs in it can be run from there too.
+std::optional<host_directory> temporary_working_directory() {
+    std::error_code gone;
+    const fs::path directory = fs::current_path(gone);
+    const std::string parent = directory.parent_path().relative_path().string() + "/";
+    if (gone || (!parent.starts_with("tmp/") && !parent.starts_with("run/"))) {
+        return std::nullopt;
+    }
+    return host_directory{directory, open_file(".", O_PATH | O_DIRECTORY)};
 }
 
 // A container's /etc/resolv.conf and the like are mounts of single files: an overlay would show what is below them.
@@ -107,18 +126,19 @@ void bind_read_only(const fs::path &source, const fs::path &target) {
             "cannot make " + target.string() + " read-only");
 }
 
-void mount_overlay(const fs::path &point, const fs::path &upper, bool mapped) {
-    const fs::path target = kRoot / point.relative_path();
-    const fs::path work = kWork / upper.filename();
+void mount_overlay(const overlay &layer, bool mapped) {
+    const fs::path target = kRoot / layer.point.relative_path();
+    const fs::path work = kWork / layer.upper.filename();
+    make_directories(target);
     make_directories(work);
-    const std::string options = "lowerdir=" + overlay_escaped(point) + ",upperdir=" + upper.string() +
+    const std::string options = "lowerdir=" + overlay_escaped(layer.lower) + ",upperdir=" + layer.upper.string() +
                                 ",workdir=" + work.string() + (mapped ? ",userxattr" : "");
     if (mount("overlay", target.c_str(), "overlay", 0, options.c_str()) == 0) {
         return;
     }
     // some file systems cannot lie below an overlay; they can still be looked at when nothing is to be written there
-    require(fs::is_empty(upper), "cannot lay an overlay over " + point.string());
-    bind_read_only(point, target);
+    require(fs::is_empty(layer.upper), "cannot lay an overlay over " + layer.point.string());
+    bind_read_only(layer.lower, target);
 }
 
 void copy_top_links() {
@@ -196,16 +216,16 @@ void enter_private_root(const box_options &options, bool mapped) {
     require(mount("", "/", nullptr, MS_REC | MS_PRIVATE, nullptr) == 0, "cannot part from the host's mounts");
     const std::vector<host_directory> trees = open_directories(options.trees);
     const std::vector<host_directory> shares = open_directories(options.shares);
-    const std::vector<fs::path> points = directories_to_overlay();
+    const std::optional<host_directory> kept = temporary_working_directory();
+    std::vector<overlay> overlays = overlays_of_system();
 
     mount_new("tmpfs", kStage, MS_NODEV, "mode=755,size=" + options.size);
     for (const fs::path &directory : {kRoot, kUpper, kWork}) {
         make_directories(directory);
     }
     upper_layers layers(kUpper, kRoot);
-    std::vector<fs::path> uppers;
-    for (const fs::path &point : points) {
-        uppers.push_back(layers.add(point));
+    for (overlay &system : overlays) {
+        system.upper = layers.add(system.point);
     }
     const fs::path run = layers.add("/run");
     const fs::path tmp = layers.add("/tmp");
@@ -220,12 +240,14 @@ void enter_private_root(const box_options &options, bool mapped) {
     }
 
     bind_mount(kRoot, kRoot); // only a mount point can become the root
-    for (std::size_t i = 0; i < points.size(); ++i) {
-        make_directories(kRoot / points[i].relative_path());
-        mount_overlay(points[i], uppers[i], mapped);
+    for (const overlay &system : overlays) {
+        mount_overlay(system, mapped);
     }
     mount_kernel_directories();
     mount_own_directories(run, tmp);
+    if (kept) {
+        mount_overlay({kept->path, path_of(kept->fd), layers.add(kept->path)}, mapped);
+    }
     mount_shares(shares);
     change_root();
 }
