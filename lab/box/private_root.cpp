@@ -6,6 +6,7 @@
 
 #include <algorithm>
 #include <array>
+#include <cstdint>
 #include <fcntl.h>
 #include <filesystem>
 #include <optional>
@@ -118,12 +119,21 @@ std::string overlay_escaped(const fs::path &path) {
     return escaped;
 }
 
-void bind_read_only(const fs::path &source, const fs::path &target) {
+void bind_with(const fs::path &source, const fs::path &target, std::uint64_t set, std::uint64_t clear) {
     bind_mount(source, target);
     struct mount_attr attributes = {};
-    attributes.attr_set = MOUNT_ATTR_RDONLY;
+    attributes.attr_set = set;
+    attributes.attr_clr = clear;
     require(mount_setattr(AT_FDCWD, target.c_str(), AT_RECURSIVE, &attributes, sizeof attributes) == 0,
-            "cannot make " + target.string() + " read-only");
+            "cannot set what may be written in " + target.string());
+}
+
+void bind_read_only(const fs::path &source, const fs::path &target) {
+    bind_with(source, target, MOUNT_ATTR_RDONLY, 0);
+}
+
+void bind_writable(const fs::path &source, const fs::path &target) {
+    bind_with(source, target, 0, MOUNT_ATTR_RDONLY);
 }
 
 void mount_overlay(const overlay &layer, bool mapped) {
@@ -174,13 +184,30 @@ void mount_devices() {
     mount_new("tmpfs", dev / "shm", MS_NOSUID | MS_NODEV, "mode=1777");
 }
 
-void mount_kernel_directories() {
+// Root in a box is the host's root to the kernel: of the kernel's own settings only those of this box's namespaces may
+// be written, and the one that only costs time.
+void protect_kernel_settings() {
+    const fs::path proc = kRoot / "proc";
+    for (const char *hosts : {"sys", "sysrq-trigger"}) {
+        if (fs::exists(proc / hosts)) {
+            bind_read_only(proc / hosts, proc / hosts);
+        }
+    }
+    for (const char *own : {"sys/net", "sys/kernel/hostname", "sys/kernel/domainname", "sys/vm/drop_caches"}) {
+        bind_writable(proc / own, proc / own);
+    }
+}
+
+void mount_kernel_directories(bool mapped) {
     for (const char *name : {"proc", "sys", "dev"}) {
         make_directories(kRoot / name);
     }
     mount_new("proc", kRoot / "proc", kKernelFlags);
     mount_new("sysfs", kRoot / "sys", kKernelFlags);
     mount_devices();
+    if (!mapped) {
+        protect_kernel_settings();
+    }
 }
 
 void mount_own_directories(const fs::path &run, const fs::path &tmp) {
@@ -243,7 +270,7 @@ void enter_private_root(const box_options &options, bool mapped) {
     for (const overlay &system : overlays) {
         mount_overlay(system, mapped);
     }
-    mount_kernel_directories();
+    mount_kernel_directories(mapped);
     mount_own_directories(run, tmp);
     if (kept) {
         mount_overlay({kept->path, path_of(kept->fd), layers.add(kept->path)}, mapped);

@@ -31,8 +31,7 @@ bool enter_pid_namespace() {
     }
     const std::string uid = std::to_string(geteuid());
     const std::string gid = std::to_string(getegid());
-    require(unshare(CLONE_NEWUSER | CLONE_NEWPID) == 0,
-            "namespaces are refused here (a user namespace, not being root)");
+    require(unshare(CLONE_NEWUSER | CLONE_NEWPID) == 0, "cannot make a PID namespace, nor one in a user namespace");
     write_file("/proc/self/setgroups", "deny");
     write_file("/proc/self/uid_map", "0 " + uid + " 1");
     write_file("/proc/self/gid_map", "0 " + gid + " 1");
