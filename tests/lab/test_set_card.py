@@ -1,26 +1,16 @@
 """The main job on a real interface: static, DHCP with a real lease, static again, with failures in the middle."""
-import json
 import pathlib
 import subprocess
 
 import pytest
 import sdk
-from conftest import dhcp_server, wait_for
+from conftest import DhcpServer, addresses, on_other_side, run, wait_for
 
 IFCFG = pathlib.Path("/etc/sysconfig/network-scripts/ifcfg-eth0")
 LEASE = pathlib.Path("/etc/dhclient/ipv4/dhcpcd-eth0.info")
 EVENTS = pathlib.Path("/tmp/events")
 PLUGIN = pathlib.Path("/usr/kova/plugins/net/ipv4_change/50-note")
 ADDRESS, MASK = "192.168.50.10", "255.255.255.0"
-
-
-def run(*words):
-    return subprocess.run(words, capture_output=True, text=True, check=True).stdout
-
-
-def addresses():
-    [link] = json.loads(run("ip", "-j", "-4", "addr", "show", "dev", "eth0"))
-    return [f"{entry['local']}/{entry['prefixlen']}" for entry in link["addr_info"]]
 
 
 def keys():
@@ -42,7 +32,7 @@ def appliance():
     PLUGIN.chmod(0o755)
     run("ip", "addr", "flush", "dev", "eth0")
     run("ip", "link", "set", "eth0", "up")
-    run("ip", "-n", "net", "addr", "replace", "192.168.50.1/24", "dev", "eth0")
+    on_other_side("ip", "addr", "replace", "192.168.50.1/24", "dev", "eth0")
     yield
     subprocess.run(["/sbin/stop", "dhcp-client", "IFACE=eth0"], check=True)
 
@@ -72,7 +62,7 @@ def make_static(address=ADDRESS, mask=MASK, old=None):
 
 def test_static_reaches_the_neighbour_and_is_announced():
     assert make_static() == 0, sdk.register()
-    assert addresses() == [f"{ADDRESS}/24"]
+    assert addresses("eth0") == [f"{ADDRESS}/24"]
     run("ping", "-c", "1", "-W", "5", "192.168.50.1")
     assert EVENTS.read_text().splitlines() == ["PRE", "IFNAME=eth0", "ORIGIN_ADDRESS=", f"NEW_ADDRESS={ADDRESS}",
                                                "PREFIX_LENGTH=-1", "IS_LINK=true"]
@@ -81,29 +71,29 @@ def test_static_reaches_the_neighbour_and_is_announced():
     assert beside() == ["ifcfg-eth0"]
 
 
-def test_static_to_dhcp_to_static():
+def test_static_to_dhcp_to_static(tmp_path):
     assert make_static() == 0, sdk.register()
-    with dhcp_server():
+    with DhcpServer("eth0", "192.168.50", folder=tmp_path):
         assert sdk.set_card(sdk.card(sdk.DHCP, "eth0")) == 0, sdk.register()
         assert keys()["BOOTPROTO"] == "dhcp" and "IPADDR" not in keys()
         wait_for(LEASE.exists, 20)
         lease = dict(line.split("=", 1) for line in LEASE.read_text().splitlines())
         leased = lease["IPADDR"].strip('"')
-        wait_for(lambda: f"{leased}/24" in addresses(), 5)
+        wait_for(lambda: f"{leased}/24" in addresses("eth0"), 5)
         found = sdk.get_card(0)
         assert (found.nIPSource, found.szIfname, found.szIP.decode()) == (sdk.DHCP, b"eth0", leased)
         run("ping", "-c", "1", "-W", "5", "192.168.50.1")
         assert make_static() == 0, sdk.register()
-    assert addresses() == [f"{ADDRESS}/24"]
+    assert addresses("eth0") == [f"{ADDRESS}/24"]
     found = sdk.get_card(0)
     assert (found.nIPSource, found.szIP.decode(), found.szMask.decode()) == (sdk.STATIC, ADDRESS, MASK)
 
 
 @pytest.mark.parametrize("tool", ["/sbin/ifconfig"])
-def test_failing_step_leaves_the_old_file_byte_for_byte(tool, broken_tool):
-    with dhcp_server():
+def test_failing_step_leaves_the_old_file_byte_for_byte(tool, broken_tool, tmp_path):
+    with DhcpServer("eth0", "192.168.50", folder=tmp_path):
         assert sdk.set_card(sdk.card(sdk.DHCP, "eth0")) == 0, sdk.register()
-        wait_for(addresses, 20)
+        wait_for(lambda: addresses("eth0"), 20)
         before, owner = IFCFG.read_bytes(), IFCFG.stat()
         broken_tool(tool, 3)
         assert make_static() == -1
@@ -142,7 +132,7 @@ def test_refused_address_changes_nothing(address, mask):
     before = IFCFG.read_bytes()
     assert make_static(address, mask) == -1
     assert IFCFG.read_bytes() == before
-    assert addresses() == [] and not EVENTS.exists()
+    assert addresses("eth0") == [] and not EVENTS.exists()
 
 
 def test_unchanged_address_raises_no_event():
@@ -150,13 +140,13 @@ def test_unchanged_address_raises_no_event():
     EVENTS.unlink()
     assert make_static() == 0, sdk.register()
     assert not EVENTS.exists()
-    assert addresses() == [f"{ADDRESS}/24"]
+    assert addresses("eth0") == [f"{ADDRESS}/24"]
 
 
 def test_failing_plugin_does_not_undo_the_change():
     PLUGIN.write_text("#!/bin/sh\nexit 1\n")
     assert make_static() == 0, sdk.register()
-    assert addresses() == [f"{ADDRESS}/24"]
+    assert addresses("eth0") == [f"{ADDRESS}/24"]
 
 
 def test_lock_held_elsewhere_is_reported_and_nothing_changes():
