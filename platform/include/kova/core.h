@@ -152,8 +152,10 @@ int KLIBCFileReadLines(const char *szPath, KLIBSZLIST *pList);
  */
 int KLIBCFileAddLine(const char *szPath, const char *szMarker, const char *szLine, int flags);
 
-/** Replaces every occurrence of a text (not empty) in a file. @return 0; -1 as KLIBCFileSetKeyValue, a missing file
- * included */
+/**
+ * Replaces every occurrence of a text (not empty) in a file.
+ * @return 0; -1 as KLIBCFileSetKeyValue, a missing file included
+ */
 int KLIBCFileReplaceSubStr(const char *szPath, const char *szOld, const char *szNew);
 
 /**
@@ -236,25 +238,31 @@ int KLIBCPclose(FILE *pStream);
 int KLIBCPs(const char *szName, pid_t *pPid, int cPid, int flags);
 /** @return the pid in a pid file; 0 when the file is absent or holds none; -1 with 0xD00 */
 int KLIBCReadPidFile(const char *szPath);
-/** Copies the name of a process (last path component, cut to the buffer). @return 0; -1 with 0xD00, or 0xBC00 no such
- * process */
+/**
+ * Copies the name of a process (last path component, cut to the buffer).
+ * @return 0; -1 with 0xD00, or 0xBC00 no such process
+ */
 int KLIBCProcGetByPid(pid_t pid, char *szName, int cbName);
 /**
- * @param szProc  digits: a pid; anything else: a command line, with or without an interpreter before it, matched at
- *                argument boundaries
+ * @param szProc  digits: a pid; anything else: the beginning of a command line up to the end of one of its arguments,
+ *                with or without an interpreter before it
  * @return 1 when such a process lives (zombies and the caller excepted), else 0
  */
 int KLIBCIsProcAlive(const char *szProc);
-/** Sends a signal to what KLIBCIsProcAlive matches. @return 0, also when there is nothing to kill; -1 with 0xD00 or
- * 0x8100 */
+/**
+ * Sends a signal to what KLIBCIsProcAlive matches.
+ * @return 0, also when there is nothing to kill; -1 with 0xD00 or 0x8100
+ */
 int KLIBCKill(const char *szProc, int signal);
 
 /* ---- strings, lists, maps ------------------------------------------------------------------------------------- */
 
 /** @param capacity entries to make room for, above 0. @return an empty list, or NULL with 0xD00 or 0x200 */
 KLIBSZLIST *KLIBCSzListAlloc(int capacity);
-/** Appends a copy of a text, "" included; the list grows as needed, its handle never moves. @return 0; -1 with 0xD00 or
- * 0x200 */
+/**
+ * Appends a copy of a text, "" included; the list grows as needed, its handle never moves.
+ * @return 0; -1 with 0xD00 or 0x200
+ */
 int KLIBCSzListPush(KLIBSZLIST **ppList, const char *szItem);
 /** @return the text at an index from 0, NULL past the end (owned by the list) */
 const char *KLIBCSzListGet(const KLIBSZLIST *pList, int index);
@@ -267,8 +275,10 @@ void KLIBCSzListFree(KLIBSZLIST *pList);
 
 /** @param capacity entries to make room for, above 0. @return an empty map, or NULL with 0xD00 or 0x200 */
 KLIBSZHASH *KLIBCSzHashAlloc(int capacity);
-/** Sets a key (not empty); copies both, a present key keeps its place. @return 0; -1 with 0xD00 or 0x200, the map as
- * before */
+/**
+ * Sets a key (not empty); copies both, a present key keeps its place.
+ * @return 0; -1 with 0xD00 or 0x200, the map as before
+ */
 int KLIBCSzHashSetValue(KLIBSZHASH *pHash, const char *szKey, const char *szValue);
 /** @return the value of a key (owned by the map), NULL when absent */
 const char *KLIBCSzHashGetValue(const KLIBSZHASH *pHash, const char *szKey);
@@ -280,13 +290,18 @@ void KLIBCSzHashFree(KLIBSZHASH *pHash);
 
 /** Next token, like strtok_r. @param szText the text to cut up at the first call, then NULL */
 char *KLIBCStrTok(char *szText, const char *szDelimiters, char **ppSave);
-/** Next field between separators, empty fields kept, like strsep with the position in *ppSave. @param szText as
- * KLIBCStrTok */
+/**
+ * Next field between separators, empty fields kept, like strsep with the position in *ppSave.
+ * @param szText as KLIBCStrTok
+ */
 char *KLIBCStrSep(char *szText, const char *szSeparators, char **ppSave);
 /** The index-th (from 0) blank-separated token, terminated in place. @return NULL when there are fewer tokens */
 char *KLIBCStrTokIndex(char *szText, int index);
-/** Copies without leading and trailing white space. @param szOut as large as szText, may be szText itself. @return
- * szOut, NULL with 0xD00 */
+/**
+ * Copies without leading and trailing white space.
+ * @param szOut as large as szText, may be szText itself.
+ * @return szOut, NULL with 0xD00
+ */
 char *KLIBCStrTrimSpace(const char *szText, char *szOut);
 
 /** realloc that frees the old block when growing fails. */
@@ -294,15 +309,19 @@ void *reallocf(void *pBlock, size_t cb);
 
 /* ---- system ---------------------------------------------------------------------------------------------------- */
 
-/** @return 1 when a kernel module is loaded or built in, 0 when not; -1 with 0xD00 or 0x900 (the module list is
- * unreadable) */
+/**
+ * @return 1 when a kernel module is loaded or built in, 0 when not; -1 with 0xD00 or 0x900 (the module list is
+ *         unreadable)
+ */
 int KLIBCModuleIsLoad(const char *szModule);
 /** @return 1 on a machine with two controllers (support_dualhead="yes" in /etc/kova/platform.conf), else 0 */
 int KLIBCSupportDualhead(void);
 
 /**
  * Ciphers a buffer with the machine's key (/etc/kova/secret.key, made at first use, 0600). Its own inverse; keeps the
- * length, makes no zero byte from a text, pads the rest of the output with zeros.
+ * length, makes no zero byte from a text and no other from a zero, pads the rest of the output with zeros.
+ * @param cbIn   0 or more
+ * @param cbOut  at least cbIn; pOut may be pIn
  * @return 0; -1 with 0xD00, 0x900 (no key) or 0xB00 (the key cannot be stored)
  */
 int KLIBCCryptBufCrypt(const void *pIn, int cbIn, void *pOut, int cbOut);

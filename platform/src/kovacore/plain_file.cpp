@@ -8,6 +8,7 @@
 #include <sys/random.h>
 #include <sys/stat.h>
 
+#include "common/list_ptr.h"
 #include "common/report.h"
 #include "kovacore/file_rewrite.h"
 #include "kovacore/line_source.h"
@@ -24,11 +25,6 @@ struct directory_closer {
     void operator()(DIR *directory) const { closedir(directory); }
 };
 using directory_ptr = std::unique_ptr<DIR, directory_closer>;
-
-struct list_deleter {
-    void operator()(KLIBSZLIST *list) const { KLIBCSzListFree(list); }
-};
-using list_ptr = std::unique_ptr<KLIBSZLIST, list_deleter>;
 
 bool is_regular(DIR *directory, const dirent &entry) {
     if (entry.d_type != DT_UNKNOWN)
