@@ -1,6 +1,7 @@
 #include "core/kernel.h"
 
 #include <cstring>
+#include <kovanetsdk/core.h>
 #include <linux/ethtool.h>
 #include <linux/if_vlan.h>
 #include <linux/sockios.h>
@@ -135,6 +136,10 @@ int interface_socket::ethernet_link(const char *szIfname, bool &has_link) const 
     }
     has_link = command.data != 0;
     return 0;
+}
+
+uint32_t request_code(int error) {
+    return error == ENODEV ? NET_ERR_SOCKET : NET_ERR_IOCTL;
 }
 
 } // namespace kova

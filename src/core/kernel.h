@@ -45,4 +45,8 @@ private:
     descriptor socket_;
 };
 
+/** Error code of a request that failed: NET_ERR_SOCKET when the kernel does not know the interface, else NET_ERR_IOCTL.
+ */
+[[nodiscard]] uint32_t request_code(int error);
+
 } // namespace kova
