@@ -1,0 +1,12 @@
+#include <kovanetsdk/addr.h>
+
+#include <arpa/inet.h>
+#include <bit>
+
+int KOVANetNetmaskToPrefix(const char *szMask) {
+    in_addr mask;
+    if (szMask == nullptr || inet_aton(szMask, &mask) == 0) {
+        return -1;
+    }
+    return std::popcount(mask.s_addr);
+}
