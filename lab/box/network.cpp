@@ -66,13 +66,18 @@ void wire_network(const box_options &options, const unique_fd &other_side) {
     make_ipv6_quick_in(other_side);
     name_other_side(other_side);
 
+    // The two ends get different numbers: the kernel may put off by a second what happens to a link whose peer has its
+    // own number, which it takes for a link without one. Process 1 of the box is this one.
     std::string there = here;
+    int number = 101;
     for (const std::string &link : options.links) {
-        here += "link add " + link + " type veth peer name " + link + " netns net\nlink set " + link + " up\n";
+        there +=
+            "link add " + link + " index " + std::to_string(number++) + " type veth peer name " + link + " netns 1\n";
         there += "link set " + link + " up\n";
+        here += "link set " + link + " up\n";
     }
-    run_program({"ip", "-batch", "-"}, here);
     run_program({"ip", "-n", "net", "-batch", "-"}, there);
+    run_program({"ip", "-batch", "-"}, here);
 }
 
 } // namespace kova

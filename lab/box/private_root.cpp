@@ -6,8 +6,10 @@
 
 #include <algorithm>
 #include <array>
+#include <cstdint>
 #include <fcntl.h>
 #include <filesystem>
+#include <optional>
 #include <sys/mount.h>
 #include <sys/stat.h>
 #include <sys/syscall.h>
@@ -51,21 +53,39 @@ bool is_below_own_directory(const fs::path &path) {
 
 // ---- layers
 
+// One directory of the host that the box shows through an overlay.
+struct overlay {
+    fs::path point; // where it is, on the host as in the box
+    fs::path lower; // where the host's directory can be reached
+    fs::path upper; // what is written above it
+};
+
 // One overlay cannot be laid over "/" itself with its layer below, so every directory at the top gets its own; so does
 // every mount below, because an overlay shows only the file system that its lower directory is on.
-std::vector<fs::path> directories_to_overlay() {
-    std::vector<fs::path> points;
+std::vector<overlay> overlays_of_system() {
+    std::vector<overlay> overlays;
     for (const fs::directory_entry &entry : fs::directory_iterator("/")) {
         if (entry.is_directory() && !entry.is_symlink() && !is_below_own_directory(entry.path())) {
-            points.push_back(entry.path());
+            overlays.push_back({entry.path(), entry.path(), {}});
         }
     }
     for (const fs::path &point : host_mount_points()) {
         if (point != "/" && point.parent_path() != "/" && fs::is_directory(point) && !is_below_own_directory(point)) {
-            points.push_back(point);
+            overlays.push_back({point, point, {}});
         }
     }
-    return points;
+    return overlays;
+}
+
+// Of the host's /tmp and /run only the working directory is kept, so that programs in it can be run from there too.
+std::optional<host_directory> temporary_working_directory() {
+    std::error_code gone;
+    const fs::path directory = fs::current_path(gone);
+    const std::string parent = directory.parent_path().relative_path().string() + "/";
+    if (gone || (!parent.starts_with("tmp/") && !parent.starts_with("run/"))) {
+        return std::nullopt;
+    }
+    return host_directory{directory, open_file(".", O_PATH | O_DIRECTORY)};
 }
 
 // A container's /etc/resolv.conf and the like are mounts of single files: an overlay would show what is below them.
@@ -99,26 +119,36 @@ std::string overlay_escaped(const fs::path &path) {
     return escaped;
 }
 
-void bind_read_only(const fs::path &source, const fs::path &target) {
+void bind_with(const fs::path &source, const fs::path &target, std::uint64_t set, std::uint64_t clear) {
     bind_mount(source, target);
     struct mount_attr attributes = {};
-    attributes.attr_set = MOUNT_ATTR_RDONLY;
+    attributes.attr_set = set;
+    attributes.attr_clr = clear;
     require(mount_setattr(AT_FDCWD, target.c_str(), AT_RECURSIVE, &attributes, sizeof attributes) == 0,
-            "cannot make " + target.string() + " read-only");
+            "cannot set what may be written in " + target.string());
 }
 
-void mount_overlay(const fs::path &point, const fs::path &upper, bool mapped) {
-    const fs::path target = kRoot / point.relative_path();
-    const fs::path work = kWork / upper.filename();
+void bind_read_only(const fs::path &source, const fs::path &target) {
+    bind_with(source, target, MOUNT_ATTR_RDONLY, 0);
+}
+
+void bind_writable(const fs::path &source, const fs::path &target) {
+    bind_with(source, target, 0, MOUNT_ATTR_RDONLY);
+}
+
+void mount_overlay(const overlay &layer, bool mapped) {
+    const fs::path target = kRoot / layer.point.relative_path();
+    const fs::path work = kWork / layer.upper.filename();
+    make_directories(target);
     make_directories(work);
-    const std::string options = "lowerdir=" + overlay_escaped(point) + ",upperdir=" + upper.string() +
+    const std::string options = "lowerdir=" + overlay_escaped(layer.lower) + ",upperdir=" + layer.upper.string() +
                                 ",workdir=" + work.string() + (mapped ? ",userxattr" : "");
     if (mount("overlay", target.c_str(), "overlay", 0, options.c_str()) == 0) {
         return;
     }
     // some file systems cannot lie below an overlay; they can still be looked at when nothing is to be written there
-    require(fs::is_empty(upper), "cannot lay an overlay over " + point.string());
-    bind_read_only(point, target);
+    require(fs::is_empty(layer.upper), "cannot lay an overlay over " + layer.point.string());
+    bind_read_only(layer.lower, target);
 }
 
 void copy_top_links() {
@@ -154,13 +184,30 @@ void mount_devices() {
     mount_new("tmpfs", dev / "shm", MS_NOSUID | MS_NODEV, "mode=1777");
 }
 
-void mount_kernel_directories() {
+// Root in a box is the host's root to the kernel: of the kernel's own settings only those of this box's namespaces may
+// be written, and the one that only costs time.
+void protect_kernel_settings() {
+    const fs::path proc = kRoot / "proc";
+    for (const char *hosts : {"sys", "sysrq-trigger"}) {
+        if (fs::exists(proc / hosts)) {
+            bind_read_only(proc / hosts, proc / hosts);
+        }
+    }
+    for (const char *own : {"sys/net", "sys/kernel/hostname", "sys/kernel/domainname", "sys/vm/drop_caches"}) {
+        bind_writable(proc / own, proc / own);
+    }
+}
+
+void mount_kernel_directories(bool mapped) {
     for (const char *name : {"proc", "sys", "dev"}) {
         make_directories(kRoot / name);
     }
     mount_new("proc", kRoot / "proc", kKernelFlags);
     mount_new("sysfs", kRoot / "sys", kKernelFlags);
     mount_devices();
+    if (!mapped) {
+        protect_kernel_settings();
+    }
 }
 
 void mount_own_directories(const fs::path &run, const fs::path &tmp) {
@@ -196,16 +243,16 @@ void enter_private_root(const box_options &options, bool mapped) {
     require(mount("", "/", nullptr, MS_REC | MS_PRIVATE, nullptr) == 0, "cannot part from the host's mounts");
     const std::vector<host_directory> trees = open_directories(options.trees);
     const std::vector<host_directory> shares = open_directories(options.shares);
-    const std::vector<fs::path> points = directories_to_overlay();
+    const std::optional<host_directory> kept = temporary_working_directory();
+    std::vector<overlay> overlays = overlays_of_system();
 
     mount_new("tmpfs", kStage, MS_NODEV, "mode=755,size=" + options.size);
     for (const fs::path &directory : {kRoot, kUpper, kWork}) {
         make_directories(directory);
     }
     upper_layers layers(kUpper, kRoot);
-    std::vector<fs::path> uppers;
-    for (const fs::path &point : points) {
-        uppers.push_back(layers.add(point));
+    for (overlay &system : overlays) {
+        system.upper = layers.add(system.point);
     }
     const fs::path run = layers.add("/run");
     const fs::path tmp = layers.add("/tmp");
@@ -220,12 +267,14 @@ void enter_private_root(const box_options &options, bool mapped) {
     }
 
     bind_mount(kRoot, kRoot); // only a mount point can become the root
-    for (std::size_t i = 0; i < points.size(); ++i) {
-        make_directories(kRoot / points[i].relative_path());
-        mount_overlay(points[i], uppers[i], mapped);
+    for (const overlay &system : overlays) {
+        mount_overlay(system, mapped);
     }
-    mount_kernel_directories();
+    mount_kernel_directories(mapped);
     mount_own_directories(run, tmp);
+    if (kept) {
+        mount_overlay({kept->path, path_of(kept->fd), layers.add(kept->path)}, mapped);
+    }
     mount_shares(shares);
     change_root();
 }

@@ -31,8 +31,7 @@ bool enter_pid_namespace() {
     }
     const std::string uid = std::to_string(geteuid());
     const std::string gid = std::to_string(getegid());
-    require(unshare(CLONE_NEWUSER | CLONE_NEWPID) == 0,
-            "namespaces are refused here (a user namespace, not being root)");
+    require(unshare(CLONE_NEWUSER | CLONE_NEWPID) == 0, "cannot make a PID namespace, nor one in a user namespace");
     write_file("/proc/self/setgroups", "deny");
     write_file("/proc/self/uid_map", "0 " + uid + " 1");
     write_file("/proc/self/gid_map", "0 " + gid + " 1");
@@ -81,14 +80,17 @@ void supervisor::on_signal() {
     }
 }
 
-// The command stopped: so does kova-box, as if the terminal had stopped it, until a shell lets it go on.
+// The command stopped: so does kova-box, as if the terminal had stopped it, until a shell lets it go on. A command that
+// only wanted the terminal gets it when kova-box was brought to the foreground meanwhile.
 void supervisor::on_message() {
     char message = 0;
     if (read(channel_.get(), &message, 1) != 1 || message != kStopped) {
         return;
     }
-    take_terminal_back();
-    kill(0, SIGTSTP);
+    if (use_ == terminal_use::foreground || terminal_of_caller() != terminal_use::foreground) {
+        take_terminal_back();
+        kill(0, SIGTSTP);
+    }
     use_ = terminal_of_caller();
     const char answer = use_ == terminal_use::foreground ? kContinueForeground : kContinue;
     if (write(channel_.get(), &answer, 1) != 1) {

@@ -16,7 +16,8 @@ extern "C" {
 int KOVAHAIsRunning(void);
 /** @return 1 when this node is the active one, else 0 */
 int KOVAHAIsActive(void);
-/** Copies the heartbeat interface's name. @param cb at least 16. @return 0; -1 with 0xD00, or 0xBC00 when there is none */
+/** Copies the heartbeat interface's name. @param cb at least 16. @return 0; -1 with 0xD00, or 0xBC00 when there is none
+ */
 int KOVAHAGetHeartbeatIF(char *szIfname, int cb);
 /**
  * Copies the cluster address and mask of an interface.
@@ -25,7 +26,10 @@ int KOVAHAGetHeartbeatIF(char *szIfname, int cb);
  * @return 1 when it has one, 0 when not (both texts "")
  */
 int KOVAHAGetRelatedIFInfo(const char *szIfname, char *szIP, char *szMask);
-/** Copies the cluster hardware address of a card as "aa:bb:cc:dd:ee:ff". @return 0; -1 with 0xD00, or 0xBC00 when there is none */
+/**
+ * Copies the cluster hardware address of a card as "aa:bb:cc:dd:ee:ff".
+ * @return 0; -1 with 0xD00, or 0xBC00 when there is none
+ */
 int KOVAHAGetMac(int index, char *szMac, int cb);
 
 #ifdef __cplusplus

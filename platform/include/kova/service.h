@@ -1,7 +1,8 @@
 /**
  * @file
  * Service and job control. The work is done by the appliance's small scripts: /usr/kova/service/<name> with the verbs
- * "status" (exit 0: running) and "reload" (does not wait for the service), and /sbin/stop for jobs.
+ * "status" (exit 0: running) and "reload" (does not wait for the service), and /sbin/stop for jobs. Names consist of
+ * letters, digits and "_-.@+", begin with none of "." and "-", and have at most 64 characters.
  */
 #ifndef KOVA_SERVICE_H
 #define KOVA_SERVICE_H
@@ -11,9 +12,12 @@
 extern "C" {
 #endif
 
-/** Reloads a service ("ddns" ...). @return 0; -1 with 0xD00 (name), 0xBC00 (no such service) or 0x2A00 (the reload failed) */
+/**
+ * Reloads a service ("ddns" ...).
+ * @return 0; -1 with 0xD00 (name), 0xBC00 (no such service) or 0x2A00 (the reload failed)
+ */
 int KLIBServiceReload(const char *szService);
-/** @return 1 when a service runs, 0 when not; -1 with 0xD00 */
+/** @return 1 when a service runs, 0 when not, also when there is no such service; -1 with 0xD00 */
 int KLIBServiceIsRunning(const char *szService);
 /** Stops a job ("pppoerelay" ...). @return 0, also when it does not run; -1 with 0xD00 or 0x2A00 */
 int KLIBServicectlJobStop(const char *szJob);

@@ -1,0 +1,157 @@
+#include "kovacore/file_lock.h"
+
+#include <cstdio>
+#include <cstring>
+#include <fcntl.h>
+#include <sys/stat.h>
+#include <utility>
+
+#include "common/backoff.h"
+#include "common/fnv.h"
+#include "common/report.h"
+
+using namespace kova;
+
+namespace {
+
+constexpr const char *kLockDirectory = "/run/lock/kova";
+
+/** Opens the directory. /run/lock may be open to everybody: one that a stranger made in advance is not used. */
+unique_fd open_lock_directory() {
+    constexpr int kFlags = O_PATH | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC;
+    unique_fd directory{open(kLockDirectory, kFlags)};
+    if (!directory && errno == ENOENT) {
+        mkdir("/run/lock", 0755);
+        // the mode once more: the caller's mask must not keep readers out
+        if (mkdir(kLockDirectory, 0755) == 0)
+            chmod(kLockDirectory, 0755);
+        directory.reset(open(kLockDirectory, kFlags));
+    }
+    struct stat status;
+    if (directory && (fstat(directory.get(), &status) < 0 || (status.st_uid != 0 && status.st_uid != geteuid()))) {
+        errno = EPERM;
+        directory.reset();
+    }
+    return directory;
+}
+
+unique_fd create_lock_file(int directory, const char *name) {
+    unique_fd fd{openat(directory, name, O_RDWR | O_CREAT | O_NOFOLLOW | O_CLOEXEC, 0644)};
+    if (fd)
+        fchmod(fd.get(), 0644);
+    return fd;
+}
+
+struct flock describe(short type) {
+    struct flock lock = {};
+    lock.l_type = type;
+    lock.l_whence = SEEK_SET;
+    return lock;
+}
+
+/** The directory part made real, the file's own name behind it. */
+bool resolve_parent(const char *path, char (&resolved)[PATH_MAX]) {
+    const char *slash = strrchr(path, '/');
+    const char *name = slash != nullptr ? slash + 1 : path;
+    char parent[PATH_MAX] = ".";
+    if (slash == path)
+        strcpy(parent, "/");
+    else if (slash != nullptr)
+        *static_cast<char *>(mempcpy(parent, path, static_cast<size_t>(slash - path))) = '\0';
+
+    if (*name == '\0' || realpath(parent, resolved) == nullptr)
+        return false;
+    const size_t used = strcmp(resolved, "/") == 0 ? 0 : strlen(resolved);
+    const size_t left = sizeof resolved - used;
+    return static_cast<size_t>(snprintf(resolved + used, left, "/%s", name)) < left;
+}
+
+} // namespace
+
+unique_fd kova::open_lock_file(const char *name, lock_mode mode) {
+    const unique_fd directory = open_lock_directory();
+    if (!directory)
+        return {};
+    unique_fd fd{openat(directory.get(), name, O_RDWR | O_NOFOLLOW | O_CLOEXEC)};
+    if (!fd && errno == ENOENT)
+        fd = create_lock_file(directory.get(), name);
+    if (!fd && errno == EACCES && mode == lock_mode::kShared)
+        fd.reset(openat(directory.get(), name, O_RDONLY | O_NOFOLLOW | O_CLOEXEC));
+    return fd;
+}
+
+lock_result kova::try_lock(int fd, lock_mode mode) {
+    struct flock lock = describe(mode == lock_mode::kExclusive ? F_WRLCK : F_RDLCK);
+    if (fcntl(fd, F_OFD_SETLK, &lock) == 0)
+        return lock_result::kTaken;
+    return errno == EAGAIN || errno == EACCES || errno == EINTR ? lock_result::kBusy : lock_result::kFailed;
+}
+
+bool kova::lock_within(int fd, lock_mode mode, int seconds) {
+    backoff wait{int64_t{seconds} * 1000};
+    lock_result result;
+    do {
+        result = try_lock(fd, mode);
+    } while (result == lock_result::kBusy && wait.pause());
+    return result == lock_result::kTaken;
+}
+
+void kova::unlock(int fd) {
+    const errno_keeper keep;
+    struct flock lock = describe(F_UNLCK);
+    fcntl(fd, F_OFD_SETLK, &lock);
+}
+
+bool kova::resolve_path(const char *path, char (&resolved)[PATH_MAX]) {
+    if (strlen(path) >= PATH_MAX) {
+        errno = ENAMETOOLONG;
+        return false;
+    }
+    if (realpath(path, resolved) != nullptr)
+        return true;
+    if (errno != ENOENT || !resolve_parent(path, resolved))
+        return false;
+
+    // nothing is there, or a link to nothing: that one is followed to the file it would name
+    char target[PATH_MAX];
+    const ssize_t length = readlink(resolved, target, sizeof target - 1);
+    if (length < 0)
+        return errno == ENOENT;
+    target[length] = '\0';
+    char joined[PATH_MAX];
+    const char *slash = strrchr(resolved, '/');
+    const int directory = target[0] == '/' ? 0 : static_cast<int>(slash + 1 - resolved);
+    if (snprintf(joined, sizeof joined, "%.*s%s", directory, resolved, target) >= PATH_MAX)
+        return false;
+    return resolve_parent(joined, resolved);
+}
+
+unique_fd kova::open_lock_for(const char *kind, const char *resolved, lock_mode mode) {
+    char name[64];
+    snprintf(name, sizeof name, "%s-%016llx", kind, static_cast<unsigned long long>(fnv1a(resolved)));
+    return open_lock_file(name, mode);
+}
+
+int KLIBCFileLockTimeByFile(const char *szPath, int mode, int seconds, int *pFd) {
+    if (is_empty(szPath) || (mode != 0 && mode != 1) || seconds < 0 || pFd == nullptr)
+        return fail(HERE, kErrArgument);
+
+    *pFd = -1;
+    const lock_mode wanted = mode == 1 ? lock_mode::kExclusive : lock_mode::kShared;
+    char resolved[PATH_MAX];
+    if (!resolve_path(szPath, resolved))
+        return fail(HERE, kErrLock);
+    unique_fd fd = open_lock_for("file", resolved, wanted);
+    if (!fd || !lock_within(fd.get(), wanted, seconds))
+        return fail(HERE, kErrLock);
+    *pFd = fd.release();
+    return 0;
+}
+
+int KLIBCFileUnlockByFile(int fd) {
+    if (fd < 0 || fcntl(fd, F_GETFD) < 0)
+        return fail(HERE, kErrArgument), 0;
+    unlock(fd);
+    close(fd);
+    return 1;
+}

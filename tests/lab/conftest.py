@@ -1,0 +1,167 @@
+"""What the lab tests share. They run as root inside the box: on a private root with the appliance's files in place, wired
+to the network namespace "net", in which the servers and the other hosts live."""
+
+import os
+import pathlib
+import re
+import socket
+import subprocess
+import threading
+import time
+
+import pytest
+
+OTHER_SIDE = ("ip", "netns", "exec", "net")
+
+
+def pytest_runtest_setup():
+    if "KOVA_BOX" not in os.environ:
+        pytest.fail("lab tests write to /etc and /sbin: run them inside the box", pytrace=False)
+
+
+def wait_for(condition, limit=5.0, what="the condition"):
+    """The first true value of condition(); fails the test when it takes longer than limit seconds."""
+    end = time.monotonic() + limit
+    while True:
+        value = condition()
+        if value:
+            return value
+        if time.monotonic() > end:
+            pytest.fail(f"{what} did not come within {limit} s")
+        time.sleep(0.01)
+
+
+def run(*command, status=0, **options):
+    """Runs a command to its end, captures what it prints and checks its exit status (None: any)."""
+    options = {"capture_output": True, "text": True, "timeout": 30, **options}
+    done = subprocess.run([str(word) for word in command], check=False, **options)
+    assert status is None or done.returncode == status, f"{command}: {done.returncode}\n{done.stdout}{done.stderr}"
+    return done
+
+
+def on_other_side(*command, **options):
+    return run(*OTHER_SIDE, *command, **options)
+
+
+class Daemon:
+    """A process that serves a test: started, waited for until it is ready, ended by its pid."""
+
+    def __init__(self, command, ready, limit=5.0):
+        self.process = subprocess.Popen([str(word) for word in command], stdin=subprocess.DEVNULL)
+        try:
+            wait_for(lambda: self.is_ready(ready), limit, f"{command[0]}'s start")
+        except BaseException:
+            self.stop()
+            raise
+
+    def is_ready(self, ready):
+        assert self.process.poll() is None, f"ended with {self.process.returncode} before it was ready"
+        return ready()
+
+    def stop(self):
+        self.process.terminate()
+        try:
+            self.process.wait(5)
+        except subprocess.TimeoutExpired:
+            self.process.kill()
+            self.process.wait()
+
+    def __enter__(self):
+        return self
+
+    def __exit__(self, *_):
+        self.stop()
+
+
+class DhcpServer(Daemon):
+    """dnsmasq on the other side of a link: serves NETWORK.10 to NETWORK.20, has NETWORK.1 itself."""
+
+    def __init__(self, link, network, *more, folder):
+        on_other_side("ip", "addr", "replace", f"{network}.1/24", "dev", link)
+        self.log = folder / f"dnsmasq.{link}.log"
+        command = [
+            *OTHER_SIDE, "dnsmasq", "--keep-in-foreground", "--conf-file=/dev/null", f"--interface={link}",
+            "--bind-interfaces", f"--dhcp-range={network}.10,{network}.20,255.255.255.0,600", "--dhcp-authoritative",
+            "--no-ping", "--log-dhcp", "--user=root", "--group=root", "--port=0", f"--log-facility={self.log}",
+            f"--dhcp-leasefile={folder}/leases.{link}", f"--pid-file={folder}/dnsmasq.{link}.pid", *more,
+        ]  # fmt: skip
+        super().__init__(command, lambda: "sockets bound" in self.text())
+
+    def text(self):
+        return self.log.read_text() if self.log.exists() else ""
+
+
+class SystemLog:
+    """Listens on /dev/log and keeps every message, as "<priority>... text"."""
+
+    def __init__(self):
+        self.messages = []
+        self.socket = socket.socket(socket.AF_UNIX, socket.SOCK_DGRAM)
+        self.socket.bind("/dev/log")
+        self.thread = threading.Thread(target=self.receive)
+        self.thread.start()
+
+    def receive(self):
+        while message := self.socket.recv(65536):
+            self.messages.append(message.decode(errors="replace"))
+
+    def holds(self, text):
+        return any(text in message for message in self.messages)
+
+    def close(self):
+        with socket.socket(socket.AF_UNIX, socket.SOCK_DGRAM) as end:
+            end.sendto(b"", "/dev/log")
+        self.thread.join()
+        self.socket.close()
+        os.unlink("/dev/log")
+
+
+@pytest.fixture
+def system_log():
+    log = SystemLog()
+    yield log
+    log.close()
+
+
+def addresses(link):
+    """The IPv4 addresses of an interface, as "a.b.c.d/prefix"."""
+    return re.findall(r"inet (\S+)", run("ip", "-4", "addr", "show", "dev", link).stdout)
+
+
+def routes(*selection):
+    return [line.strip() for line in run("ip", "-4", "route", "show", *selection).stdout.splitlines()]
+
+
+def is_up(link):
+    return bool(int(pathlib.Path(f"/sys/class/net/{link}/flags").read_text(), 16) & 1)
+
+
+def processes(text):
+    """Pids of the living processes whose command line holds a text, and of the zombies none."""
+    found = []
+    for folder in pathlib.Path("/proc").glob("[0-9]*"):
+        try:
+            if text in (folder / "cmdline").read_bytes().replace(b"\0", b" ").decode(errors="replace"):
+                found.append(int(folder.name))
+        except (FileNotFoundError, ProcessLookupError):
+            continue
+    return found
+
+
+@pytest.fixture
+def keep():
+    """keep(path): gives a file its text and mode back, or its absence, when the test ends."""
+    kept = []
+
+    def remember(path):
+        path = pathlib.Path(path)
+        kept.append((path, (path.read_bytes(), path.stat().st_mode) if path.exists() else None))
+        return path
+
+    yield remember
+    for path, before in reversed(kept):
+        if before is None:
+            path.unlink(missing_ok=True)
+        else:
+            path.write_bytes(before[0])
+            path.chmod(before[1])
