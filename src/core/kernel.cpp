@@ -1,11 +1,11 @@
 #include "core/kernel.h"
 
+#include <arpa/inet.h>
 #include <cstring>
 #include <kovanetsdk/core.h>
 #include <linux/ethtool.h>
 #include <linux/if_vlan.h>
 #include <linux/sockios.h>
-#include <netinet/in.h>
 #include <sys/ioctl.h>
 #include <sys/socket.h>
 
@@ -140,6 +140,11 @@ int interface_socket::ethernet_link(const char *szIfname, bool &has_link) const 
 
 uint32_t request_code(int error) {
     return error == ENODEV ? NET_ERR_SOCKET : NET_ERR_IOCTL;
+}
+
+void write_address(uint32_t address, address_text &text) {
+    const in_addr binary{address};
+    inet_ntop(AF_INET, &binary, text, sizeof text);
 }
 
 } // namespace kova

@@ -8,6 +8,7 @@
 
 #include <cstdint>
 #include <net/if.h>
+#include <netinet/in.h>
 
 namespace kova {
 
@@ -45,8 +46,14 @@ private:
     descriptor socket_;
 };
 
-/** Error code of a request that failed: NET_ERR_SOCKET when the kernel does not know the interface, else NET_ERR_IOCTL.
- */
+/** Answers of KLIBNetOVSIfIsMaster: no interface of the virtual switch, one over a single port, a bond. */
+enum ovs_role { kOvsNone = 0, kOvsPort = 1, kOvsBond = 2 };
+
+/** Error code for the errno of a failed request: whether the interface is unknown or the request failed. */
 [[nodiscard]] uint32_t request_code(int error);
+
+/** An address in network byte order as dotted text. */
+using address_text = char[INET_ADDRSTRLEN];
+void write_address(uint32_t address, address_text &text);
 
 } // namespace kova

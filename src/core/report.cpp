@@ -99,6 +99,14 @@ int fail_quietly(const place &at, uint32_t code, int result) {
     return result;
 }
 
+int fail_lock(const place &at, int result) {
+    return fail(at, NET_ERR_LOCK, result, "KLIBCFileLock() failed.(%X)", KLIBCErrGet());
+}
+
+int fail_socket(const place &at, int result) {
+    return fail(at, NET_ERR_SOCKET, result, "Cannot open control socket");
+}
+
 bool refuses(const place &at, bool holds, const char *condition) {
     if (!holds) {
         fail(at, NET_ERR_BAD_PARAMETER, 0, "Invaild Argument (%s)=[%d]\n", condition, 0);

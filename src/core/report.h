@@ -72,6 +72,12 @@ struct place {
 /** Sets the register and gives the result back, without a log line. */
 int fail_quietly(const place &at, uint32_t code, int result);
 
+/** The configuration lock could not be had: logs the code of the lock and sets NET_ERR_LOCK. */
+int fail_lock(const place &at, int result);
+
+/** A socket for interface requests could not be had. */
+int fail_socket(const place &at, int result);
+
 /**
  * Argument checks: log "Invaild Argument" with the condition that had to hold, set NET_ERR_BAD_PARAMETER and answer
  * true when the argument is to be refused.

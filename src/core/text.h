@@ -7,6 +7,7 @@
 #include <cstdarg>
 #include <cstddef>
 #include <cstdio>
+#include <cstring>
 #include <kova/core.h>
 
 namespace kova {
@@ -34,7 +35,15 @@ using path_text = built_text<512>;
 
 /** Copies a text into a field, cut to it. */
 template<size_t Size> void copy_text(char (&field)[Size], const char *text) {
-    snprintf(field, Size, "%s", text);
+    const size_t length = strnlen(text, Size - 1);
+    memcpy(field, text, length);
+    field[length] = '\0';
 }
+
+/** Copies a text whole, or leaves "" and answers false when it does not fit; the size is above 0. */
+[[nodiscard]] bool copy_whole(char *out, int size, const char *text);
+
+/** Cuts a text up at any of the delimiters and appends the words to a list. @return their number, -1 for no memory */
+[[nodiscard]] int split(char *text, const char *delimiters, KLIBSZLIST *words);
 
 } // namespace kova
