@@ -483,6 +483,9 @@ int note_sleep(const timespec *wanted) {
     const long ms = wanted->tv_sec * 1000 + wanted->tv_nsec / 1000000;
     current_rig->slept_ms += ms;
     current_rig->now.sleeps.push_back(ms);
+    if (current_rig->during_sleep) {
+        current_rig->during_sleep(ms);
+    }
     return 0;
 }
 
