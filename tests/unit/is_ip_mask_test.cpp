@@ -49,10 +49,7 @@ TEST_F(is_ip_mask, BlKLIBIsIpMask_noMask_isRefusedAndLeft) {
 
 TEST_F(is_ip_mask, BlKLIBIsIpMask_null_isRefused) {
     EXPECT_OUTCOME(rig.observe([] { return BlKLIBIsIpMask(nullptr); }),
-                   {.result = 0,
-                    .code = 0xD00,
-                    .unit = "is_ip_mask",
-                    .log = {"ERR is_ip_mask:N Invaild Argument (((void *)0) != szMask)=[0]"}});
+                   refusal("is_ip_mask", "((void *)0) != szMask", 0));
 }
 
 } // namespace

@@ -33,10 +33,7 @@ protected:
     }
 
     void expect_refused(const outcome &got, const std::string &condition) {
-        EXPECT_OUTCOME(got, {.result = -1,
-                             .code = 0xD00,
-                             .unit = "net_ip_change_pre_hook",
-                             .log = {"ERR net_ip_change_pre_hook:N Invaild Argument (" + condition + ")=[0]"}});
+        EXPECT_OUTCOME(got, refusal("net_ip_change_pre_hook", condition));
     }
 };
 
