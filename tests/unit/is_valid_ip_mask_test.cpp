@@ -58,9 +58,9 @@ TEST_F(is_valid_ip_mask, BlKLIBIsValidIpMask_badMask_isRefused) {
 }
 
 TEST_F(is_valid_ip_mask, BlKLIBIsValidIpMask_longMask_isCutTo19Characters) {
-    EXPECT_OUTCOME(ask("10.0.0.1", "000000255.255.255.0"), {.result = 1});
-    EXPECT_OUTCOME(ask("10.0.0.1", "000000255.255.255.0.and more"), {.result = 1});
-    EXPECT_OUTCOME(ask("10.0.0.1", "0000000255.255.255.0"), {.result = 0, .code = 0x1000, .unit = "is_ip_mask"});
+    EXPECT_OUTCOME(ask("10.0.0.1", "000000377.255.255.0"), {.result = 1});
+    EXPECT_OUTCOME(ask("10.0.0.1", "000000377.255.255.0.and more"), {.result = 1});
+    EXPECT_OUTCOME(ask("10.0.0.1", "0000000377.255.255.0"), {.result = 0, .code = 0x1000, .unit = "is_ip_mask"});
 }
 
 TEST_F(is_valid_ip_mask, BlKLIBIsValidIpMask_null_isRefused) {
