@@ -44,11 +44,7 @@ TEST_F(cal_mask, cKLIBICalMask_gapOrPartAbove255_setsCode) {
 }
 
 TEST_F(cal_mask, cKLIBICalMask_null_isRefused) {
-    EXPECT_OUTCOME(rig.observe([] { return cKLIBICalMask(nullptr); }),
-                   {.result = 0,
-                    .code = 0xD00,
-                    .unit = "cal_mask",
-                    .log = {"ERR cal_mask:N Invaild Argument (NULL != rgPart)=[0]"}});
+    EXPECT_OUTCOME(rig.observe([] { return cKLIBICalMask(nullptr); }), refusal("cal_mask", "NULL != rgPart", 0));
 }
 
 } // namespace

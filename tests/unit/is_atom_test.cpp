@@ -31,11 +31,7 @@ TEST_F(is_atom, BlKLIBIsAtom_emptyAndLongTexts) {
 }
 
 TEST_F(is_atom, BlKLIBIsAtom_null_isRefused) {
-    EXPECT_OUTCOME(rig.observe([] { return BlKLIBIsAtom(nullptr); }),
-                   {.result = 0,
-                    .code = 0xD00,
-                    .unit = "is_atom",
-                    .log = {"ERR is_atom:N Invaild Argument (((void *)0) != szAtom)=[0]"}});
+    EXPECT_OUTCOME(rig.observe([] { return BlKLIBIsAtom(nullptr); }), refusal("is_atom", "((void *)0) != szAtom", 0));
 }
 
 TEST_F(is_atom, BlKLIBIsDomain_everyLabelAnAtom_isAccepted) {
@@ -63,10 +59,7 @@ TEST_F(is_atom, BlKLIBIsDomain_overLongText_looksAt511Characters) {
 
 TEST_F(is_atom, BlKLIBIsDomain_null_isRefused) {
     EXPECT_OUTCOME(rig.observe([] { return BlKLIBIsDomain(nullptr); }),
-                   {.result = 0,
-                    .code = 0xD00,
-                    .unit = "is_atom",
-                    .log = {"ERR is_atom:N Invaild Argument (((void *)0) != szDomain)=[0]"}});
+                   refusal("is_atom", "((void *)0) != szDomain", 0));
 }
 
 } // namespace

@@ -39,10 +39,7 @@ TEST_F(is_hostname, BlKLIBIsHostname_length_isAtMost15) {
 
 TEST_F(is_hostname, BlKLIBIsHostname_null_isRefused) {
     EXPECT_OUTCOME(rig.observe([] { return BlKLIBIsHostname(nullptr); }),
-                   {.result = 0,
-                    .code = 0xD00,
-                    .unit = "is_hostname",
-                    .log = {"ERR is_hostname:N Invaild Argument (((void *)0) != szHostname)=[0]"}});
+                   refusal("is_hostname", "((void *)0) != szHostname", 0));
 }
 
 } // namespace

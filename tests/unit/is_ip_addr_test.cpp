@@ -58,10 +58,7 @@ TEST_F(is_ip_addr, BlKLIBIsIpAddr_success_keepsEarlierCode) {
 
 TEST_F(is_ip_addr, BlKLIBIsIpAddr_null_isRefused) {
     EXPECT_OUTCOME(rig.observe([] { return BlKLIBIsIpAddr(nullptr); }),
-                   {.result = 0,
-                    .code = 0xD00,
-                    .unit = "is_ip_addr",
-                    .log = {"ERR is_ip_addr:N Invaild Argument (((void *)0) != szIP)=[0]"}});
+                   refusal("is_ip_addr", "((void *)0) != szIP", 0));
 }
 
 } // namespace

@@ -53,10 +53,7 @@ TEST_F(is_v6_ip_addr_valid, BlKLIBIsv6IpAddrValid_overLongText_isRefused) {
 
 TEST_F(is_v6_ip_addr_valid, BlKLIBIsv6IpAddrValid_null_isRefused) {
     EXPECT_OUTCOME(rig.observe([] { return BlKLIBIsv6IpAddrValid(nullptr); }),
-                   {.result = 0,
-                    .code = 0xD00,
-                    .unit = "is_v6_ip_addr_valid",
-                    .log = {"ERR is_v6_ip_addr_valid:N Invaild Argument (((void *)0) != szV6IPAddr)=[0]"}});
+                   refusal("is_v6_ip_addr_valid", "((void *)0) != szV6IPAddr", 0));
 }
 
 } // namespace

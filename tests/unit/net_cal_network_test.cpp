@@ -95,11 +95,7 @@ TEST_F(net_cal_network, KOVANetCalNetwork_toolNotStarted_failsNamingTheBroadcast
 TEST_F(net_cal_network, KOVANetCalNetwork_badArgument_isRefused) {
     char out[16];
     const auto expect_refused = [&](const std::function<long()> &refused, const std::string &condition) {
-        EXPECT_OUTCOME(rig.observe(refused),
-                       {.result = -1,
-                        .code = 0xD00,
-                        .unit = "net_cal_network",
-                        .log = {"ERR net_cal_network:N Invaild Argument (" + condition + ")=[0]"}});
+        EXPECT_OUTCOME(rig.observe(refused), refusal("net_cal_network", condition));
     };
     expect_refused([&] { return KOVANetCalNetwork(nullptr, out, 16); }, "((void *)0) != szSubnet");
     expect_refused([&] { return KOVANetCalNetwork("", out, 16); }, "'\\0' != *szSubnet");

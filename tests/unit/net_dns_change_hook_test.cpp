@@ -79,10 +79,7 @@ TEST_F(net_dns_change_hook, KOVANetDNSChangeHook_actionFails_fails) {
 
 TEST_F(net_dns_change_hook, KOVANetDNSChangeHook_null_isRefused) {
     EXPECT_OUTCOME(rig.observe([] { return KOVANetDNSChangeHook(4, nullptr); }),
-                   {.result = -1,
-                    .code = 0xD00,
-                    .unit = "net_dns_change_hook",
-                    .log = {"ERR net_dns_change_hook:N Invaild Argument (NULL != pDnsList)=[0]"}});
+                   refusal("net_dns_change_hook", "NULL != pDnsList"));
 }
 
 } // namespace

@@ -84,16 +84,9 @@ TEST_F(net_dns_config_change_hook, KOVANetDnsConfigChangeHook_actionFails_fails)
 }
 
 TEST_F(net_dns_config_change_hook, KOVANetDnsConfigChangeHook_null_isRefused) {
-    EXPECT_OUTCOME(raise(4, nullptr, two),
-                   {.result = -1,
-                    .code = 0xD00,
-                    .unit = "net_dns_config_change_hook",
-                    .log = {"ERR net_dns_config_change_hook:N Invaild Argument (((void *)0) != szInterface)=[0]"}});
+    EXPECT_OUTCOME(raise(4, nullptr, two), refusal("net_dns_config_change_hook", "((void *)0) != szInterface"));
     EXPECT_OUTCOME(rig.observe([] { return KOVANetDnsConfigChangeHook(4, "", nullptr); }),
-                   {.result = -1,
-                    .code = 0xD00,
-                    .unit = "net_dns_config_change_hook",
-                    .log = {"ERR net_dns_config_change_hook:N Invaild Argument (NULL != pDnsList)=[0]"}});
+                   refusal("net_dns_config_change_hook", "NULL != pDnsList"));
 }
 
 } // namespace

@@ -65,11 +65,7 @@ TEST_F(net_gateway_config_change_hook, KOVANetGatewayConfigChangeHook_actionFail
 
 TEST_F(net_gateway_config_change_hook, KOVANetGatewayConfigChangeHook_null_isRefused) {
     const auto expect_refused = [&](const outcome &got, const std::string &name) {
-        EXPECT_OUTCOME(
-            got, {.result = -1,
-                  .code = 0xD00,
-                  .unit = "net_gateway_config_change_hook",
-                  .log = {"ERR net_gateway_config_change_hook:N Invaild Argument (((void *)0) != " + name + ")=[0]"}});
+        EXPECT_OUTCOME(got, refusal("net_gateway_config_change_hook", "((void *)0) != " + name));
     };
     expect_refused(raise(4, nullptr, "eth0", "", ""), "szType");
     expect_refused(raise(4, "set", nullptr, "", ""), "szInterface");

@@ -36,10 +36,7 @@ TEST_F(net_get_addr_type, KOVANetGetAddrType_neither_gives0WithoutCode) {
 
 TEST_F(net_get_addr_type, KOVANetGetAddrType_null_isRefused) {
     EXPECT_OUTCOME(rig.observe([] { return KOVANetGetAddrType(nullptr); }),
-                   {.result = 0,
-                    .code = 0xD00,
-                    .unit = "net_get_addr_type",
-                    .log = {"ERR net_get_addr_type:N Invaild Argument (((void *)0) != szIP)=[0]"}});
+                   refusal("net_get_addr_type", "((void *)0) != szIP", 0));
 }
 
 } // namespace

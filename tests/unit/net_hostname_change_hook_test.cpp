@@ -37,11 +37,7 @@ TEST_F(net_hostname_change_hook, KOVANetHostnameChangeHook_anyStepFails_fails) {
 }
 
 TEST_F(net_hostname_change_hook, KOVANetHostnameChangeHook_null_isRefused) {
-    EXPECT_OUTCOME(raise(nullptr),
-                   {.result = -1,
-                    .code = 0xD00,
-                    .unit = "net_hostname_change_hook",
-                    .log = {"ERR net_hostname_change_hook:N Invaild Argument (((void *)0) != szHostname)=[0]"}});
+    EXPECT_OUTCOME(raise(nullptr), refusal("net_hostname_change_hook", "((void *)0) != szHostname"));
 }
 
 } // namespace

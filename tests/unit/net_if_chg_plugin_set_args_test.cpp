@@ -57,10 +57,7 @@ TEST_F(net_if_chg_plugin_set_args, KLIBNetIFChgPluginSetArgs_missingArgument_isR
     const auto expect_refused = [&](uint64_t handle, const char *const *origin, const char *const *changed,
                                     const std::string &condition) {
         EXPECT_OUTCOME(rig.observe([&] { return KLIBNetIFChgPluginSetArgs(handle, origin, 1, changed, 1, 0); }),
-                       {.result = -1,
-                        .code = 0xD00,
-                        .unit = "net_if_chg_plugin_set_args",
-                        .log = {"ERR net_if_chg_plugin_set_args:N Invaild Argument (" + condition + ")=[0]"}});
+                       refusal("net_if_chg_plugin_set_args", condition));
     };
     expect_refused(0, kOld, kNew, "0 != hPlugin");
     expect_refused(1, nullptr, kNew, "NULL != rgszOrigin");

@@ -45,10 +45,7 @@ TEST_F(net_is_private_ip, KOVANetIsPrivateIP_noAddress_keepsCodeOfTheParser) {
 
 TEST_F(net_is_private_ip, KOVANetIsPrivateIP_null_isRefused) {
     EXPECT_OUTCOME(rig.observe([] { return KOVANetIsPrivateIP(nullptr); }),
-                   {.result = 0,
-                    .code = 0xD00,
-                    .unit = "net_is_private_ip",
-                    .log = {"ERR net_is_private_ip:N Invaild Argument (((void *)0) != szIP)=[0]"}});
+                   refusal("net_is_private_ip", "((void *)0) != szIP", 0));
 }
 
 } // namespace

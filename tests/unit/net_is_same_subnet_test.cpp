@@ -59,10 +59,7 @@ TEST_F(net_is_same_subnet, KOVANetIsSameSubnet_null_isRefused) {
     const char *const ip = "10.0.0.1";
     const auto expect_refused = [&](const char *ip1, const char *ip2, const char *mask, const std::string &name) {
         EXPECT_OUTCOME(rig.observe([&] { return KOVANetIsSameSubnet(ip1, ip2, mask); }),
-                       {.result = 0,
-                        .code = 0xD00,
-                        .unit = "net_is_same_subnet",
-                        .log = {"ERR net_is_same_subnet:N Invaild Argument (((void *)0) != " + name + ")=[0]"}});
+                       refusal("net_is_same_subnet", "((void *)0) != " + name, 0));
     };
     expect_refused(nullptr, ip, ip, "szIP1");
     expect_refused(ip, nullptr, ip, "szIP2");

@@ -52,16 +52,8 @@ TEST_F(net_mtu_change_hook, KOVANetMTUChangeHook_actionFails_fails) {
 }
 
 TEST_F(net_mtu_change_hook, KOVANetMTUChangeHook_null_isRefused) {
-    EXPECT_OUTCOME(raise(nullptr, "9000"),
-                   {.result = -1,
-                    .code = 0xD00,
-                    .unit = "net_mtu_change_hook",
-                    .log = {"ERR net_mtu_change_hook:N Invaild Argument (((void *)0) != szIfname)=[0]"}});
-    EXPECT_OUTCOME(raise("eth0", nullptr),
-                   {.result = -1,
-                    .code = 0xD00,
-                    .unit = "net_mtu_change_hook",
-                    .log = {"ERR net_mtu_change_hook:N Invaild Argument (((void *)0) != szMTU)=[0]"}});
+    EXPECT_OUTCOME(raise(nullptr, "9000"), refusal("net_mtu_change_hook", "((void *)0) != szIfname"));
+    EXPECT_OUTCOME(raise("eth0", nullptr), refusal("net_mtu_change_hook", "((void *)0) != szMTU"));
 }
 
 } // namespace

@@ -104,15 +104,9 @@ TEST_F(net_sep_ip, cKLIBISepIP_overLongText_looksAt31Characters) {
 TEST_F(net_sep_ip, cKLIBISepIP_nullArgument_isRefused) {
     uint32_t part[4];
     EXPECT_OUTCOME(rig.observe([&] { return cKLIBISepIP(nullptr, part); }),
-                   {.result = 0,
-                    .code = 0xD00,
-                    .unit = "net_sep_ip",
-                    .log = {"ERR net_sep_ip:N Invaild Argument (((void *)0) != szIP)=[0]"}});
+                   refusal("net_sep_ip", "((void *)0) != szIP", 0));
     EXPECT_OUTCOME(rig.observe([&] { return cKLIBISepIP("1.2.3.4", nullptr); }),
-                   {.result = 0,
-                    .code = 0xD00,
-                    .unit = "net_sep_ip",
-                    .log = {"ERR net_sep_ip:N Invaild Argument (NULL != rgPart)=[0]"}});
+                   refusal("net_sep_ip", "NULL != rgPart", 0));
 }
 
 } // namespace

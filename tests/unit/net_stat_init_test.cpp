@@ -80,15 +80,9 @@ TEST_F(net_stat_init, KLIBNetStatInit_count_givesZeroedValidRecords) {
 
 TEST_F(net_stat_init, KLIBNetStatInit_badCount_isRefused) {
     const auto make = [&](int count) { return rig.observe([&] { return KLIBNetStatInit(count) == nullptr ? 0 : 1; }); };
-    EXPECT_OUTCOME(make(0), {.result = 0,
-                             .code = 0xD00,
-                             .unit = "net_stat_init",
-                             .log = {"ERR net_stat_init:N Invaild Argument (0 != nItem)=[0]"}});
+    EXPECT_OUTCOME(make(0), refusal("net_stat_init", "0 != nItem", 0));
     for (const int count : {-1, -64, INT_MIN}) {
-        EXPECT_OUTCOME(make(count), {.result = 0,
-                                     .code = 0xD00,
-                                     .unit = "net_stat_init",
-                                     .log = {"ERR net_stat_init:N Invaild Argument (0 < nItem)=[0]"}});
+        EXPECT_OUTCOME(make(count), refusal("net_stat_init", "0 < nItem", 0));
     }
 }
 
@@ -292,16 +286,10 @@ TEST_F(net_stat_init, KLIBNetStatGetAll_readError_fails) {
 TEST_F(net_stat_init, KLIBNetStatGetAll_badArgument_isRefused) {
     NETSTAT record = {};
     EXPECT_OUTCOME(rig.observe([] { return KLIBNetStatGetAll(nullptr, 64); }),
-                   {.result = -1,
-                    .code = 0xD00,
-                    .unit = "net_stat_init",
-                    .log = {"ERR net_stat_init:N Invaild Argument (NULL != pStat)=[0]"}});
+                   refusal("net_stat_init", "NULL != pStat"));
     for (const int capacity : {0, -1, INT_MIN}) {
         EXPECT_OUTCOME(rig.observe([&] { return KLIBNetStatGetAll(&record, capacity); }),
-                       {.result = -1,
-                        .code = 0xD00,
-                        .unit = "net_stat_init",
-                        .log = {"ERR net_stat_init:N Invaild Argument (0 < nItem)=[0]"}});
+                       refusal("net_stat_init", "0 < nItem"));
     }
 }
 
@@ -364,10 +352,7 @@ TEST_F(net_stat_init, KLIBNetStatGetSingle_badArgument_isRefused) {
     NETSTAT record = {};
     const auto expect_refused = [&](const char *name, NETSTAT *out, const std::string &condition) {
         EXPECT_OUTCOME(rig.observe([&] { return KLIBNetStatGetSingle(name, out); }),
-                       {.result = -1,
-                        .code = 0xD00,
-                        .unit = "net_stat_init",
-                        .log = {"ERR net_stat_init:N Invaild Argument (" + condition + ")=[0]"}});
+                       refusal("net_stat_init", condition));
     };
     expect_refused(nullptr, &record, "((void *)0) != szIfname");
     expect_refused("", &record, "'\\0' != *szIfname");

@@ -92,17 +92,10 @@ TEST_F(subnet_to_ip_mask, ErrKLIBSubnetToIpMask_overLongText_isRefused) {
 
 TEST_F(subnet_to_ip_mask, ErrKLIBSubnetToIpMask_nullOrNoSlash_isRefused) {
     EXPECT_OUTCOME(rig.observe([] { return ErrKLIBSubnetToIpMask(nullptr, nullptr); }),
-                   {.result = -1,
-                    .code = 0xD00,
-                    .unit = "subnet_to_ip_mask",
-                    .log = {"ERR subnet_to_ip_mask:N Invaild Argument (((void *)0) != szSubnet)=[0]"}});
+                   refusal("subnet_to_ip_mask", "((void *)0) != szSubnet"));
     for (const std::string &text : {std::string(), std::string("10.0.0.1"), long_text(4096)}) {
-        EXPECT_OUTCOME(
-            convert(ErrKLIBSubnetToIpMask, text),
-            {.result = -1,
-             .code = 0xD00,
-             .unit = "subnet_to_ip_mask",
-             .log = {"ERR subnet_to_ip_mask:N Invaild Argument (((void *)0) != strchr(szSubnet, '/'))=[0]"}});
+        EXPECT_OUTCOME(convert(ErrKLIBSubnetToIpMask, text),
+                       refusal("subnet_to_ip_mask", "((void *)0) != strchr(szSubnet, '/')"));
         EXPECT_EQ("before", output);
     }
 }
@@ -140,17 +133,10 @@ TEST_F(subnet_to_ip_mask, ErrKLIBIpMaskToSubnet_overLongText_isRefused) {
 
 TEST_F(subnet_to_ip_mask, ErrKLIBIpMaskToSubnet_nullOrNoSlash_isRefused) {
     EXPECT_OUTCOME(rig.observe([] { return ErrKLIBIpMaskToSubnet(nullptr, nullptr); }),
-                   {.result = -1,
-                    .code = 0xD00,
-                    .unit = "subnet_to_ip_mask",
-                    .log = {"ERR subnet_to_ip_mask:N Invaild Argument (((void *)0) != szIpMask)=[0]"}});
+                   refusal("subnet_to_ip_mask", "((void *)0) != szIpMask"));
     for (const std::string &text : {std::string(), std::string("10.0.0.1"), long_text(4096)}) {
-        EXPECT_OUTCOME(
-            convert(ErrKLIBIpMaskToSubnet, text),
-            {.result = -1,
-             .code = 0xD00,
-             .unit = "subnet_to_ip_mask",
-             .log = {"ERR subnet_to_ip_mask:N Invaild Argument (((void *)0) != strchr(szIpMask, '/'))=[0]"}});
+        EXPECT_OUTCOME(convert(ErrKLIBIpMaskToSubnet, text),
+                       refusal("subnet_to_ip_mask", "((void *)0) != strchr(szIpMask, '/')"));
         EXPECT_EQ("before", output);
     }
 }
