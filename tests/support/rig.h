@@ -30,13 +30,13 @@ using texts = std::vector<std::string>;
 /** Everything that one call did. Fields left out of an expectation are expected empty. */
 struct outcome {
     long result = 0;
-    unsigned code = 0;        ///< error register; 0 when the call did not touch it
-    std::string unit;         ///< unit in the register
-    texts log;                ///< "ERR net_set_ip:N flush ip failed": level, then the line with its line numbers as N
-    texts commands;           ///< "/sbin/ip -4 address flush dev eth0"
-    texts events;             ///< "net/ipv4_change 4 IFNAME=eth0 ...": event, phase, arguments in order
-    texts locks;              ///< "+0x105", "-0x100" in order, "file+PATH" and "file-" for locks by file
-    std::vector<long> sleeps; ///< milliseconds asked for, each
+    unsigned code = 0;          ///< error register; 0 when the call did not touch it
+    std::string unit{};         ///< unit in the register
+    texts log{};                ///< "ERR net_set_ip:N flush ip failed": level, then the line with its line numbers as N
+    texts commands{};           ///< "/sbin/ip -4 address flush dev eth0"
+    texts events{};             ///< "net/ipv4_change 4 IFNAME=eth0 ...": event, phase, arguments in order
+    texts locks{};              ///< "+0x105", "-0x100" in order, "file+PATH" and "file-" for locks by file
+    std::vector<long> sleeps{}; ///< milliseconds asked for, each
 
     [[nodiscard]] std::string str() const;
     bool operator==(const outcome &) const = default;
@@ -47,7 +47,7 @@ outcome refusal(const std::string &unit, const std::string &condition, long resu
 
 /** Compares outcomes as texts, so that a difference is shown line by line. */
 void expect_outcome(const char *file, int line, const outcome &got, const outcome &expected);
-#define EXPECT_OUTCOME(got, ...) ::kova_test::expect_outcome(__FILE__, __LINE__, got, ::kova_test::outcome __VA_ARGS__)
+#define EXPECT_OUTCOME(got, ...) ::kova_test::expect_outcome(__FILE__, __LINE__, got, __VA_ARGS__)
 
 /** Stands in for ioctl: nothing to let the kernel answer. */
 using ioctl_answer = std::function<std::optional<int>(unsigned long request, void *argument)>;
