@@ -2,7 +2,6 @@
 
 #include "core/guards.h"
 #include "core/report.h"
-#include "core/text.h"
 
 #include <algorithm>
 #include <cstdlib>
@@ -19,6 +18,15 @@ bool is_digit(char c) {
     return c >= '0' && c <= '9';
 }
 
+/** The number that begins a rest of a name, of at most 15 digits. */
+uint64_t read_number(const char *digits) {
+    uint64_t number = 0;
+    for (; is_digit(*digits); ++digits) {
+        number = number * 10 + static_cast<uint64_t>(*digits - '0');
+    }
+    return number;
+}
+
 /** Natural order: eth2 before eth10. */
 bool is_before(const NETSTAT &left, const NETSTAT &right) {
     const char *a = left.szIfname;
@@ -28,8 +36,8 @@ bool is_before(const NETSTAT &left, const NETSTAT &right) {
         ++b;
     }
     if (is_digit(*a) && is_digit(*b)) {
-        const unsigned long long number_a = strtoull(a, nullptr, 10);
-        const unsigned long long number_b = strtoull(b, nullptr, 10);
+        const uint64_t number_a = read_number(a);
+        const uint64_t number_b = read_number(b);
         if (number_a != number_b) {
             return number_a < number_b;
         }
@@ -91,7 +99,7 @@ int read_records(FILE *file, NETSTAT *pStat, int nItem, bool &is_whole) {
         NETSTAT &record = pStat[filled++];
         record = {};
         record.blValid = 1;
-        copy_text(record.szIfname, szIfname);
+        memcpy(record.szIfname, szIfname, strnlen(szIfname, sizeof record.szIfname - 1));
         read_counters(colon + 1, record);
     }
     return filled;

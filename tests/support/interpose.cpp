@@ -563,18 +563,39 @@ bool is_memory_failing(const char *operation, const void *caller) {
     return true;
 }
 
+/** The C library's call under its public name, which is the one that a memory checker watches. */
+template<typename Function> Function *allocator(Function *&found, Function *while_looking, const char *name) {
+    static bool is_looking = false;
+    if (found == nullptr && !is_looking) {
+        is_looking = true;
+        found = real<Function *>(name);
+        is_looking = false;
+    }
+    return found != nullptr ? found : while_looking;
+}
+
+void *(*next_malloc)(size_t);
+void *(*next_calloc)(size_t, size_t);
+void *(*next_realloc)(void *, size_t);
+
 } // namespace
 
 extern "C" void *malloc(size_t size) noexcept {
-    return is_memory_failing("malloc", __builtin_return_address(0)) ? nullptr : __libc_malloc(size);
+    return is_memory_failing("malloc", __builtin_return_address(0))
+               ? nullptr
+               : allocator(next_malloc, __libc_malloc, "malloc")(size);
 }
 
 extern "C" void *calloc(size_t number, size_t size) noexcept {
-    return is_memory_failing("calloc", __builtin_return_address(0)) ? nullptr : __libc_calloc(number, size);
+    return is_memory_failing("calloc", __builtin_return_address(0))
+               ? nullptr
+               : allocator(next_calloc, __libc_calloc, "calloc")(number, size);
 }
 
 extern "C" void *realloc(void *block, size_t size) noexcept {
-    return is_memory_failing("realloc", __builtin_return_address(0)) ? nullptr : __libc_realloc(block, size);
+    return is_memory_failing("realloc", __builtin_return_address(0))
+               ? nullptr
+               : allocator(next_realloc, __libc_realloc, "realloc")(block, size);
 }
 
 #endif
