@@ -118,6 +118,11 @@ kept_file::~kept_file() {
 
 } // namespace kova_test
 
+/** For a sanitizer build: memory that runs out is something to test, not an error. */
+extern "C" const char *__asan_default_options() {
+    return "allocator_may_return_null=1";
+}
+
 int main(int argc, char **argv) {
     if (getenv("KOVA_BOX") == nullptr) {
         fprintf(stderr, "These tests write to /etc and /run: run them inside the box, as ./test does.\n");

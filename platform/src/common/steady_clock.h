@@ -10,7 +10,7 @@ namespace kova {
 inline int64_t steady_ms() {
     timespec time = {};
     clock_gettime(CLOCK_MONOTONIC, &time);
-    return int64_t{time.tv_sec} * 1000 + time.tv_nsec / (1000 * 1000);
+    return int64_t{time.tv_sec} * 1000 + time.tv_nsec / 1000000;
 }
 
 } // namespace kova

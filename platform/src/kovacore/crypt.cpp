@@ -17,7 +17,6 @@ namespace {
 
 constexpr const char *kKeyDirectory = "/etc/kova";
 constexpr const char *kKeyFile = "/etc/kova/secret.key";
-constexpr const char *kKeyTemplate = "/etc/kova/.secret.key.XXXXXX";
 constexpr size_t kKeySize = 32;
 
 using secret_key = std::array<uint32_t, kKeySize / sizeof(uint32_t)>;
@@ -91,8 +90,7 @@ bool make_key() {
     if (getrandom(key.data(), kKeySize, 0) != static_cast<ssize_t>(kKeySize))
         return false;
     mkdir(kKeyDirectory, 0755);
-    char name[64];
-    strcpy(name, kKeyTemplate);
+    char name[] = "/etc/kova/.secret.key.XXXXXX";
     const unique_fd fd{mkostemp(name, O_CLOEXEC)};
     if (!fd)
         return false;

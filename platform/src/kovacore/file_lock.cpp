@@ -53,12 +53,9 @@ struct flock describe(short type) {
 bool resolve_parent(const char *path, char (&resolved)[PATH_MAX]) {
     const char *slash = strrchr(path, '/');
     const char *name = slash != nullptr ? slash + 1 : path;
-    char parent[PATH_MAX] = ".";
-    if (slash == path)
-        strcpy(parent, "/");
-    else if (slash != nullptr)
-        *static_cast<char *>(mempcpy(parent, path, static_cast<size_t>(slash - path))) = '\0';
-
+    char parent[PATH_MAX];
+    snprintf(parent, sizeof parent, "%.*s", slash != nullptr ? static_cast<int>(slash + 1 - path) : 1,
+             slash != nullptr ? path : ".");
     if (*name == '\0' || realpath(parent, resolved) == nullptr)
         return false;
     const size_t used = strcmp(resolved, "/") == 0 ? 0 : strlen(resolved);

@@ -51,12 +51,13 @@ string_view bare_value(string_view value) {
 /** @return 1 with the value, 0 when the key is absent, below 0 for an unreadable file */
 int find_value(line_source &source, string_view key, string_view &value) {
     string_view line;
-    while (source.next(line))
-        if (has_key(line, key)) {
-            line.remove_prefix(key.size() + 1);
-            value = bare_value(line);
-            return 1;
-        }
+    while (source.next(line)) {
+        if (!has_key(line, key))
+            continue;
+        line.remove_prefix(key.size() + 1);
+        value = bare_value(line);
+        return 1;
+    }
     return source.failed() ? fail(HERE, kErrFileOpen) : 0;
 }
 

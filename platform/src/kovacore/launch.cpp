@@ -4,6 +4,7 @@
 #include <cstring>
 #include <fcntl.h>
 #include <pthread.h>
+#include <sched.h>
 #include <spawn.h>
 #include <sys/wait.h>
 #include <syslog.h>
@@ -129,19 +130,18 @@ bool reap_within(pid_t pid, int limit_ms, int &status) {
     return ended;
 }
 
-/** Starts from a process of its own that ends at once. It shares the memory here, and the outcome is left in it. */
-[[gnu::noinline]] void spawn_from_orphanage(const spawn_setup &setup, const launch &what, volatile int *error) {
-    const pid_t pid = vfork();
-    if (pid == 0) {
-        pid_t program;
-        *error = setup.spawn(what, program);
-        _exit(0);
-    }
-    if (pid < 0)
-        *error = EAGAIN;
-    int status;
-    if (pid > 0)
-        reap(pid, 0, status);
+struct orphan {
+    const spawn_setup &setup;
+    const launch &what;
+    volatile int error;
+};
+
+/** Runs as a process of its own, on the memory of the caller, which stands still meanwhile. */
+int start_orphan(void *argument) {
+    auto &started = *static_cast<orphan *>(argument);
+    pid_t program;
+    started.error = started.setup.spawn(started.what, program);
+    return 0;
 }
 
 } // namespace
@@ -163,9 +163,14 @@ int kova::start_detached(const launch &what) {
     spawn_setup setup;
     if (!setup.prepare(what))
         return kNoProcess;
-    volatile int error = 0;
-    spawn_from_orphanage(setup, what, &error);
-    return failure_of(error);
+    alignas(16) char stack[size_t{64} * 1024];
+    orphan started = {setup, what, 0};
+    const pid_t parent = clone(start_orphan, stack + sizeof stack, CLONE_VM | CLONE_VFORK | SIGCHLD, &started);
+    if (parent < 0)
+        return kNoProcess;
+    int status;
+    reap(parent, 0, status);
+    return failure_of(started.error);
 }
 
 int kova::wait_for_program(pid_t pid) {

@@ -119,7 +119,7 @@ int set_argument(uint64_t handle, const char *key, const char *const *values, in
         *link = static_cast<event_argument *>(calloc(1, sizeof(event_argument) + strlen(key) + 1));
         if (*link == nullptr)
             return fail(HERE, kErrMemory);
-        strcpy((*link)->key, key);
+        memcpy((*link)->key, key, strlen(key) + 1);
     }
     KLIBCSzListFree((*link)->values);
     (*link)->values = list.release();
@@ -235,7 +235,7 @@ int KLIBPluginSDKInit(const char *szComponent, const char *szEvent, uint64_t *pH
     auto *event = static_cast<plugin_event *>(calloc(1, sizeof(plugin_event) + strlen(szEvent) + 1));
     if (event == nullptr)
         return fail(HERE, kErrMemory);
-    strcpy(event->name, szEvent);
+    memcpy(event->name, szEvent, strlen(szEvent) + 1);
     pthread_mutex_lock(&g_mutex);
     event->handle = ++g_last_handle;
     event->next = g_events;
