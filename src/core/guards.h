@@ -72,6 +72,13 @@ struct stream_kind {
 };
 using stream = owner<stream_kind>;
 
+/** A lock of KLIBCFileLockTimeByFile. */
+struct file_lock_kind {
+    static int none() { return -1; }
+    static void release(int fd) { KLIBCFileUnlockByFile(fd); }
+};
+using file_lock = owner<file_lock_kind>;
+
 /** A program whose output is read. */
 struct process_stream_kind {
     static FILE *none() { return nullptr; }

@@ -4,7 +4,10 @@
  */
 #pragma once
 
+#include "core/report.h"
 #include "core/text.h"
+
+#include <initializer_list>
 
 namespace kova {
 
@@ -41,5 +44,17 @@ inline constexpr char kSlaveList[] = "SLAVE_LIST";
 inline constexpr char kBondMode[] = "BOND_MODE";
 inline constexpr char kIpv6Init[] = "IPV6INIT";
 } // namespace key
+
+struct key_value {
+    const char *key;
+    const char *value;
+};
+
+/**
+ * Sets keys of a file and removes others in one rewrite, as plain lines. Nothing is logged.
+ * @return 0; -1 with NET_ERR_OUT_OF_MEMORY under the caller's place, or with the code of the rewrite
+ */
+[[nodiscard]] int rewrite_keys(const place &at, const char *path, std::initializer_list<key_value> set,
+                               std::initializer_list<const char *> removed);
 
 } // namespace kova

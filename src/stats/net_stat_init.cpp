@@ -89,7 +89,8 @@ int read_records(FILE *file, NETSTAT *pStat, int nItem, bool &is_whole) {
             continue;
         }
         NETSTAT &record = pStat[filled++];
-        record = {.blValid = 1};
+        record = {};
+        record.blValid = 1;
         copy_text(record.szIfname, szIfname);
         read_counters(colon + 1, record);
     }

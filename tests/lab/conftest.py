@@ -19,7 +19,7 @@ def pytest_runtest_setup():
         pytest.fail("lab tests write to /etc and /sbin: run them inside the box", pytrace=False)
 
 
-def wait_for(condition, limit=5.0, what="the condition"):
+def wait_for(condition, limit=10.0, what="the condition"):
     """The first true value of condition(); fails the test when it takes longer than limit seconds."""
     end = time.monotonic() + limit
     while True:
@@ -46,7 +46,7 @@ def on_other_side(*command, **options):
 class Daemon:
     """A process that serves a test: started, waited for until it is ready, ended by its pid."""
 
-    def __init__(self, command, ready, limit=5.0):
+    def __init__(self, command, ready, limit=10.0):
         self.process = subprocess.Popen([str(word) for word in command], stdin=subprocess.DEVNULL)
         try:
             wait_for(lambda: self.is_ready(ready), limit, f"{command[0]}'s start")
@@ -137,7 +137,7 @@ def is_up(link):
 
 
 def processes(text):
-    """Pids of the living processes whose command line holds a text, and of the zombies none."""
+    """Pids of the living processes whose command line holds a text; zombies have none."""
     found = []
     for folder in pathlib.Path("/proc").glob("[0-9]*"):
         try:

@@ -219,6 +219,17 @@ def test_job_that_died_can_be_started_again(make_job):
     assert is_alive(pid_of("mortal"))
 
 
+def test_helpers_of_a_job_that_died_end_before_the_next_start(make_job):
+    make_job("orphaned", run_as="sleep 3456 & exec sleep 6543")
+    run("/sbin/start", "orphaned")
+    wait_for(lambda: processes("sleep 3456") and processes("sleep 6543"))
+    [helper] = processes("sleep 3456")
+    os.kill(pid_of("orphaned"), signal.SIGKILL)
+    run("/sbin/start", "orphaned")
+    assert not is_alive(helper)
+    wait_for(lambda: processes("sleep 6543") == [pid_of("orphaned")])
+
+
 def test_stop_leaves_a_stranger_with_the_same_number_alone(make_job):
     make_job("past")
     stranger = subprocess.Popen(["sleep", "1000"], start_new_session=True)

@@ -82,6 +82,13 @@ std::string outcome::str() const {
     return out.str();
 }
 
+outcome refusal(const std::string &unit, const std::string &condition, long result) {
+    return {.result = result,
+            .code = 0xD00,
+            .unit = unit,
+            .log = {"ERR " + unit + ":N Invaild Argument (" + condition + ")=[0]"}};
+}
+
 void expect_outcome(const char *file, int line, const outcome &got, const outcome &expected) {
     const ::testing::ScopedTrace trace(file, line, "the call whose outcome is compared");
     EXPECT_EQ(expected.str(), got.str());
@@ -133,13 +140,19 @@ void test_rig::hide(const std::string &path) {
     redirect(path, "/tmp/absent" + path);
 }
 
+void test_rig::on_sleep(const std::function<void(long)> &effect) {
+    during_sleep = effect;
+}
+
 void test_rig::note_log(int level, const std::string &line) {
     static const std::regex unit("^([\\w./]+):\\d+ ");
     static const std::regex function("^(\\w+)( ?)\\(\\d+\\)");
     static const std::regex place("([\\w./]+):\\d+\\]");
+    static const std::regex all("^\\((\\w+):\\d+:");
     std::string shown = std::regex_replace(line, unit, "$1:N ");
     shown = std::regex_replace(shown, function, "$1$2(N)");
     shown = std::regex_replace(shown, place, "$1:N]");
+    shown = std::regex_replace(shown, all, "($1:N:");
     if (!shown.empty() && shown.back() == '\n') {
         shown.pop_back();
     }

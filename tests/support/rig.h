@@ -42,9 +42,12 @@ struct outcome {
     bool operator==(const outcome &) const = default;
 };
 
+/** What a refused argument does: one line, 0xD00, nothing else. */
+outcome refusal(const std::string &unit, const std::string &condition, long result = -1);
+
 /** Compares outcomes as texts, so that a difference is shown line by line. */
 void expect_outcome(const char *file, int line, const outcome &got, const outcome &expected);
-#define EXPECT_OUTCOME(got, ...) ::kova_test::expect_outcome(__FILE__, __LINE__, got, ::kova_test::outcome __VA_ARGS__)
+#define EXPECT_OUTCOME(got, ...) ::kova_test::expect_outcome(__FILE__, __LINE__, got, __VA_ARGS__)
 
 /** Stands in for ioctl: nothing to let the kernel answer. */
 using ioctl_answer = std::function<std::optional<int>(unsigned long request, void *argument)>;
@@ -80,6 +83,8 @@ public:
     void replace_file(const std::string &path, const std::string &content);
     /** Makes a path look absent. */
     void hide(const std::string &path);
+    /** Called at every sleep with the milliseconds asked for: what happens meanwhile. */
+    void on_sleep(const std::function<void(long)> &effect);
 
     // ---- used by the replaced calls
 
@@ -91,6 +96,7 @@ public:
     outcome now;
     bool is_observing = false;
     ioctl_answer on_ioctl;
+    std::function<void(long)> during_sleep;
     std::map<std::string, int> held; ///< containers, handles and streams that are open, by kind
     long slept_ms = 0;               ///< the clocks are ahead by what was slept
 
