@@ -75,16 +75,11 @@ TEST_F(lnx_is_dhcp, BlKOVALnxIsDHCP_sharedLockElsewhere_doesNotMatter) {
 }
 
 TEST_F(lnx_is_dhcp, BlKOVALnxIsDHCP_badNames_areRefusedAndNothingIsWritten) {
-    const auto refused = [](const std::string &condition) {
-        return outcome{.result = 0,
-                       .code = 0xD00,
-                       .unit = "lnx_is_dhcp",
-                       .log = {"ERR lnx_is_dhcp:N Invaild Argument (" + condition + ")=[0]"}};
-    };
-    EXPECT_OUTCOME(is_dhcp(nullptr), {refused("((void *)0) != szIfname")});
-    EXPECT_OUTCOME(is_dhcp(""), {refused("'\\0' != *szIfname")});
+    const auto refused = [](const std::string &condition) { return refusal("lnx_is_dhcp", condition, 0); };
+    EXPECT_OUTCOME(is_dhcp(nullptr), refused("((void *)0) != szIfname"));
+    EXPECT_OUTCOME(is_dhcp(""), refused("'\\0' != *szIfname"));
     for (const std::string &name : bad_names()) {
-        EXPECT_OUTCOME(is_dhcp(name.c_str()), {refused("is_interface_name(szIfname)")});
+        EXPECT_OUTCOME(is_dhcp(name.c_str()), refused("is_interface_name(szIfname)"));
     }
     EXPECT_EQ(texts{}, list_dir("/etc/sysconfig/network-scripts"));
 }

@@ -25,12 +25,7 @@ protected:
         write_file(ifcfg(name), "BOOTPROTO=static\nIPADDR=" + address + "\nNETMASK=255.255.255.0\n");
     }
     bool is_untouched() const { return memcmp(&card, &untouched, sizeof card) == 0; }
-    static outcome refused(const std::string &condition) {
-        return {.result = -1,
-                .code = 0xD00,
-                .unit = "net_get_card1",
-                .log = {"ERR net_get_card1:N Invaild Argument (" + condition + ")=[0]"}};
-    }
+    static outcome refused(const std::string &condition) { return refusal("net_get_card1", condition); }
 
     fake_kernel kernel{rig};
     NETINFO card;
@@ -105,14 +100,13 @@ TEST_F(net_get_card1, KOVANetGetCard1_indexPastTheEndWithAddress_isNotSearched) 
 TEST_F(net_get_card1, KOVANetGetCard1_badArguments_areRefused) {
     kernel.add("eth0");
     const std::string condition = "((void *)0) != szIP || (0 <= index && index < 32)";
-    EXPECT_OUTCOME(get(32), {refused(condition)});
-    EXPECT_OUTCOME(get(-1), {refused(condition)});
-    EXPECT_OUTCOME(get(INT_MAX), {refused(condition)});
-    EXPECT_OUTCOME(get(0, ""), {refused("'\\0' != *szIP")}); // would be the first card without an address
-    EXPECT_OUTCOME(rig.observe([] { return KOVANetGetCard1(0, nullptr, nullptr); }), {refused("NULL != pNetInfo")});
-    EXPECT_OUTCOME(get_kind(32, nullptr, 2), {refused(condition)});
-    EXPECT_OUTCOME(rig.observe([] { return KOVANetGetCard1Ex(0, nullptr, 2, nullptr); }),
-                   {refused("NULL != pNetInfo")});
+    EXPECT_OUTCOME(get(32), refused(condition));
+    EXPECT_OUTCOME(get(-1), refused(condition));
+    EXPECT_OUTCOME(get(INT_MAX), refused(condition));
+    EXPECT_OUTCOME(get(0, ""), refused("'\\0' != *szIP")); // would be the first card without an address
+    EXPECT_OUTCOME(rig.observe([] { return KOVANetGetCard1(0, nullptr, nullptr); }), refused("NULL != pNetInfo"));
+    EXPECT_OUTCOME(get_kind(32, nullptr, 2), refused(condition));
+    EXPECT_OUTCOME(rig.observe([] { return KOVANetGetCard1Ex(0, nullptr, 2, nullptr); }), refused("NULL != pNetInfo"));
     EXPECT_TRUE(is_untouched());
 }
 

@@ -20,12 +20,7 @@ protected:
     outcome get(const char *ifname) {
         return rig.observe([&] { return KOVANetIFGetIPConfig(ifname, &card); });
     }
-    static outcome refused(const std::string &condition) {
-        return {.result = -1,
-                .code = 0xD00,
-                .unit = "net_if_get_ip_config",
-                .log = {"ERR net_if_get_ip_config:N Invaild Argument (" + condition + ")=[0]"}};
-    }
+    static outcome refused(const std::string &condition) { return refusal("net_if_get_ip_config", condition); }
 
     NETINFO card;
     const texts locks{"+0x105", "+0x105", "-0x100", "-0x100"};
@@ -107,11 +102,11 @@ TEST_F(net_if_get_ip_config, KOVANetIFGetIPConfig_lockElsewhere_is400) {
 }
 
 TEST_F(net_if_get_ip_config, KOVANetIFGetIPConfig_badArguments_areRefused) {
-    EXPECT_OUTCOME(get(nullptr), {refused("((void *)0) != szIfname")});
-    EXPECT_OUTCOME(get(""), {refused("'\\0' != *szIfname")});
-    EXPECT_OUTCOME(rig.observe([] { return KOVANetIFGetIPConfig("eth0", nullptr); }), {refused("NULL != pNetInfo")});
+    EXPECT_OUTCOME(get(nullptr), refused("((void *)0) != szIfname"));
+    EXPECT_OUTCOME(get(""), refused("'\\0' != *szIfname"));
+    EXPECT_OUTCOME(rig.observe([] { return KOVANetIFGetIPConfig("eth0", nullptr); }), refused("NULL != pNetInfo"));
     for (const std::string &name : bad_names()) {
-        EXPECT_OUTCOME(get(name.c_str()), {refused("is_interface_name(szIfname)")});
+        EXPECT_OUTCOME(get(name.c_str()), refused("is_interface_name(szIfname)"));
     }
     EXPECT_EQ('u', card.szIP[0]);
 }

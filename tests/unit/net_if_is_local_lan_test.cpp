@@ -38,15 +38,10 @@ TEST_F(net_if_is_local_lan, KLIBNetIFIsLocalLan_writerElsewhere_isNotWaitedFor) 
 }
 
 TEST_F(net_if_is_local_lan, KLIBNetIFIsLocalLan_badNames_areRefused) {
-    const auto refused = [](const std::string &condition) {
-        return outcome{.result = 0,
-                       .code = 0xD00,
-                       .unit = "net_if_is_local_lan",
-                       .log = {"ERR net_if_is_local_lan:N Invaild Argument (" + condition + ")=[0]"}};
-    };
-    EXPECT_OUTCOME(is_local(nullptr), {refused("((void *)0) != szIfname")});
-    EXPECT_OUTCOME(is_local(""), {refused("'\\0' != *szIfname")});
+    const auto refused = [](const std::string &condition) { return refusal("net_if_is_local_lan", condition, 0); };
+    EXPECT_OUTCOME(is_local(nullptr), refused("((void *)0) != szIfname"));
+    EXPECT_OUTCOME(is_local(""), refused("'\\0' != *szIfname"));
     for (const std::string &name : bad_names()) {
-        EXPECT_OUTCOME(is_local(name.c_str()), {refused("is_interface_name(szIfname)")});
+        EXPECT_OUTCOME(is_local(name.c_str()), refused("is_interface_name(szIfname)"));
     }
 }

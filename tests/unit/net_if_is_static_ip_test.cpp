@@ -45,15 +45,10 @@ TEST_F(net_if_is_static_ip, KOVANetIfIsStaticIP_lockElsewhere_isLoggedWithItsCod
 }
 
 TEST_F(net_if_is_static_ip, KOVANetIfIsStaticIP_badNames_areRefused) {
-    const auto refused = [](const std::string &condition) {
-        return outcome{.result = 0,
-                       .code = 0xD00,
-                       .unit = "net_if_is_static_ip",
-                       .log = {"ERR net_if_is_static_ip:N Invaild Argument (" + condition + ")=[0]"}};
-    };
-    EXPECT_OUTCOME(is_static(nullptr), {refused("((void *)0) != szIfname")});
-    EXPECT_OUTCOME(is_static(""), {refused("'\\0' != *szIfname")});
+    const auto refused = [](const std::string &condition) { return refusal("net_if_is_static_ip", condition, 0); };
+    EXPECT_OUTCOME(is_static(nullptr), refused("((void *)0) != szIfname"));
+    EXPECT_OUTCOME(is_static(""), refused("'\\0' != *szIfname"));
     for (const std::string &name : bad_names()) {
-        EXPECT_OUTCOME(is_static(name.c_str()), {refused("is_interface_name(szIfname)")});
+        EXPECT_OUTCOME(is_static(name.c_str()), refused("is_interface_name(szIfname)"));
     }
 }
