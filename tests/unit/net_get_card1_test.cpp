@@ -176,7 +176,7 @@ TEST_F(net_get_card1, KOVANetGetCard1_cardThatVanishes_isPassedOver) {
     EXPECT_STREQ("eth1", card.szIfname);
 }
 
-#ifndef __SANITIZE_ADDRESS__
+#ifndef __SANITIZE_ADDRESS__ // which owns the allocator
 TEST_F(net_get_card1, KOVANetGetCard1_noMemory_is200) {
     add_static("eth0", "10.0.0.1");
     rig.fail("calloc");

@@ -154,7 +154,7 @@ TEST_F(net_interface_enum, KLIBNetInterfaceEnum_noSocket_is3400) {
                             .log = {"ERR net_interface_enum:N Cannot open control socket"}});
 }
 
-#ifndef __SANITIZE_ADDRESS__
+#ifndef __SANITIZE_ADDRESS__ // which owns the allocator
 TEST_F(net_interface_enum, KLIBNetInterfaceEnum_noMemory_is200) {
     kernel.add("eth0");
     rig.fail("malloc");
