@@ -128,7 +128,7 @@ def chosen_steps(out, names):
         return steps
     chosen = []
     for name in names:
-        found = [step for step in steps if name in (step.ring, step.name)]
+        found = [step for step in steps if step.ring == name] or [step for step in steps if step.name == name]
         for kind in UNIT_PROGRAMS:
             if not found and name in units_of(kind):
                 found = [gtest_step(out, kind, kind, BUILD, unit=name)]

@@ -12,7 +12,7 @@ extern "C" int KLIBNetISetIfFlags(const char *szIfname, unsigned flags, int on) 
     }
     const interface_socket socket;
     if (!socket.is_open()) {
-        return fail(HERE, NET_ERR_SOCKET, -1, "Cannot open control socket");
+        return fail_socket(HERE, -1);
     }
     unsigned current = 0;
     if (socket.flags(szIfname, current) < 0) {

@@ -45,7 +45,7 @@ extern "C" int KOVANetRenameEth(const char *szOld, const char *szNew) {
     }
     const interface_socket socket;
     if (!socket.is_open()) {
-        return fail(HERE, NET_ERR_SOCKET, -1, "Cannot open control socket");
+        return fail_socket(HERE, -1);
     }
     unsigned char mac[6];
     if (socket.hardware_address(szOld, mac) < 0) {

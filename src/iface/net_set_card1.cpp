@@ -73,7 +73,7 @@ extern "C" int KOVANetSetCard1(NETINFO *pNew, NETINFO *pOld) {
     }
     const named_lock lock{kConfigExclusive};
     if (!lock.is_held()) {
-        return fail_quietly(HERE, NET_ERR_LOCK, lock.result());
+        return fail_lock(HERE, lock.result());
     }
     if (pNew->nIPSource != 0) {
         return set_static(*pNew, pOld);

@@ -4,6 +4,7 @@ to the network namespace "net", in which the servers and the other hosts live.""
 import os
 import pathlib
 import re
+import shutil
 import socket
 import subprocess
 import threading
@@ -114,6 +115,47 @@ class SystemLog:
         self.thread.join()
         self.socket.close()
         os.unlink("/dev/log")
+
+
+class HeldProgram:
+    """Puts a script in a program's place: the first run whose arguments hold a text waits until it is released."""
+
+    def __init__(self, program, text, folder):
+        self.program, self.before = pathlib.Path(program), folder / "real" / pathlib.Path(program).name
+        self.first, self.held = folder / "first", folder / "held"
+        self.before.parent.mkdir()
+        self.held.touch()
+        shutil.move(self.program, self.before)
+        self.program.write_text(
+            f"#!/bin/sh\ncase \"$*\" in *'{text}'*)\n    mkdir {self.first} 2>/dev/null &&\n"
+            f"        while [ -e {self.held} ]; do sleep 0.02; done ;;\nesac\nexec {self.before} \"$@\"\n"
+        )
+        self.program.chmod(0o755)
+
+    def is_waiting(self):
+        return self.first.exists()
+
+    def release(self):
+        self.held.unlink(missing_ok=True)
+
+    def put_back(self):
+        self.release()
+        self.program.unlink()
+        shutil.move(self.before, self.program)
+
+
+@pytest.fixture
+def hold(tmp_path):
+    """hold(program, text): a HeldProgram until the test ends."""
+    held = []
+
+    def put(program, text):
+        held.append(HeldProgram(program, text, tmp_path))
+        return held[-1]
+
+    yield put
+    for program in held:
+        program.put_back()
 
 
 @pytest.fixture

@@ -3,6 +3,7 @@
 
 import os
 import pathlib
+import signal
 import subprocess
 import time
 
@@ -199,51 +200,26 @@ def test_stop_at_any_time_of_a_bind_ends_the_client_for_good(server):
         assert_nothing_left("lan0")
 
 
-@pytest.fixture
-def held_ip(tmp_path):
-    """Lets every `ip` that adds an address wait, as long as the file "hold" is there, and note that it does."""
-    program = pathlib.Path("/usr/sbin/ip")
-    real = program.resolve()
-    hold, waiting = tmp_path / "hold", tmp_path / "waiting"
-    hold.touch()
-    wrapper = tmp_path / "ip"
-    wrapper.write_text(
-        f"#!/bin/sh\ncase \"$*\" in *'addr replace'*)\n    touch {waiting}\n"
-        f"    while [ -e {hold} ]; do sleep 0.02; done ;;\nesac\nexec {real} \"$@\"\n"
-    )
-    wrapper.chmod(0o755)
-    was = os.readlink(program)
-    program.unlink()
-    program.symlink_to(wrapper)
-    yield hold, waiting
-    program.unlink()
-    program.symlink_to(was)
-
-
-def test_stop_while_the_address_is_being_set(server, held_ip):
-    hold, waiting = held_ip
+@pytest.mark.parametrize(
+    ("program", "text"),
+    [("/usr/bin/sync", "dhcpcd-lan0.info"), ("/usr/sbin/ip", "addr replace"), ("/usr/sbin/ip", "route replace"),
+     ("/usr/bin/sync", "resolv4.conf")],
+)  # fmt: skip
+@pytest.mark.parametrize("client_dies", [False, True])
+def test_stop_in_the_middle_of_a_bind(server, hold, program, text, client_dies):
+    step = hold(program, text)
     start("lan0")
-    wait_for(waiting.exists, what="the bind")
+    wait_for(step.is_waiting, what="the bind")
+    if client_dies:
+        os.kill(int(pathlib.Path("/run/kova/jobs/dhcp-client,IFACE=lan0").read_text().split()[0]), signal.SIGKILL)
+        wait_for(lambda: not processes("/sbin/dhclient -4"), what="the client's end")
+    assert processes(text)  # what must not outlive the stop
+
     began = time.monotonic()
     stop("lan0")
     assert time.monotonic() - began < 4.5
-    hold.unlink()  # what had survived would set the address now
-    assert not processes("addr replace")
-    assert_nothing_left("lan0")
-    run("ip", "addr", "add", "10.1.1.1/24", "dev", "lan0")
-    assert addresses("lan0") == ["10.1.1.1/24"]
-
-
-def test_client_killed_while_the_address_is_being_set(server, held_ip):
-    hold, waiting = held_ip
-    start("lan0")
-    wait_for(waiting.exists, what="the bind")
-    client = int(pathlib.Path("/run/kova/jobs/dhcp-client,IFACE=lan0").read_text().split()[0])
-    os.kill(client, 9)
-    wait_for(lambda: not processes("/sbin/dhclient -4"))
-    assert processes("addr replace")  # the orphan that must not outlive the stop
-    stop("lan0")
-    hold.unlink()
+    assert not processes(text)
+    step.release()  # what had survived would go on now
     assert_nothing_left("lan0")
 
 
@@ -354,18 +330,20 @@ def test_bad_interface_name_is_refused():
         assert run(SCRIPT, env={**environment, "interface": name}, status=1).stderr
 
 
-def test_parallel_scripts_lose_no_name_server():
+def test_parallel_scripts_lose_no_name_server(hold):
+    """The first script is held between reading the info files and writing the source, while the second works."""
     for link in LINKS:
         run("ip", "link", "set", link, "up")
-    for turn in range(10):
-        scripts = [
-            subprocess.Popen([SCRIPT], env={**LEASE, "PATH": os.environ["PATH"], "reason": "BOUND", "interface": link,
-                                            "new_ip_address": f"192.168.{number}.{turn + 5}", "new_routers": "",
-                                            "new_domain_name_servers": f"192.168.{number}.53"})
-            for number, link in enumerate(LINKS, 60)
-        ]  # fmt: skip
-        assert [process.wait(10) for process in scripts] == [0, 0]
-        assert set(SOURCE.read_text().split()) == {"nameserver", "192.168.60.53", "192.168.61.53"}
-        for link in LINKS:
-            run(SCRIPT, env={"PATH": os.environ["PATH"], "reason": "STOP", "interface": link})
-        assert not SOURCE.exists()
+    step = hold("/usr/bin/sync", "resolv4.conf")
+    scripts = []
+    for number, link in enumerate(LINKS, 60):
+        environment = {
+            **LEASE, "PATH": os.environ["PATH"], "reason": "BOUND", "interface": link, "new_routers": "",
+            "new_ip_address": f"192.168.{number}.5", "new_domain_name_servers": f"192.168.{number}.53",
+        }  # fmt: skip
+        scripts.append(subprocess.Popen([SCRIPT], env=environment))
+        wait_for(step.is_waiting, what="the first script's last step")
+    wait_for(lambda: processes("flock 9") or scripts[1].poll() is not None, what="the second script's last step")
+    step.release()
+    assert [process.wait(10) for process in scripts] == [0, 0]
+    assert set(SOURCE.read_text().split()) == {"nameserver", "192.168.60.53", "192.168.61.53"}

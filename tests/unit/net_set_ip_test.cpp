@@ -1,4 +1,4 @@
-#include "support/kernel.h"
+#include "support/fake_kernel.h"
 
 #include <kovanetsdk/iface.h>
 
@@ -22,7 +22,8 @@ struct net_set_ip : unit_test {
         return rig.observe([=] { return KOVANetSetIP(szFamily, "eth0", szIP, prefix, szAction); });
     }
 
-    kernel_interfaces interfaces{rig, {{"eth0", {.ip = "192.168.1.10", .mask = "255.255.255.0"}}}};
+    fake_kernel kernel{rig};
+    fake_interface &eth0 = kernel.add("eth0", {.ip = "192.168.1.10", .mask = "255.255.255.0"});
 };
 
 const std::string kTakeDown = "/sbin/ifconfig eth0 0.0.0.0";
@@ -62,9 +63,8 @@ TEST_F(net_set_ip, KOVANetSetIP_name_that_is_none_is_refused) {
 
 TEST_F(net_set_ip, KOVANetSetIP_unknown_action_is_told) {
     for (const std::string &action : texts{"", "ADD", "adds", "ad", "replace", "flush ", long_text(4096)}) {
-        EXPECT_OUTCOME(
-            set("-4", "10.0.0.1", 8, action.c_str()),
-            {.result = -1, .log = {"ERR net_set_ip:N action command is wrong. your action is " + action}});
+        EXPECT_OUTCOME(set("-4", "10.0.0.1", 8, action.c_str()),
+                       {.result = -1, .log = {"ERR net_set_ip:N action command is wrong. your action is " + action}});
     }
 }
 
@@ -87,9 +87,9 @@ TEST_F(net_set_ip, KOVANetSetIP_prefix_out_of_range_is_told) {
 }
 
 TEST_F(net_set_ip, KOVANetSetIP_text_that_is_no_address_is_told) {
-    const texts addresses{"",         "1.2.3",         "1.2.3.4.5",   "127.0.0.1", "0.1.2.3", "224.0.0.1",
-                          "fe80::1",  "1.2.3.4/24",    "1.2.3.4\n",   "1.2.3.4 ",  "-1.2.3.4", "256.1.1.1",
-                          "1.2.3.4;", long_text(4096), long_text(64), long_text(15), "..", "a.b.c.d"};
+    const texts addresses{"",         "1.2.3",         "1.2.3.4.5",   "127.0.0.1",   "0.1.2.3",  "224.0.0.1",
+                          "fe80::1",  "1.2.3.4/24",    "1.2.3.4\n",   "1.2.3.4 ",    "-1.2.3.4", "256.1.1.1",
+                          "1.2.3.4;", long_text(4096), long_text(64), long_text(15), "..",       "a.b.c.d"};
     for (const std::string &address : addresses) {
         const outcome got = set("-4", address.c_str(), 24, "add");
         EXPECT_EQ(-1, got.result) << address;
@@ -107,8 +107,8 @@ TEST_F(net_set_ip, KOVANetSetIP_address_too_long_for_a_subnet_is_told) {
 
 TEST_F(net_set_ip, KOVANetSetIP_text_that_is_no_ipv6_address_is_told) {
     give_ipv6({});
-    const texts addresses{"", "10.0.0.1", "fe80::1::2", "fe80::1%eth0", "fe80::1\n", "g::1", "fe80::1/129", "fe80::1/",
-                          long_text(46), long_text(47), long_text(4096)};
+    const texts addresses{"",         "10.0.0.1",    "fe80::1::2",  "fe80::1%eth0", "fe80::1\n", "g::1", "fe80::1/129",
+                          "fe80::1/", long_text(46), long_text(47), long_text(4096)};
     for (const std::string &address : addresses) {
         const outcome got = set("-6", address.c_str(), 64, "add");
         EXPECT_EQ(-1, got.result) << address;
@@ -127,10 +127,10 @@ TEST_F(net_set_ip, KOVANetSetIP_flush_ignores_address_and_prefix) {
 
 TEST_F(net_set_ip, KOVANetSetIP_flush_failing_is_told) {
     rig.answer("/sbin/ip", 2);
-    EXPECT_OUTCOME(set("-4", nullptr, 0, "flush"),
-                   {.result = -1,
-                    .log = {"ERR net_flush_ip:N Failed to flush ipv4 address on [eth0]", "ERR net_set_ip:N flush ip failed"},
-                    .commands = {"/sbin/ip -4 address flush dev eth0"}});
+    EXPECT_OUTCOME(set("-4", nullptr, 0, "flush"), {.result = -1,
+                                                    .log = {"ERR net_flush_ip:N Failed to flush ipv4 address on [eth0]",
+                                                            "ERR net_set_ip:N flush ip failed"},
+                                                    .commands = {"/sbin/ip -4 address flush dev eth0"}});
 }
 
 TEST_F(net_set_ip, KOVANetSetIP_flush_comes_before_the_family) {
@@ -148,7 +148,7 @@ TEST_F(net_set_ip, KOVANetSetIP_new_ipv4_address_is_announced_and_set) {
 }
 
 TEST_F(net_set_ip, KOVANetSetIP_first_ipv4_address_is_announced_with_an_empty_origin) {
-    interfaces["eth0"].ip = "";
+    eth0.ip = "";
     EXPECT_OUTCOME(set("-4", "10.1.2.3", 8, "add"),
                    {.commands = {kTakeDown, "/sbin/ifconfig eth0 10.1.2.3 netmask 255.0.0.0"},
                     .events = {ipv4_event("", "10.1.2.3")}});
@@ -182,7 +182,7 @@ TEST_F(net_set_ip, KOVANetSetIP_ipv4_prefix_zero_is_told_and_passes) {
 }
 
 TEST_F(net_set_ip, KOVANetSetIP_without_link_the_subnet_route_is_deleted) {
-    interfaces["eth0"].flags = IFF_UP;
+    eth0.flags = IFF_UP;
     rig.answer("/bin/ipcalc", 0, "NETWORK=10.1.0.0\n");
     EXPECT_OUTCOME(set("-4", "10.1.2.3", 16, "add"),
                    {.commands = {kTakeDown, "/sbin/ifconfig eth0 10.1.2.3 netmask 255.255.0.0",
@@ -191,7 +191,7 @@ TEST_F(net_set_ip, KOVANetSetIP_without_link_the_subnet_route_is_deleted) {
 }
 
 TEST_F(net_set_ip, KOVANetSetIP_subnet_route_not_deleted_is_only_noted) {
-    interfaces["eth0"].flags = IFF_UP;
+    eth0.flags = IFF_UP;
     rig.answer("/bin/ipcalc", 0, "NETWORK=192.168.1.0\n");
     rig.answer("/sbin/ip", 2);
     EXPECT_OUTCOME(set("-4", "192.168.1.10", 24, "add"),
@@ -201,7 +201,7 @@ TEST_F(net_set_ip, KOVANetSetIP_subnet_route_not_deleted_is_only_noted) {
 }
 
 TEST_F(net_set_ip, KOVANetSetIP_network_not_calculated_fails) {
-    interfaces["eth0"].flags = IFF_UP;
+    eth0.flags = IFF_UP;
     rig.fail("KLIBCPopen");
     EXPECT_OUTCOME(set("-4", "192.168.1.10", 24, "add"),
                    {.result = -1,
@@ -232,7 +232,8 @@ TEST_F(net_set_ip, KOVANetSetIP_failing_step_of_an_ipv4_address) {
     };
     for (const step &failing : adding) {
         test_rig fresh;
-        kernel_interfaces eth0{fresh, {{"eth0", {.ip = "192.168.1.10"}}}};
+        fake_kernel fresh_kernel{fresh};
+        fresh_kernel.add("eth0", {.ip = "192.168.1.10"});
         current_rig = &fresh;
         fresh.answer(failing.command, failing.status);
         EXPECT_OUTCOME(fresh.observe([] { return KOVANetSetIP("-4", "eth0", "10.1.2.3", 24, "add"); }),
@@ -350,10 +351,11 @@ TEST_F(net_set_ip, KOVANetSetIP_failing_step_of_an_ipv6_address) {
                     .log = {"ERR net_set_ip:N excute cmd /sbin/ip address del 2001:db8::2/64 dev eth0 failed"},
                     .commands = {"/sbin/ip -6 address del 2001:db8::2/64 dev eth0"}});
     rig.hide(kList);
-    EXPECT_OUTCOME(set("-6", "2001:db8::2", 64, "add"),
-                   {.result = -1,
-                    .code = 0x900,
-                    .unit = "lnx_v6_ip_get",
-                    .log = {"ERR lnx_v6_ip_get:N Fail to open [/proc/net/if_inet6], errno=[2/No such file or directory]",
-                            "ERR net_set_ip:N get old v6 IP failed"}});
+    EXPECT_OUTCOME(
+        set("-6", "2001:db8::2", 64, "add"),
+        {.result = -1,
+         .code = 0x900,
+         .unit = "lnx_v6_ip_get",
+         .log = {"ERR lnx_v6_ip_get:N Fail to open [/proc/net/if_inet6], errno=[2/No such file or directory]",
+                 "ERR net_set_ip:N get old v6 IP failed"}});
 }
