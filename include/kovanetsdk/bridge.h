@@ -10,6 +10,10 @@
 extern "C" {
 #endif
 
+/**
+ * @param szIfname  interface
+ * @return 1 when it is a port of a bridge (/sys/class/net/<name>/brport); else 0, with 0xD00 for a bad name
+ */
 int KLIBNetBridgeIfIsSlave(const char *szIfname);
 
 #ifdef __cplusplus

@@ -48,33 +48,197 @@ typedef struct ETHINFO {
 
 /* ---- which interfaces there are ------------------------------------------------------------------------------- */
 
+/**
+ * Lists the interfaces of a kind. Only interfaces that are up count, and no members of a bridge or of a bond of the
+ * virtual switch. Not safe to call from two threads at once: the list of interfaces is kept for the process.
+ *
+ * @param pInfo     receives the records, or NULL to count only (the interfaces below VLANs are counted then, too)
+ * @param capacity  records there is room for, 0 or more; at most 32 interfaces are looked at
+ * @param kind      selector 1 physical cards, bond members included, no VLANs; 2 logical interfaces: bonds instead of
+ *                  their members, VLANs instead of the interface below them (moved last records fill the gaps); 8 as 2
+ *                  with point-to-point links and with the interfaces below VLANs; any other value but 0: all but
+ *                  loopback and point-to-point. Plus 0x04 to keep the cluster's heartbeat interface, which a running
+ *                  cluster hides, plus 0x10 to show a running cluster's address and mask instead of the kernel's and
+ *                  to leave out interfaces without one
+ * @return number of interfaces; -1 with 0xD00 (capacity, selector 0), 0x200 (memory), 0x900 or 0x4000 (list of modules
+ *         or of interfaces), 0x3400 (no socket). 0xD00 beside a count: more VLANs than interfaces, none was replaced
+ */
 int KLIBNetGetInterfaceInfo(IFINFO *pInfo, int capacity, int kind);
+/** Counts the interfaces of a kind: KLIBNetGetInterfaceInfo without records. @return as there */
 int KOVANetEnumCard(int kind);
+/**
+ * Lists the interfaces that are up, without loopback, bond members, members of a bridge or of a bond of the virtual
+ * switch. Link is the kernel's running flag.
+ * @param pInfo     receives the records, or NULL to count only
+ * @param capacity  records there is room for, 0 or more; at most 32 interfaces are looked at
+ * @param kind      0 all, 1 all but the internal LAN's (KLIBNetIFIsLocalLan), 2 only those; plus the bits 0x04 and 0x10
+ * of KLIBNetGetInterfaceInfo
+ * @return number of interfaces; -1 with 0xD00 (capacity, kind), 0x200, 0x900, 0x4000 or 0x3400
+ */
 int KLIBNetInterfaceEnum(IFINFO *pInfo, int capacity, int kind);
+/**
+ * @param szIfname  interface
+ * @param kind      as for KLIBNetGetInterfaceInfo
+ * @return 1 when the interface is of the kind; 0 with 0xBC00 when not, with 0xD00 for no name, or with the code of the
+ *         enumeration that failed
+ */
 int KOVANetIsDevTypeMatch(const char *szIfname, int kind);
+/**
+ * Number of internal LAN ports: /proc/sys/kernel/kova_internal_netif_num, and when that holds no number above 0, the
+ * key maxlanport of /etc.defaults/kovainfo.conf, else 1.
+ * @return the number; -1 with 0x900 when the kernel's file is missing
+ */
 int KOVANetInternalLanNumGet(void);
+/**
+ * The internal LAN's interfaces: key local_lan of /etc.defaults/kovainfo.conf, blank-separated. Read once per process;
+ * a failed read is tried again at the next call.
+ * @param names   receives the names, each cut to 15 characters, unused entries ""
+ * @param pCount  receives their number, 0 without the key, -1 on failure
+ * @return 0; -1 with 0xD00, or 0x100 (the file cannot be read, more than 32 names)
+ */
 int KLIBNetGetLocalLanConfig(char names[32][16], int *pCount);
+/**
+ * Takes no lock: the answer is one key of the interface's file, which is replaced whole.
+ * @param szIfname  interface
+ * @return 1 when LOCAL_LAN of its file is exactly "yes"; else 0, also without a file (0x900) and for a bad name (0xD00)
+ */
 int KLIBNetIFIsLocalLan(const char *szIfname);
+/**
+ * Role of an interface in the virtual switch, by its name and /sys/devices/virtual/net.
+ * @return 0 none (0xD00 for a bad name); 1 a bridge over one port ("ovs_eth0"); 2 a bond ("ovs_bond0")
+ */
 int KLIBNetOVSIfIsMaster(const char *szIfname);
+/**
+ * Name of the interface behind one of the virtual switch: the name without its "ovs_".
+ * @param szIfname  a name that begins with "ovs_"
+ * @param szOut     receives the rest
+ * @param size      size of szOut, longer than the rest
+ * @return 0; -1 with 0xD00
+ */
 int KLIBNetOVSGetOriginalIf(const char *szIfname, char *szOut, int size);
+/**
+ * Whether an interface is a member of a bond of the virtual switch, listed in /sys/class/net/kova_ovs_bonds; one with a
+ * switch port of its own is none.
+ * @return 1, 0; 0 with 0xD00 (name), 0x900 (the list cannot be opened) or 0x200
+ */
 int KLIBNetOVSIfIsSlave(const char *szIfname);
+/**
+ * Whether an interface is a member of a bond: of a kernel's, by its flags, or of the virtual switch's.
+ * @return 1, 0; 0 with 0xD00 (name), 0x3400 (no socket), 0x900 (the list cannot be opened) or 0x200
+ */
 int KOVANetIfIsBondingPassive(const char *szIfname);
 
 /* ---- records of one card -------------------------------------------------------------------------------------- */
 
+/**
+ * The record of a card, by its number or its address. Cards are the interfaces of kind 2 (KLIBNetGetInterfaceInfo).
+ * Holds the lock 0x105.
+ * @param index     number of the card, from 0. With an address it only has to be below the number of cards
+ * @param szIP      current IPv4 address of the card in dotted text, or NULL to take the index, 0 to 31, alone
+ * @param pNetInfo  receives the record: name, hardware address and link from the kernel, the rest from
+ *                  KOVANetIFGetIPConfig; untouched when there is no such card
+ * @return 1 found; 0 no such card; -1 with 0xD00, 0x400 (lock), 0x200, the code of the enumeration, or as
+ *         KOVANetIFGetIPConfig
+ */
 int KOVANetGetCard1(int index, const char *szIP, NETINFO *pNetInfo);
+/**
+ * KOVANetGetCard1 among the interfaces of any kind. With the bit 0x10 and a running cluster, szIP is compared with the
+ * cluster's addresses, and the record shows the cluster's address and mask.
+ * @param kind  as for KLIBNetGetInterfaceInfo
+ * @return as KOVANetGetCard1
+ */
 int KOVANetGetCard1Ex(int index, const char *szIP, int kind, NETINFO *pNetInfo);
+/**
+ * What there is to know of one interface, up or not.
+ * @param szIfname  interface
+ * @param pInfo     receives what the kernel says, or NULL
+ * @param pNetInfo  receives the card's record as KOVANetGetCard1 fills it, or NULL. With both NULL the call says
+ * whether the interface is there
+ * @return 0; -1 with 0xD00, 0x3400 (no socket), 0x3600 (unknown interface, failed request), or as KOVANetIFGetIPConfig
+ */
 int KOVANetIFGetInfo(const char *szIfname, IFINFO *pInfo, NETINFO *pNetInfo);
+/**
+ * The same; with the bit 0x10 in kind and a running cluster, both records show the cluster's address and mask.
+ * @return as KOVANetIFGetInfo; -1 with 0x200 when the cluster has no address for the interface yet
+ */
 int KOVANetIFGetInfoEx(const char *szIfname, int kind, IFINFO *pInfo, NETINFO *pNetInfo);
+/**
+ * Reads the configured IPv4 address: keys IPADDR and NETMASK of the interface's file, or with DHCP (BlKOVALnxIsDHCP) of
+ * /etc/dhclient/ipv4/dhcpcd-<name>.info. Holds the lock 0x105.
+ * @param szIfname  interface
+ * @param pNetInfo  nIPSource, szIP and szMask are set; the other fields stay
+ * @return 0 both were read, or a DHCP interface has no lease (both ""); -1 with 0xD00, 0x400 (lock), or without a code
+ * of its own when a key is missing
+ */
 int KOVANetIFGetIPConfig(const char *szIfname, NETINFO *pNetInfo);
+/**
+ * Holds the lock 0x105.
+ * @return 1 when BOOTPROTO of the interface's file is exactly "static"; else 0, also without a file, and with 0xD00
+ *         (name) or 0x400 (lock)
+ */
 int KOVANetIfIsStaticIP(const char *szIfname);
+/**
+ * The Ethernet link of an interface; for a port of the virtual switch that of the interface behind it. Of a bond of the
+ * virtual switch only the duplex, of the first member that answers, and the MTU (KOVAGetMTUSetting) are known.
+ * @param pEthInfo  receives the record; what is not known is -1 (nSupported 0xFFFFFFFF, szBestMode "")
+ * @param szIfname  interface, at most 16 characters
+ * @return 0; -1 with 0xD00, 0x3400 (no socket, unknown interface), 0x3600 (failed request), or the code of the bond or
+ *         MTU query; what is known by then is in the record
+ */
 int KOVANetGetEthInfo(ETHINFO *pEthInfo, const char *szIfname);
+/**
+ * Reads any key of an interface's file. Holds the lock 0x105.
+ * @param szIfname  interface
+ * @param szConf    key
+ * @param szValue   receives the value without its quotes, cut to the buffer, "" when there is none
+ * @param cbValue   size of szValue, above 0
+ * @return 1 found; 0 no such key; -1 with 0xD00, 0x400 (lock) or 0x900 (no file)
+ */
 int KLIBNetGetIfCfg(const char *szIfname, const char *szConf, char *szValue, int cbValue);
+/**
+ * Sets any key of an interface's file, quoted; a missing file is made. Holds the lock 0x106.
+ * @param szIfname  interface
+ * @param szConf    key
+ * @param szValue   value without newline; may be ""
+ * @return 0; -1 with 0xD00, 0x400 (lock) or the code of the rewrite (0x900, 0xB00, 0x2800)
+ */
 int KLIBNetSetIfCfg(const char *szIfname, const char *szConf, const char *szValue);
+/**
+ * Hardware address of a card: the cluster's for that number if there is one, else the card's own.
+ * @param index  number of the card as for KOVANetGetCard1, 0 to 31
+ * @param szMac  receives "aa:bb:cc:dd:ee:ff"
+ * @param cbMac  size of szMac, at least 18
+ * @return 0; -1 with 0xD00, 0xBC00 (no such card) or the code of the enumeration
+ */
 int KLIBNetGetMacAddr(int index, char *szMac, int cbMac);
+/**
+ * Hardware address of an interface, up or not.
+ * @param szMac  receives "aa:bb:cc:dd:ee:ff"
+ * @param cbMac  size of szMac, at least 18
+ * @return 0; -1 with 0xD00, 0x3400 (no socket, unknown interface) or 0x3600 (failed request)
+ */
 int KLIBNetGetMacAddrByInterface(const char *szIfname, char *szMac, int cbMac);
+/**
+ * Current IPv4 address of an interface.
+ * @param szIP  receives the dotted address, "" when there is none or on failure
+ * @param cbIP  size of szIP; an address that does not fit is refused whole
+ * @return 0, also without an address; -1 with 0xD00, 0x3400 (no socket, unknown interface) or 0x3600 (failed request)
+ */
 int KOVAILnxGetIP(const char *szIfname, char *szIP, int cbIP);
+/**
+ * Configured IPv4 address: key IPADDR of the interface's file. Holds the lock 0x105.
+ * @param szIP  receives the value, cut to the buffer, "" without the key
+ * @param cbIP  size of szIP, above 0
+ * @return 0, also without the key; -1 with 0xD00, 0x400 (lock) or 0x900 (no file)
+ */
 int KOVAILnxGetIPFromCfg(const char *szIfname, char *szIP, int cbIP);
+/**
+ * The interface that has an IPv4 address now, among those of KLIBNetInterfaceEnum(..., 0).
+ * @param szIP      dotted address
+ * @param szIfname  receives the name, "" when there is none
+ * @param cbIfname  size of szIfname; a name that does not fit is refused whole
+ * @return 1 found; 0 no interface has it; -1 with 0xD00, 0x1000 (no address) or the code of the enumeration
+ */
 int KOVANetIP2If(const char *szIP, char *szIfname, int cbIfname);
 
 /* ---- IPv4 address assignment ---------------------------------------------------------------------------------- */
@@ -160,6 +324,12 @@ int KLIBNetIfDown(const char *szIfname);
 int KLIBNetReInitIf(const char *szIfname);
 /** @return 1 when /sys/class/net/IF/flags says up; 0 when not, when it cannot be read, or with 0xD00 for the name */
 int KOVANetIsIFUp(const char *szIfname);
+/**
+ * Whether an interface has link: the kernel's running flag. A port of the virtual switch has the link of the interface
+ * behind it, a bond of the switch that of its first member that has link or cannot be asked.
+ * @return 1 link; 0 none; -1 with 0xD00 (name), 0x3400 (no socket, unknown interface), 0x3600 (failed request), or the
+ *         code of the bond query
+ */
 int KOVANetIfIsLink(const char *szIfname);
 
 /**

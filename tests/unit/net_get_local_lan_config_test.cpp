@@ -108,12 +108,7 @@ TEST_F(net_get_local_lan_config, KLIBNetGetLocalLanConfig_moreThanThirtyTwoNames
 }
 
 TEST_F(net_get_local_lan_config, KLIBNetGetLocalLanConfig_noOutput_isRefused) {
-    const auto refused = [](const std::string &condition) {
-        return outcome{.result = -1,
-                       .code = 0xD00,
-                       .unit = "net_get_local_lan_config",
-                       .log = {"ERR net_get_local_lan_config:N Invaild Argument (" + condition + ")=[0]"}};
-    };
-    EXPECT_OUTCOME(rig.observe([&] { return KLIBNetGetLocalLanConfig(nullptr, &count); }), {refused("NULL != names")});
-    EXPECT_OUTCOME(rig.observe([&] { return KLIBNetGetLocalLanConfig(names, nullptr); }), {refused("NULL != pCount")});
+    const auto refused = [](const std::string &condition) { return refusal("net_get_local_lan_config", condition); };
+    EXPECT_OUTCOME(rig.observe([&] { return KLIBNetGetLocalLanConfig(nullptr, &count); }), refused("NULL != names"));
+    EXPECT_OUTCOME(rig.observe([&] { return KLIBNetGetLocalLanConfig(names, nullptr); }), refused("NULL != pCount"));
 }

@@ -137,20 +137,10 @@ TEST_F(net_if_is_link, KOVANetIfIsLink_switchBondThatNamesItself_ends) {
 }
 
 TEST_F(net_if_is_link, KOVANetIfIsLink_badNames_areRefused) {
-    EXPECT_OUTCOME(is_link(nullptr), {.result = -1,
-                                      .code = 0xD00,
-                                      .unit = "net_if_is_link",
-                                      .log = {"ERR net_if_is_link:N Invaild Argument (((void *)0) != szIfname)=[0]"}});
-    EXPECT_OUTCOME(is_link(""), {.result = -1,
-                                 .code = 0xD00,
-                                 .unit = "net_if_is_link",
-                                 .log = {"ERR net_if_is_link:N Invaild Argument ('\\0' != *szIfname)=[0]"}});
+    EXPECT_OUTCOME(is_link(nullptr), refusal("net_if_is_link", "((void *)0) != szIfname"));
+    EXPECT_OUTCOME(is_link(""), refusal("net_if_is_link", "'\\0' != *szIfname"));
     for (const std::string &name : bad_names()) {
-        EXPECT_OUTCOME(is_link(name.c_str()),
-                       {.result = -1,
-                        .code = 0xD00,
-                        .unit = "net_if_is_link",
-                        .log = {"ERR net_if_is_link:N Invaild Argument (is_interface_name(szIfname))=[0]"}});
+        EXPECT_OUTCOME(is_link(name.c_str()), refusal("net_if_is_link", "is_interface_name(szIfname)"));
     }
 }
 

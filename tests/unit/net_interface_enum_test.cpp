@@ -26,12 +26,7 @@ protected:
         }
         return found;
     }
-    static outcome refused(const std::string &condition) {
-        return {.result = -1,
-                .code = 0xD00,
-                .unit = "net_interface_enum",
-                .log = {"ERR net_interface_enum:N Invaild Argument (" + condition + ")=[0]"}};
-    }
+    static outcome refused(const std::string &condition) { return refusal("net_interface_enum", condition); }
 
     fake_kernel kernel{rig};
     IFINFO records[40] = {};
@@ -128,10 +123,10 @@ TEST_F(net_interface_enum, KLIBNetInterfaceEnum_capacity_boundsTheRecords) {
 }
 
 TEST_F(net_interface_enum, KLIBNetInterfaceEnum_badArguments_areRefused) {
-    EXPECT_OUTCOME(get(0, -1), {refused("0 <= capacity")});
-    EXPECT_OUTCOME(get(0, INT_MIN), {refused("0 <= capacity")});
-    EXPECT_OUTCOME(get(3), {refused("0 <= selector && selector <= 2")});
-    EXPECT_OUTCOME(get(-1), {refused("0 <= selector && selector <= 2")});
+    EXPECT_OUTCOME(get(0, -1), refused("0 <= capacity"));
+    EXPECT_OUTCOME(get(0, INT_MIN), refused("0 <= capacity"));
+    EXPECT_OUTCOME(get(3), refused("0 <= selector && selector <= 2"));
+    EXPECT_OUTCOME(get(-1), refused("0 <= selector && selector <= 2"));
 }
 
 TEST_F(net_interface_enum, KLIBNetInterfaceEnum_interfaceThatVanishes_isLeftOut) {
@@ -159,7 +154,7 @@ TEST_F(net_interface_enum, KLIBNetInterfaceEnum_noSocket_is3400) {
                             .log = {"ERR net_interface_enum:N Cannot open control socket"}});
 }
 
-#ifndef __SANITIZE_ADDRESS__
+#ifndef __SANITIZE_ADDRESS__ // which owns the allocator
 TEST_F(net_interface_enum, KLIBNetInterfaceEnum_noMemory_is200) {
     kernel.add("eth0");
     rig.fail("malloc");

@@ -21,21 +21,17 @@ TEST_F(net_is_dev_type_match, KOVANetIsDevTypeMatch_nameOfTheKind_isOne) {
 TEST_F(net_is_dev_type_match, KOVANetIsDevTypeMatch_nameOfAnotherKind_isZeroWithNotFound) {
     kernel.add("eth0", {.flags = IFF_UP | IFF_SLAVE});
     const outcome not_found{.result = 0, .code = 0xBC00, .unit = "net_is_dev_type_match"};
-    EXPECT_OUTCOME(matches("eth0", 2), {not_found});
+    EXPECT_OUTCOME(matches("eth0", 2), not_found);
     for (const std::string &name : bad_names()) {
-        EXPECT_OUTCOME(matches(name.c_str(), 1), {not_found});
+        EXPECT_OUTCOME(matches(name.c_str(), 1), not_found);
     }
-    EXPECT_OUTCOME(matches("", 1), {not_found});
-    EXPECT_OUTCOME(matches("eth", 1), {not_found});
-    EXPECT_OUTCOME(matches("eth00", 1), {not_found});
+    EXPECT_OUTCOME(matches("", 1), not_found);
+    EXPECT_OUTCOME(matches("eth", 1), not_found);
+    EXPECT_OUTCOME(matches("eth00", 1), not_found);
 }
 
 TEST_F(net_is_dev_type_match, KOVANetIsDevTypeMatch_noName_isRefused) {
-    EXPECT_OUTCOME(matches(nullptr, 1),
-                   {.result = 0,
-                    .code = 0xD00,
-                    .unit = "net_is_dev_type_match",
-                    .log = {"ERR net_is_dev_type_match:N Invaild Argument (((void *)0) != szIfname)=[0]"}});
+    EXPECT_OUTCOME(matches(nullptr, 1), refusal("net_is_dev_type_match", "((void *)0) != szIfname", 0));
 }
 
 TEST_F(net_is_dev_type_match, KOVANetIsDevTypeMatch_failedEnumeration_isLoggedWithKindAndCode) {

@@ -74,26 +74,17 @@ TEST_F(net_lnx_get_ip, KOVAILnxGetIP_bufferOfExactSize_holdsTheAddress) {
 
 TEST_F(net_lnx_get_ip, KOVAILnxGetIP_bufferTooSmall_givesNoPartOfTheAddress) {
     kernel.add("eth0", {.ip = "192.168.100.200"});
-    EXPECT_OUTCOME(get_ip("eth0", 15),
-                   {.result = -1,
-                    .code = 0xD00,
-                    .unit = "net_lnx_get_ip",
-                    .log = {"ERR net_lnx_get_ip:N Invaild Argument (strlen(szAddress) < cbIP)=[0]"}});
+    EXPECT_OUTCOME(get_ip("eth0", 15), refusal("net_lnx_get_ip", "strlen(szAddress) < cbIP"));
     EXPECT_STREQ("", szIP);
 }
 
 TEST_F(net_lnx_get_ip, KOVAILnxGetIP_badArguments_areRefused) {
-    const auto refused = [](const std::string &condition) {
-        return outcome{.result = -1,
-                       .code = 0xD00,
-                       .unit = "net_lnx_get_ip",
-                       .log = {"ERR net_lnx_get_ip:N Invaild Argument (" + condition + ")=[0]"}};
-    };
-    EXPECT_OUTCOME(get_ip(nullptr), {refused("((void *)0) != szIfname")});
-    EXPECT_OUTCOME(get_ip(""), {refused("'\\0' != *szIfname")});
-    EXPECT_OUTCOME(get_ip("eth0", 0), {refused("0 < cbIP")});
-    EXPECT_OUTCOME(get_ip("eth0", -1), {refused("0 < cbIP")});
-    EXPECT_OUTCOME(rig.observe([] { return KOVAILnxGetIP("eth0", nullptr, 20); }), {refused("((void *)0) != szIP")});
+    const auto refused = [](const std::string &condition) { return refusal("net_lnx_get_ip", condition); };
+    EXPECT_OUTCOME(get_ip(nullptr), refused("((void *)0) != szIfname"));
+    EXPECT_OUTCOME(get_ip(""), refused("'\\0' != *szIfname"));
+    EXPECT_OUTCOME(get_ip("eth0", 0), refused("0 < cbIP"));
+    EXPECT_OUTCOME(get_ip("eth0", -1), refused("0 < cbIP"));
+    EXPECT_OUTCOME(rig.observe([] { return KOVAILnxGetIP("eth0", nullptr, 20); }), refused("((void *)0) != szIP"));
     EXPECT_STREQ("untouched", szIP);
 }
 
@@ -150,11 +141,7 @@ TEST_F(net_lnx_get_ip, KOVAILnxGetIPFromCfg_lockElsewhere_is400AndNothingIsRead)
 
 TEST_F(net_lnx_get_ip, KOVAILnxGetIPFromCfg_badNames_areRefused) {
     for (const std::string &name : bad_names()) {
-        EXPECT_OUTCOME(get_configured(name),
-                       {.result = -1,
-                        .code = 0xD00,
-                        .unit = "net_lnx_get_ip",
-                        .log = {"ERR net_lnx_get_ip:N Invaild Argument (is_interface_name(szIfname))=[0]"}});
+        EXPECT_OUTCOME(get_configured(name), refusal("net_lnx_get_ip", "is_interface_name(szIfname)"));
     }
     EXPECT_EQ(texts{}, list_dir("/etc/sysconfig/network-scripts"));
 }
