@@ -13,10 +13,13 @@ namespace {
 
 constexpr uint32_t kLink = 2;
 
-/** An address request whose answer may be that there is none. */
-template<size_t Size> int read_address(int result, uint32_t address, char (&field)[Size]) {
-    if (result < 0) {
-        field[0] = '\0';
+using address_request = int (interface_socket::*)(const char *, uint32_t &) const;
+
+/** Reads an address; there may be none. @return 0; -1 with errno */
+template<size_t Size>
+int read_address(const interface_socket &socket, address_request request, const char *szIfname, char (&field)[Size]) {
+    uint32_t address = 0;
+    if ((socket.*request)(szIfname, address) < 0) {
         return errno == EADDRNOTAVAIL ? 0 : -1;
     }
     address_text text;
@@ -61,13 +64,11 @@ int read_record(const interface_socket &socket, const char *szIfname, unsigned f
     copy_text(record.szIfname, szIfname);
     record.nFlags = flags;
     record.nLink = (flags & IFF_RUNNING) != 0 ? kLink : 0;
-    uint32_t address = 0;
-    uint32_t mask = 0;
     if (socket.hardware_address(szIfname, record.abMac) < 0 ||
-        read_address(socket.address(szIfname, address), address, record.szIP) < 0) {
+        read_address(socket, &interface_socket::address, szIfname, record.szIP) < 0) {
         return -1;
     }
-    return read_address(socket.netmask(szIfname, mask), mask, record.szMask);
+    return read_address(socket, &interface_socket::netmask, szIfname, record.szMask);
 }
 
 void correct_switch_link(IFINFO &record) {

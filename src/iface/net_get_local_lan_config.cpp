@@ -11,12 +11,14 @@ using namespace kova;
 
 constexpr int kMaxLocalLans = 32;
 
-/** The shipped list, read once per process; a failed read is tried again. */
-struct {
+struct lan_list {
     bool is_read;
     int number;
     char names[kMaxLocalLans][16];
-} local_lans;
+};
+
+/** The shipped list, read once per process; a failed read is tried again. */
+lan_list local_lans;
 
 /** @return 0; -1 with log and code */
 int read_local_lans() {
@@ -25,16 +27,16 @@ int read_local_lans() {
         return fail(HERE, NET_ERR_UNKNOWN, -1, "Failed to get [%s] from [%s], kovaerr=[0x%04X]", "local_lan",
                     kKovaInfoDefaults, KLIBCErrGet());
     }
-    int number = 0;
+    lan_list read = {};
     char *rest = nullptr;
     for (const char *name = KLIBCStrTok(list, " ", &rest); name != nullptr; name = KLIBCStrTok(nullptr, " ", &rest)) {
-        if (number == kMaxLocalLans) {
+        if (read.number == kMaxLocalLans) {
             return fail(HERE_BARE, NET_ERR_UNKNOWN, -1, "local lan exceed NUM_MAXIFACES");
         }
-        copy_text(local_lans.names[number++], name);
+        copy_text(read.names[read.number++], name);
     }
-    local_lans.number = number;
-    local_lans.is_read = true;
+    read.is_read = true;
+    local_lans = read;
     return 0;
 }
 

@@ -4,6 +4,7 @@ to the network namespace "net", in which the servers and the other hosts live.""
 import os
 import pathlib
 import re
+import shutil
 import socket
 import subprocess
 import threading
@@ -19,7 +20,7 @@ def pytest_runtest_setup():
         pytest.fail("lab tests write to /etc and /sbin: run them inside the box", pytrace=False)
 
 
-def wait_for(condition, limit=5.0, what="the condition"):
+def wait_for(condition, limit=10.0, what="the condition"):
     """The first true value of condition(); fails the test when it takes longer than limit seconds."""
     end = time.monotonic() + limit
     while True:
@@ -46,7 +47,7 @@ def on_other_side(*command, **options):
 class Daemon:
     """A process that serves a test: started, waited for until it is ready, ended by its pid."""
 
-    def __init__(self, command, ready, limit=5.0):
+    def __init__(self, command, ready, limit=10.0):
         self.process = subprocess.Popen([str(word) for word in command], stdin=subprocess.DEVNULL)
         try:
             wait_for(lambda: self.is_ready(ready), limit, f"{command[0]}'s start")
@@ -116,6 +117,47 @@ class SystemLog:
         os.unlink("/dev/log")
 
 
+class HeldProgram:
+    """Puts a script in a program's place: the first run whose arguments hold a text waits until it is released."""
+
+    def __init__(self, program, text, folder):
+        self.program, self.before = pathlib.Path(program), folder / "real" / pathlib.Path(program).name
+        self.first, self.held = folder / "first", folder / "held"
+        self.before.parent.mkdir()
+        self.held.touch()
+        shutil.move(self.program, self.before)
+        self.program.write_text(
+            f"#!/bin/sh\ncase \"$*\" in *'{text}'*)\n    mkdir {self.first} 2>/dev/null &&\n"
+            f"        while [ -e {self.held} ]; do sleep 0.02; done ;;\nesac\nexec {self.before} \"$@\"\n"
+        )
+        self.program.chmod(0o755)
+
+    def is_waiting(self):
+        return self.first.exists()
+
+    def release(self):
+        self.held.unlink(missing_ok=True)
+
+    def put_back(self):
+        self.release()
+        self.program.unlink()
+        shutil.move(self.before, self.program)
+
+
+@pytest.fixture
+def hold(tmp_path):
+    """hold(program, text): a HeldProgram until the test ends."""
+    held = []
+
+    def put(program, text):
+        held.append(HeldProgram(program, text, tmp_path))
+        return held[-1]
+
+    yield put
+    for program in held:
+        program.put_back()
+
+
 @pytest.fixture
 def system_log():
     log = SystemLog()
@@ -137,7 +179,7 @@ def is_up(link):
 
 
 def processes(text):
-    """Pids of the living processes whose command line holds a text, and of the zombies none."""
+    """Pids of the living processes whose command line holds a text; zombies have none."""
     found = []
     for folder in pathlib.Path("/proc").glob("[0-9]*"):
         try:

@@ -190,6 +190,17 @@ def test_stop_right_after_start_leaves_nothing(make_job, tmp_path):
     assert not processes("sleep 1234")
 
 
+def test_stop_of_a_job_that_has_no_session_yet(make_job, hold):
+    notes = make_job("early")
+    step = hold("/usr/bin/setsid", "early")
+    run("/sbin/start", "early")
+    wait_for(step.is_waiting, what="the job's process")
+    run("/sbin/stop", "early")
+    assert not processes("early run")
+    step.release()
+    assert "run" not in notes.read_text().split()
+
+
 def test_parallel_starts_are_one_job(make_job):
     notes = make_job("crowded", run_as="exec sleep 4321")
     with concurrent.futures.ThreadPoolExecutor(10) as pool:
@@ -217,6 +228,19 @@ def test_job_that_died_can_be_started_again(make_job):
     run("/sbin/start", "mortal")
     assert pid_of("mortal") != first
     assert is_alive(pid_of("mortal"))
+
+
+def test_helpers_of_a_job_that_died_end_before_the_next_start(make_job):
+    make_job("orphaned", run_as="sleep 3456 & exec sleep 6543")
+    run("/sbin/start", "orphaned")
+    wait_for(lambda: processes("sleep 3456") and processes("sleep 6543"))
+    [helper] = processes("sleep 3456")
+    first = pid_of("orphaned")
+    os.kill(first, signal.SIGKILL)
+    wait_for(lambda: not is_alive(first))
+    run("/sbin/start", "orphaned")
+    assert not is_alive(helper)
+    wait_for(lambda: processes("sleep 6543") == [pid_of("orphaned")])
 
 
 def test_stop_leaves_a_stranger_with_the_same_number_alone(make_job):

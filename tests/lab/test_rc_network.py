@@ -173,7 +173,7 @@ def test_dhcp_and_back_to_static(tmp_path):
         configure("kx12", "BOOTPROTO=dhcp\nONBOOT=yes\n")
         network("start", "kx12")
         leased = wait_for(lambda: addresses("kx12"), what="a lease")[0]
-        assert leased.startswith("192.168.60.1") and leased.endswith("/24")
+        assert leased.startswith("192.168.60.") and leased.endswith("/24")
 
         configure("kx12", STATIC.format("192.168.61.5"))
         network("start", "kx12")
@@ -202,7 +202,7 @@ def test_without_names_the_interfaces_of_the_boot_are_meant():
     assert is_up("kx12")
 
 
-@pytest.mark.parametrize("copy", ["eth0.tmp1700000000", "eth0.saved", ".eth0.swp", "eth0~", "eth0.bak"])
+@pytest.mark.parametrize("copy", ["eth0.tmp1700000000", "eth0.tmp17", "eth0.saved", ".eth0.swp", "eth0~", "eth0.bak"])
 def test_copies_are_no_interfaces(copy, keep):
     configure("eth0", STATIC.format("192.168.77.5"))
     keep(SCRIPTS / f"ifcfg-{copy}").write_text(STATIC.format("192.168.78.6"))

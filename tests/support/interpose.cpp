@@ -280,6 +280,9 @@ struct open_event {
 };
 std::map<uint64_t, open_event> events;
 
+/** True while the platform sets a text on behalf of another setter: that is no argument of its own. */
+bool is_setting = false;
+
 int set_argument(const char *operation, uint64_t handle, const std::string &text) {
     if (is_failing(operation, 0x200)) {
         return -1;
@@ -308,12 +311,14 @@ extern "C" int KLIBPluginSDKInit(const char *component, const char *event, uint6
 extern "C" int KLIBPluginSetArg(uint64_t handle, const char *key, const char *value) {
     static const auto next = real<int (*)(uint64_t, const char *, const char *)>("KLIBPluginSetArg");
     const int result = next(handle, key, value);
-    return result < 0 ? result : set_argument("KLIBPluginSetArg", handle, std::string(key) + "=" + value);
+    return result < 0 || is_setting ? result : set_argument("KLIBPluginSetArg", handle, std::string(key) + "=" + value);
 }
 
 extern "C" int KLIBPluginSetArgByInt(uint64_t handle, const char *key, int value) {
     static const auto next = real<int (*)(uint64_t, const char *, int)>("KLIBPluginSetArgByInt");
+    is_setting = true;
     const int result = next(handle, key, value);
+    is_setting = false;
     return result < 0 ? result
                       : set_argument("KLIBPluginSetArgByInt", handle, std::string(key) + "=" + std::to_string(value));
 }

@@ -58,10 +58,15 @@ read_stat() {
     process_start=$1
 }
 
-# survivors: prints the living processes of the recorded instance. The record holds the session's leader and when it
-# started, so that another process that was given the same number later is left alone.
+# read_record: sets $leader, the leader of the instance's session, and $leader_start, which tells it from another process
+# that was given the same number later
+read_record() {
+    { read -r leader leader_start <"$record"; } 2>/dev/null
+}
+
+# survivors: prints the living processes of the recorded instance
 survivors() {
-    { read -r leader leader_start <"$record"; } 2>/dev/null || return 0
+    read_record || return 0
     read_stat "$leader" && [ "$process_start" != "$leader_start" ] && return 0
     for process in /proc/[0-9]*; do
         process=${process#/proc/}
@@ -73,5 +78,22 @@ survivors() {
 }
 
 is_running() {
-    [ -n "$(survivors)" ]
+    read_record && read_stat "$leader" && [ "$process_start" = "$leader_start" ] && [ "$process_state" != Z ]
+}
+
+# gone_after SIGNAL TENTHS: signals what is left of the instance until nothing is, for at most that long
+gone_after() {
+    for _ in $(seq $(($2 * 4))); do
+        processes=$(survivors)
+        [ -n "$processes" ] || return 0
+        for process in $processes; do kill "-$1" "$process" 2>/dev/null; done
+        sleep 0.025
+    done
+    return 1
+}
+
+# end_processes: asks the leader, which may tidy up, then ends whatever is left of its session
+end_processes() {
+    is_running && kill -TERM "$leader" 2>/dev/null
+    gone_after 0 15 || gone_after KILL 10 || fail "$job: a process of ${record##*/} does not end"
 }

@@ -1,0 +1,30 @@
+/**
+ * @file
+ * The objects of the command line: kovanet OBJECT VERB ... Each adds its verbs below its own command.
+ */
+#pragma once
+
+#include <CLI/CLI.hpp>
+
+namespace kova {
+
+/** Options that every command takes. */
+struct global_options {
+    bool json = false;
+    bool verbose = false;
+};
+
+void add_card(CLI::App &object, const global_options &options);
+void add_link(CLI::App &object, const global_options &options);
+void add_addr(CLI::App &object, const global_options &options);
+void add_stats(CLI::App &object, const global_options &options);
+void add_block(CLI::App &object, const global_options &options);
+void add_check(CLI::App &object, const global_options &options);
+
+/** Where the words of one command go: CLI11 fills it, and it lives until the program ends. */
+template<typename Words> Words &words_of() {
+    static Words words;
+    return words;
+}
+
+} // namespace kova

@@ -1,0 +1,41 @@
+/**
+ * @file
+ * The library's checks with their reasons. Each gives nothing for a value the library accepts, else the rule it breaks
+ * in plain words.
+ */
+#pragma once
+
+#include <optional>
+#include <string>
+
+namespace kova {
+
+using refusal = std::optional<std::string>;
+
+refusal refuse_address(const std::string &address);
+refusal refuse_mask(const std::string &mask);
+/** Address and mask, and whether they fit each other. */
+refusal refuse_address_and_mask(const std::string &address, const std::string &mask);
+/** "ADDRESS/LENGTH" as it names a network. */
+refusal refuse_prefix(const std::string &prefix);
+/** With or without "/LENGTH". */
+refusal refuse_ipv6(const std::string &address);
+refusal refuse_hostname(const std::string &name);
+refusal refuse_domain(const std::string &name);
+refusal refuse_interface_name(const std::string &name);
+
+/** Ends the program when there is a refusal. */
+void require(const std::string &what, const refusal &refused);
+
+/** The plain decimal form of an accepted address: parts may also be written octal or hexadecimal. */
+std::string plain_address(const std::string &address);
+
+/** A network given as "ADDRESS/LENGTH". */
+struct network {
+    std::string address;
+    std::string mask;
+};
+/** The network that an accepted prefix names. */
+network network_of(const std::string &prefix);
+
+} // namespace kova
