@@ -2,6 +2,7 @@
  * @file
  * The replaced calls of the rig: same names, found before the real ones.
  */
+#include "support/memory.h"
 #include "support/rig.h"
 
 #include <cerrno>
@@ -541,6 +542,15 @@ extern "C" time_t time(time_t *out) noexcept {
 
 // ---- memory: a sanitizer owns these calls in its builds, and memory failures are then made by the containers alone
 
+static volatile unsigned long allocations; // seen by the malloc below
+
+bool kova_test::owns_allocator() {
+    const unsigned long before = allocations;
+    void *volatile block = malloc(1); // volatile, or the compiler leaves both calls out
+    free(block);
+    return allocations != before;
+}
+
 #ifndef __SANITIZE_ADDRESS__
 
 extern "C" void *__libc_malloc(size_t);
@@ -566,6 +576,7 @@ bool is_memory_failing(const char *operation, const void *caller) {
 } // namespace
 
 extern "C" void *malloc(size_t size) noexcept {
+    allocations = allocations + 1;
     return is_memory_failing("malloc", __builtin_return_address(0)) ? nullptr : __libc_malloc(size);
 }
 
