@@ -7,22 +7,15 @@
 
 namespace kova {
 
-namespace {
-
-/** Runs the copy; a tool that says no leaves no errno of its own, so that none of an earlier call is reported. */
-bool copy_file(const char *from, const char *to) {
-    errno = 0;
-    return KLIBCExec("/bin/cp", "-f", from, to, nullptr) == 0;
-}
-
-} // namespace
-
 file_backup::file_backup(const place &at, const path_text &file)
-    : at_(at), file_(file), copy_("%s.tmp%ld", file.c_str(), static_cast<long>(time(nullptr))),
-      is_made_(copy_file(file_.c_str(), copy_.c_str())) {
-    at_.begin = lead::unit;
+    : at_(at), file_(file), copy_("%s.tmp%ld", file.c_str(), static_cast<long>(time(nullptr))) {
+    const int status = KLIBCExec("/bin/cp", "-f", file_.c_str(), copy_.c_str(), nullptr);
+    is_made_ = status == 0;
     if (!is_made_) {
-        log_info(at_, "copy (%s, %s) failed.(strerror=%s)", file_.c_str(), copy_.c_str(), strerror(errno));
+        at_.begin = lead::unit;
+        // a tool that ran and failed leaves no errno
+        log_info(at_, "copy (%s, %s) failed.(strerror=%s)", file_.c_str(), copy_.c_str(),
+                 strerror(status < 0 ? errno : 0));
     }
     at_.begin = lead::function_colon;
 }

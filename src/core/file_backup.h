@@ -27,7 +27,7 @@ private:
     place at_;
     path_text file_;
     path_text copy_;
-    bool is_made_;
+    bool is_made_ = false;
 };
 
 } // namespace kova

@@ -36,6 +36,9 @@ extern "C" int KOVANetIPv6IPAction(int nCmd, const char *szDevice, const char *s
     if (is_missing(szDevice)) {
         return fail(HERE, NET_ERR_BAD_PARAMETER, -1, "Paramter szDevice can not be NULL");
     }
+    if (refuses_ifname(HERE, "szDevice", szDevice)) {
+        return -1;
+    }
     if (nCmd != kAdd && nCmd != kDelete) {
         return fail_keeping_code(HERE, -1, "Paramter KOVAIPV6IPCMD is not a legal parameter");
     }

@@ -1,4 +1,5 @@
 #include "support/fake_kernel.h"
+#include "support/memory.h"
 
 #include <cerrno>
 #include <climits>
@@ -176,8 +177,8 @@ TEST_F(net_get_card1, KOVANetGetCard1_cardThatVanishes_isPassedOver) {
     EXPECT_STREQ("eth1", card.szIfname);
 }
 
-#ifndef __SANITIZE_ADDRESS__ // which owns the allocator
 TEST_F(net_get_card1, KOVANetGetCard1_noMemory_is200) {
+    NEEDS_OWN_ALLOCATOR();
     add_static("eth0", "10.0.0.1");
     rig.fail("calloc");
     EXPECT_OUTCOME(get(0), {.result = -1,
@@ -186,7 +187,6 @@ TEST_F(net_get_card1, KOVANetGetCard1_noMemory_is200) {
                             .log = {"ERR net_get_card1:N Failed to alloc memory."},
                             .locks = outer});
 }
-#endif
 
 TEST_F(net_get_card1, KOVANetGetCard1Ex_kind_choosesAmongWhichCards) {
     add_static("eth0", "10.0.0.1");

@@ -1,4 +1,5 @@
 #include "support/fake_kernel.h"
+#include "support/memory.h"
 
 #include <cerrno>
 #include <climits>
@@ -329,8 +330,8 @@ TEST_F(net_get_interface_info, KLIBNetGetInterfaceInfo_interfaceThatVanishes_isL
     }
 }
 
-#ifndef __SANITIZE_ADDRESS__ // which owns the allocator
 TEST_F(net_get_interface_info, KLIBNetGetInterfaceInfo_noMemoryForTheList_failsAndIsTriedAgain) {
+    NEEDS_OWN_ALLOCATOR();
     GTEST_FLAG_SET(death_test_style, "threadsafe"); // a process that never made its list
     EXPECT_EXIT(
         {
@@ -347,7 +348,6 @@ TEST_F(net_get_interface_info, KLIBNetGetInterfaceInfo_noMemoryForTheList_failsA
         },
         ::testing::ExitedWithCode(0), "");
 }
-#endif
 
 TEST_F(net_get_interface_info, KLIBNetGetInterfaceInfo_realInterfaces_areRead) {
     rig.answer_ioctl({});

@@ -1,4 +1,5 @@
 #include "support/fake_kernel.h"
+#include "support/memory.h"
 
 #include <cerrno>
 #include <climits>
@@ -154,8 +155,8 @@ TEST_F(net_interface_enum, KLIBNetInterfaceEnum_noSocket_is3400) {
                             .log = {"ERR net_interface_enum:N Cannot open control socket"}});
 }
 
-#ifndef __SANITIZE_ADDRESS__ // which owns the allocator
 TEST_F(net_interface_enum, KLIBNetInterfaceEnum_noMemory_is200) {
+    NEEDS_OWN_ALLOCATOR();
     kernel.add("eth0");
     rig.fail("malloc");
     rig.fail("calloc");
@@ -164,4 +165,3 @@ TEST_F(net_interface_enum, KLIBNetInterfaceEnum_noMemory_is200) {
                             .unit = "net_interface_enum",
                             .log = {"ERR net_interface_enum:N Failed to alloc memory."}});
 }
-#endif

@@ -1,3 +1,4 @@
+#include "support/memory.h"
 #include "support/rig.h"
 
 #include <climits>
@@ -86,20 +87,20 @@ TEST_F(net_stat_init, KLIBNetStatInit_badCount_isRefused) {
     }
 }
 
-#ifndef __SANITIZE_ADDRESS__ // which owns the allocator
 TEST_F(net_stat_init, KLIBNetStatInit_noMemory_fails) {
+    NEEDS_OWN_ALLOCATOR();
     rig.fail("calloc");
     EXPECT_OUTCOME(rig.observe([] { return KLIBNetStatInit(64) == nullptr ? 0 : 1; }),
                    {.result = 0, .code = 0x200, .unit = "net_stat_init"});
 }
 
 TEST_F(net_stat_init, KLIBNetStatGetSingle_noMemory_fails) {
+    NEEDS_OWN_ALLOCATOR();
     NETSTAT record = {};
     rig.fail("calloc");
     EXPECT_OUTCOME(rig.observe([&] { return KLIBNetStatGetSingle("lo", &record); }),
                    {.result = -1, .code = 0x200, .unit = "net_stat_init"});
 }
-#endif
 
 TEST_F(net_stat_init, KLIBNetStatFree_null_isAllowed) {
     EXPECT_OUTCOME(rig.observe([] {
