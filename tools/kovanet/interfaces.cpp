@@ -57,7 +57,7 @@ std::vector<NETSTAT> all_counters() {
     if (count < 0) {
         call_failed("cannot read the interfaces");
     }
-    return {stats.get(), stats.get() + count};
+    return std::vector<NETSTAT>(stats.get(), stats.get() + count);
 }
 
 std::vector<IFINFO> all_interfaces() {
