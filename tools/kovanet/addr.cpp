@@ -115,10 +115,8 @@ void list(const std::optional<std::string> &name, bool as_json) {
     if (name) {
         add_rows(rows, require_interface(*name));
     } else {
-        for (const std::string &each : all_names()) {
-            if (const std::optional<IFINFO> info = find_interface(each)) { // it may be gone by now
-                add_rows(rows, *info);
-            }
+        for (const IFINFO &info : all_interfaces()) {
+            add_rows(rows, info);
         }
     }
     if (as_json) {

@@ -57,15 +57,21 @@ std::vector<NETSTAT> all_counters() {
     if (count < 0) {
         call_failed("cannot read the interfaces");
     }
-    return {stats.get(), stats.get() + count};
+    return std::vector<NETSTAT>(stats.get(), stats.get() + count);
 }
 
-std::vector<std::string> all_names() {
-    std::vector<std::string> names;
+std::vector<IFINFO> all_interfaces() {
+    std::vector<IFINFO> all;
     for (const NETSTAT &stat : all_counters()) {
-        names.emplace_back(stat.szIfname);
+        const std::string name = stat.szIfname;
+        if (refuse_interface_name(name)) {
+            continue;
+        }
+        if (const std::optional<IFINFO> info = find_interface(name)) { // it may be gone by now
+            all.push_back(*info);
+        }
     }
-    return names;
+    return all;
 }
 
 std::string mac_text(const unsigned char (&mac)[6]) {

@@ -28,11 +28,11 @@ public:
 std::optional<IFINFO> find_interface(const std::string &name);
 /** The same, ending the program also for an unknown name. */
 IFINFO require_interface(const std::string &name);
+/** All interfaces there are, sorted by name, without those whose names the library refuses. */
+std::vector<IFINFO> all_interfaces();
 
-/** Counters of all interfaces, sorted by name; so also the list of the interfaces there are. */
+/** Counters of all interfaces, sorted by name. */
 std::vector<NETSTAT> all_counters();
-/** Their names. */
-std::vector<std::string> all_names();
 
 /** A hardware address as "52:54:00:12:34:56". */
 std::string mac_text(const unsigned char (&mac)[6]);

@@ -40,10 +40,8 @@ void show(const std::optional<std::string> &name, bool as_json) {
     if (name) {
         rows.push_back(describe(require_interface(*name)));
     } else {
-        for (const std::string &each : all_names()) {
-            if (const std::optional<IFINFO> info = find_interface(each)) { // it may be gone by now
-                rows.push_back(describe(*info));
-            }
+        for (const IFINFO &info : all_interfaces()) {
+            rows.push_back(describe(info));
         }
     }
     if (as_json) {
