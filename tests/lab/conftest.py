@@ -81,7 +81,7 @@ class DhcpServer(Daemon):
         on_other_side("ip", "addr", "replace", f"{network}.1/24", "dev", link)
         self.log = folder / f"dnsmasq.{link}.log"
         command = [
-            *OTHER_SIDE, "dnsmasq", "--keep-in-foreground", "--conf-file=/dev/null", f"--interface={link}",
+            *OTHER_SIDE, "dnsmasq", "--no-daemon", "--conf-file=/dev/null", f"--interface={link}",
             "--bind-interfaces", f"--dhcp-range={network}.10,{network}.20,255.255.255.0,600", "--dhcp-authoritative",
             "--no-ping", "--log-dhcp", "--user=root", "--group=root", "--port=0", f"--log-facility={self.log}",
             f"--dhcp-leasefile={folder}/leases.{link}", f"--pid-file={folder}/dnsmasq.{link}.pid", *more,
