@@ -217,8 +217,10 @@ def test_size_is_a_limit(box):
 
 def test_links_are_up_on_both_sides(shell):
     options = ["--link", "eth0", "--link", "lan0"]
+    # the kernel notes the state of a link a moment after it changed
+    settled = "for i in $(seq 200); do {0} -br link | grep -q DOWN || break; sleep 0.05; done; {0} -br link"
     for side in ("ip", "ip -n net"):
-        rows = [line.replace("@", " ").split() for line in shell(f"{side} -br link", options=options).splitlines()]
+        rows = [line.replace("@", " ").split() for line in shell(settled.format(side), options=options).splitlines()]
         assert [row[0] for row in rows] == ["lo", "eth0", "lan0"]
         assert [row[2] for row in rows[1:]] == ["UP", "UP"] and "UP" in rows[0][3]
     assert shell("ip netns exec net ls /sys/class/net", options=options).split() == ["eth0", "lan0", "lo"]
