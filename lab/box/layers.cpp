@@ -36,7 +36,7 @@ upper_layers::upper_layers(fs::path folder, const fs::path &root) : folder_(std:
 }
 
 fs::path upper_layers::add(const fs::path &directory) {
-    const fs::path layer = folder_ / std::to_string(layers_.size());
+    fs::path layer = folder_ / std::to_string(layers_.size());
     make_like_host(layer, directory, 0755);
     layers_[directory] = layer;
     return layer;
@@ -53,7 +53,7 @@ fs::path upper_layers::place(const fs::path &directory) const {
 
 fs::path upper_layers::cover(const fs::path &directory, mode_t mode) {
     const fs::path real = fs::weakly_canonical(directory);
-    const fs::path target = place(real);
+    fs::path target = place(real);
     if (!fs::exists(target)) {
         cover(real.parent_path());
         make_like_host(target, real, mode);

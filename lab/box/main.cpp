@@ -85,23 +85,26 @@ void parse(CLI::App &app, int argc, char **argv, kova::box_options &options) {
     }
 }
 
-} // namespace
-
-int main(int argc, char **argv) {
+int run(int argc, char **argv) {
     CLI::App app{"Runs a command in a throw-away appliance; nothing of it stays on this system."};
     kova::box_options options;
     try {
         parse(app, argc, argv, options);
     } catch (const CLI::Success &help) {
         return app.exit(help);
-    } catch (const CLI::Error &error) {
-        fprintf(stderr, "kova-box: %s\n", error.what());
-        return kova::kNoBox;
     }
+    return kova::run_box(options);
+}
+
+} // namespace
+
+int main(int argc, char **argv) {
     try {
-        return kova::run_box(options);
+        return run(argc, argv);
     } catch (const std::exception &error) {
         fprintf(stderr, "kova-box: %s\n", error.what());
+        return kova::kNoBox;
+    } catch (...) {
         return kova::kNoBox;
     }
 }

@@ -3,6 +3,7 @@
 #include <fcntl.h>
 #include <filesystem>
 #include <sched.h>
+#include <sstream>
 #include <sys/mount.h>
 
 namespace kova {
@@ -44,6 +45,14 @@ void name_other_side(const unique_fd &other_side) {
     bind_mount(path_of(other_side), names + "/net");
 }
 
+// The command that makes a link from the other side. The two ends get different numbers: the kernel puts off by up to a
+// second what happens to a link whose peer has the same number. Process 1 of the box is this one.
+std::string add_link(const std::string &name, int number) {
+    std::ostringstream command;
+    command << "link add " << name << " index " << number << " type veth peer name " << name << " netns 1\n";
+    return command.str();
+}
+
 } // namespace
 
 unique_fd enter_network_namespace(const box_options &options) {
@@ -66,15 +75,12 @@ void wire_network(const box_options &options, const unique_fd &other_side) {
     make_ipv6_quick_in(other_side);
     name_other_side(other_side);
 
-    // The two ends get different numbers: the kernel may put off by a second what happens to a link whose peer has its
-    // own number, which it takes for a link without one. Process 1 of the box is this one.
     std::string there = here;
     int number = 101;
     for (const std::string &link : options.links) {
-        there +=
-            "link add " + link + " index " + std::to_string(number++) + " type veth peer name " + link + " netns 1\n";
-        there += "link set " + link + " up\n";
-        here += "link set " + link + " up\n";
+        const std::string bring_up = "link set " + link + " up\n";
+        there += add_link(link, number++) + bring_up;
+        here += bring_up;
     }
     run_program({"ip", "-n", "net", "-batch", "-"}, there);
     run_program({"ip", "-batch", "-"}, here);

@@ -38,6 +38,7 @@ struct host_directory {
 
 std::vector<host_directory> open_directories(const std::vector<std::string> &paths) {
     std::vector<host_directory> directories;
+    directories.reserve(paths.size());
     for (const std::string &path : paths) {
         directories.push_back({fs::canonical(path), open_file(path, O_PATH | O_DIRECTORY)});
     }

@@ -45,6 +45,15 @@ terminal_use terminal_of_caller() {
     return tcgetpgrp(STDIN_FILENO) == getpgrp() ? terminal_use::foreground : terminal_use::background;
 }
 
+// Ends kova-box as it was told to, so that a shell script around stops too.
+void end_by(int ending_signal) {
+    sigset_t all;
+    sigfillset(&all);
+    signal(ending_signal, SIG_DFL);
+    sigprocmask(SIG_UNBLOCK, &all, nullptr);
+    raise(ending_signal);
+}
+
 class supervisor {
 public:
     supervisor(pid_t box, unique_fd channel, unique_fd signals, terminal_use use)
@@ -115,12 +124,7 @@ int supervisor::wait() {
     take_terminal_back();
     require(ended == box_, "cannot wait for the box");
     if (ended_by_ != 0) {
-        // end as told, so that a shell script around stops too
-        signal(ended_by_, SIG_DFL);
-        sigset_t all;
-        sigfillset(&all);
-        raise(ended_by_);
-        sigprocmask(SIG_UNBLOCK, &all, nullptr);
+        end_by(ended_by_);
     }
     return exit_status(status);
 }

@@ -61,6 +61,7 @@ void bind_mount(const std::string &source, const std::string &target) {
 
 std::vector<char *> argument_vector(const std::vector<std::string> &arguments) {
     std::vector<char *> vector;
+    vector.reserve(arguments.size() + 1);
     for (const std::string &argument : arguments) {
         vector.push_back(const_cast<char *>(argument.c_str()));
     }

@@ -15,8 +15,9 @@ import pytest
 OTHER_SIDE = ("ip", "netns", "exec", "net")
 
 
-def pytest_runtest_setup():
-    if "KOVA_BOX" not in os.environ:
+def pytest_runtest_setup(item):
+    # the tests of the box itself make boxes, from outside
+    if "KOVA_BOX" not in os.environ and item.path.name != "test_box.py":
         pytest.fail("lab tests write to /etc and /sbin: run them inside the box", pytrace=False)
 
 
