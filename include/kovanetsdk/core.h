@@ -8,8 +8,9 @@
 #ifndef KOVANETSDK_CORE_H
 #define KOVANETSDK_CORE_H
 
-#define NET_ERR_UNKNOWN 0x100       /**< a lower step failed without a more specific cause */
-#define NET_ERR_OUT_OF_MEMORY 0x200 /**< memory, a list or a map could not be had; a cluster address is not ready yet  \
+#define NET_ERR_UNKNOWN 0x100 /**< a lower step failed without a more specific cause */
+#define NET_ERR_OUT_OF_MEMORY                                                                                          \
+    0x200                           /**< memory, a list or a map could not be had; a cluster address is not ready yet  \
                                      */
 #define NET_ERR_LOCK 0x400          /**< the configuration lock could not be taken */
 #define NET_ERR_FILE_OPEN 0x900     /**< a file could not be opened, created or read */

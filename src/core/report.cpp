@@ -107,44 +107,17 @@ int fail_socket(const place &at, int result) {
     return fail(at, NET_ERR_SOCKET, result, "Cannot open control socket");
 }
 
-bool refuses(const place &at, bool holds, const char *condition) {
-    if (!holds) {
-        fail(at, NET_ERR_BAD_PARAMETER, 0, "Invaild Argument (%s)=[%d]\n", condition, 0);
-    }
-    return !holds;
+void report_refused(const place &at, const char *condition) {
+    fail(at, NET_ERR_BAD_PARAMETER, 0, "Invaild Argument (%s)=[%d]\n", condition, 0);
 }
 
-namespace {
-
-/** A condition about an argument's name. */
-[[gnu::format(printf, 3, 0)]] bool refuses_named(const place &at, bool holds, const char *condition, const char *name) {
-    if (holds) {
-        return false;
-    }
+void report_refused(const place &at, const char *condition, const char *name) {
     char text[128];
 #pragma GCC diagnostic push
 #pragma GCC diagnostic ignored "-Wformat-nonliteral"
     snprintf(text, sizeof text, condition, name);
 #pragma GCC diagnostic pop
-    return refuses(at, false, text);
-}
-
-} // namespace
-
-bool refuses_null_text(const place &at, const char *name, const char *text) {
-    return refuses_named(at, text != nullptr, "((void *)0) != %s", name);
-}
-
-bool refuses_text(const place &at, const char *name, const char *text) {
-    return refuses_null_text(at, name, text) || refuses_named(at, *text != '\0', "'\\0' != *%s", name);
-}
-
-bool refuses_null(const place &at, const char *name, const void *pointer) {
-    return refuses_named(at, pointer != nullptr, "NULL != %s", name);
-}
-
-bool refuses_ifname(const place &at, const char *name, const char *text) {
-    return refuses_text(at, name, text) || refuses_named(at, is_interface_name(text), "is_interface_name(%s)", name);
+    report_refused(at, text);
 }
 
 bool is_interface_name(const char *text) {

@@ -78,21 +78,59 @@ int fail_lock(const place &at, int result);
 /** A socket for interface requests could not be had. */
 int fail_socket(const place &at, int result);
 
-/**
- * Argument checks: log "Invaild Argument" with the condition that had to hold, set NET_ERR_BAD_PARAMETER and answer
- * true when the argument is to be refused.
- */
-[[nodiscard]] bool refuses(const place &at, bool holds, const char *condition);
-/** A text that must be there: "((void *)0) != name". */
-[[nodiscard]] bool refuses_null_text(const place &at, const char *name, const char *text);
-/** A text that must be there and must not be empty: "'\0' != *name". */
-[[nodiscard]] bool refuses_text(const place &at, const char *name, const char *text);
-/** A record or output that must be there: "NULL != name". */
-[[nodiscard]] bool refuses_null(const place &at, const char *name, const void *pointer);
-/** The name of an interface that goes into a path: a text that names one component and nothing else. */
-[[nodiscard]] bool refuses_ifname(const place &at, const char *name, const char *text);
+/** Logs "Invaild Argument" with the condition that had to hold and sets NET_ERR_BAD_PARAMETER. */
+void report_refused(const place &at, const char *condition);
+/** The same with a condition about an argument's name. */
+[[gnu::format(printf, 2, 0)]] void report_refused(const place &at, const char *condition, const char *name);
+
+/** Argument checks: report and answer true when the argument is to be refused. */
+[[nodiscard]] inline bool refuses(const place &at, bool holds, const char *condition) {
+    if (!holds) {
+        report_refused(at, condition);
+    }
+    return !holds;
+}
+
+/** A text that must be there. */
+[[nodiscard]] inline bool refuses_null_text(const place &at, const char *name, const char *text) {
+    if (text == nullptr) {
+        report_refused(at, "((void *)0) != %s", name);
+    }
+    return text == nullptr;
+}
+
+/** A record or output that must be there. */
+[[nodiscard]] inline bool refuses_null(const place &at, const char *name, const void *pointer) {
+    if (pointer == nullptr) {
+        report_refused(at, "NULL != %s", name);
+    }
+    return pointer == nullptr;
+}
+
+/** A text that must be there and must not be empty. */
+[[nodiscard]] inline bool refuses_text(const place &at, const char *name, const char *text) {
+    if (refuses_null_text(at, name, text)) {
+        return true;
+    }
+    if (*text == '\0') {
+        report_refused(at, "'\\0' != *%s", name);
+    }
+    return *text == '\0';
+}
 
 /** Whether a text can be one component of a path: no "/", blank or control character, neither "." nor "..". */
 bool is_interface_name(const char *text);
+
+/** The name of an interface that goes into a path: a text that names one component and nothing else. */
+[[nodiscard]] inline bool refuses_ifname(const place &at, const char *name, const char *text) {
+    if (refuses_text(at, name, text)) {
+        return true;
+    }
+    const bool usable = is_interface_name(text);
+    if (!usable) {
+        report_refused(at, "is_interface_name(%s)", name);
+    }
+    return !usable;
+}
 
 } // namespace kova

@@ -76,7 +76,7 @@ extern "C" int KOVALnxV6IPGet(const char *szIfname, KOVAV6IP *rgV6IP, int cMax) 
         return fail(HERE, NET_ERR_FILE_OPEN, -1, "Fail to open [%s], errno=[%d/%m]", kList, errno);
     }
     int count = 0;
-    line_text line;
+    line_text line = "";
     line_text device;
     KOVAV6IP address;
     while (read_line(file.get(), line)) {

@@ -21,8 +21,10 @@ def test_clang_format():
     run("clang-format", "--dry-run", "-Werror", *CXX)
 
 
-def test_clang_tidy():
-    run("run-clang-tidy", "-quiet", "-p", BUILD, "-j", "2", *(f"^{re.escape(str(path))}$" for path in LIBRARY_UNITS))
+def test_clang_tidy(tmp_path):
+    commands = (BUILD / "compile_commands.json").read_text()
+    (tmp_path / "compile_commands.json").write_text(commands.replace("-fno-gnu-unique ", ""))  # unknown to clang
+    run("run-clang-tidy", "-quiet", "-p", tmp_path, "-j", "2", *(f"^{re.escape(str(path))}$" for path in LIBRARY_UNITS))
 
 
 def test_cppcheck():
@@ -82,6 +84,6 @@ def test_unit_has_no_goto_and_no_unfinished_mark(path):
 
 
 def test_every_unit_has_its_test():
-    units = {path.stem for path in (ROOT / "src").glob("*/*.cpp") if path.parent.name != "core"}
+    units = {path.stem for path in (ROOT / "src").glob("*/*.cpp") if 'extern "C"' in path.read_text()}
     tests = {path.name.removesuffix("_test.cpp") for path in (ROOT / "tests" / "unit").glob("*_test.cpp")}
     assert units - tests == set()

@@ -6,6 +6,7 @@
 #include <string_view>
 
 #include "common/report.h"
+#include "common/views.h"
 #include "kovacore/file_rewrite.h"
 #include "kovacore/line_source.h"
 #include "kovacore/sz_hash.h"
@@ -21,7 +22,7 @@ constexpr const char *kPlainFormat = "%s=%s\n";
 
 /** Takes the text off the front when it is there. */
 bool take_prefix(string_view &line, string_view prefix) {
-    if (!line.starts_with(prefix))
+    if (!begins_with(line, prefix))
         return false;
     line.remove_prefix(prefix.size());
     return true;

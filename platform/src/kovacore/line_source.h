@@ -20,6 +20,7 @@ public:
     /** Longest line looked at; the rest of a longer one is passed over. */
     static constexpr size_t kLineMax = 65536;
 
+    // cppcheck-suppress uninitMemberVar ; the buffer is filled before it is read
     explicit line_source(const char *path) : fd_(open_regular(path)), failed_(!fd_) {}
 
     /** Gives the next line without its newline; it stays valid until the next call. @return false at the end */

@@ -9,6 +9,7 @@
 
 #include "common/platform_conf.h"
 #include "common/report.h"
+#include "common/views.h"
 #include "kovacore/line_source.h"
 
 using namespace kova;
@@ -62,7 +63,7 @@ bool is_built_in(const char *module) {
     string_view line;
     while (files.next(line)) {
         line.remove_prefix(line.rfind('/') + 1);
-        if (line.ends_with(".ko"))
+        if (ends_in(line, ".ko"))
             line.remove_suffix(3);
         if (same_module(line, module))
             return true;

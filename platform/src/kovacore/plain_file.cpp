@@ -10,6 +10,7 @@
 
 #include "common/list_ptr.h"
 #include "common/report.h"
+#include "common/views.h"
 #include "kovacore/file_rewrite.h"
 #include "kovacore/line_source.h"
 
@@ -37,7 +38,7 @@ bool is_regular(DIR *directory, const dirent &entry) {
 int collect_names(DIR *directory, string_view prefix, bool regular_only, KLIBSZLIST *names) {
     errno = 0;
     while (const dirent *entry = readdir(directory)) {
-        const bool wanted = entry->d_name[0] != '.' && string_view{entry->d_name}.starts_with(prefix) &&
+        const bool wanted = entry->d_name[0] != '.' && begins_with(entry->d_name, prefix) &&
                             (!regular_only || is_regular(directory, *entry));
         if (wanted && KLIBCSzListPush(&names, entry->d_name) < 0)
             return -1;
@@ -57,7 +58,7 @@ string_view without_newline(string_view line) {
 }
 
 bool matches(string_view line, string_view prefix, bool whole_field) {
-    if (!line.starts_with(prefix))
+    if (!begins_with(line, prefix))
         return false;
     line.remove_prefix(prefix.size());
     return !whole_field || line.empty() || line.starts_with(',') || line == "\r";
@@ -201,7 +202,7 @@ int KLIBCFileReplaceSubStr(const char *szPath, const char *szOld, const char *sz
 }
 
 FILE *KLIBCFileTempFileOpen(char *szTemplate) {
-    if (is_empty(szTemplate) || !string_view{szTemplate}.ends_with("XXXXXX"))
+    if (is_empty(szTemplate) || !ends_in(szTemplate, "XXXXXX"))
         return fail(HERE, kErrArgument), nullptr;
 
     unique_fd fd{mkostemp(szTemplate, O_CLOEXEC)};

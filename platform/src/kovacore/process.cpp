@@ -11,6 +11,7 @@
 #include <string_view>
 
 #include "common/report.h"
+#include "common/views.h"
 #include "kovacore/line_source.h"
 
 using namespace kova;
@@ -59,8 +60,8 @@ bool is_alive(pid_t pid) {
 
 bool is_interpreter(string_view name) {
     constexpr string_view kNames[] = {"sh", "ash", "bash", "dash", "ksh", "zsh", "busybox"};
-    return std::find(std::begin(kNames), std::end(kNames), name) != std::end(kNames) || name.starts_with("python") ||
-           name.starts_with("perl");
+    return std::find(std::begin(kNames), std::end(kNames), name) != std::end(kNames) || begins_with(name, "python") ||
+           begins_with(name, "perl");
 }
 
 /** The arguments of a process, each ended by a NUL. */
@@ -119,7 +120,7 @@ public:
     [[nodiscard]] string_view get() const {
         constexpr string_view kDeleted = " (deleted)";
         string_view name = base_name(path_);
-        if (name.ends_with(kDeleted))
+        if (ends_in(name, kDeleted))
             name.remove_suffix(kDeleted.size());
         return name;
     }
