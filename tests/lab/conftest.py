@@ -1,5 +1,5 @@
-"""What the lab tests share. They run as root inside the box: on a private root with the appliance's files in place, wired
-to the network namespace "net", in which the servers and the other hosts live."""
+"""What the lab tests share. They run as root inside the box: on a private root with the appliance's files in place,
+wired to the network namespace "net", in which the servers and the other hosts live."""
 
 import os
 import pathlib

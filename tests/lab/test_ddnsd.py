@@ -148,7 +148,7 @@ def test_parallel_questions_leave_one_whole_result(server):
     assert RESULT.read_text() == 'externalIP="203.0.113.7"\n'
 
 
-# ---- the daemon and its service ---------------------------------------------------------------------------------------
+# ---- the daemon and its service ------------------------------------------------------------------------------------
 
 
 def is_running():

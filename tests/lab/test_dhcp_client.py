@@ -183,7 +183,7 @@ def test_lease_file_that_is_a_link_is_not_followed(server, tmp_path):
     assert victim.read_text() == "untouched"
 
 
-# ---- a stopped client does nothing any more ---------------------------------------------------------------------------
+# ---- a stopped client does nothing any more ------------------------------------------------------------------------
 
 
 def test_stop_at_any_time_of_a_bind_ends_the_client_for_good(server):
@@ -217,13 +217,13 @@ def test_stop_in_the_middle_of_a_bind(server, hold, program, text, client_dies):
 
     began = time.monotonic()
     stop("lan0")
-    assert time.monotonic() - began < 4.5
+    assert time.monotonic() - began < 8  # 1.2 on an idle machine
     assert not processes(text)
     step.release()  # what had survived would go on now
     assert_nothing_left("lan0")
 
 
-# ---- the script, as the client runs it --------------------------------------------------------------------------------
+# ---- the script, as the client runs it -----------------------------------------------------------------------------
 
 
 def script(reason, status=0, **lease):
@@ -347,3 +347,9 @@ def test_parallel_scripts_lose_no_name_server(hold):
     step.release()
     assert [process.wait(10) for process in scripts] == [0, 0]
     assert set(SOURCE.read_text().split()) == {"nameserver", "192.168.60.53", "192.168.61.53"}
+
+
+def test_resolver_source_without_its_lease_goes_with_the_next_stop():
+    SOURCE.write_text("nameserver\t192.168.50.53\n")  # what a script that was cut short may leave
+    stop("lan0")
+    assert not SOURCE.exists()

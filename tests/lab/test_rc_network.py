@@ -60,7 +60,8 @@ def test_keys_are_read_as_the_platform_reads_them(tmp_path):
     configure(
         "eth0",
         f'  BOOTPROTO="dhcp"\n#IPADDR=10.0.0.1\nXIPADDR=10.0.0.2\nBOOTPROTO="static"\r\nIPADDR="192.168.77.6"\n'
-        f"IPADDR=10.0.0.3\nNETMASK=255.255.255.0\r\nHOSTNAME=$(touch {mark})`touch {mark}`\ntouch {mark}\nBOOTPROTO=none",
+        f"IPADDR=10.0.0.3\nNETMASK=255.255.255.0\r\nHOSTNAME=$(touch {mark})`touch {mark}`\ntouch {mark}\n"
+        f"BOOTPROTO=none",
     )
     network("start", "eth0")
     assert addresses("eth0") == ["192.168.77.6/24"]
@@ -211,7 +212,9 @@ def test_copies_are_no_interfaces(copy, keep):
     assert addresses("eth0") == ["192.168.77.5/24"]
 
 
-@pytest.mark.parametrize("name", ["", ".", "..", "../ifcfg-eth0", "a b", "-eth0", "eth0\n", "sixteencharacter", "nosuch0"])
+@pytest.mark.parametrize(
+    "name", ["", ".", "..", "../ifcfg-eth0", "a b", "-eth0", "eth0\n", "sixteencharacter", "nosuch0"]
+)
 def test_what_is_no_interface_is_refused_and_the_others_go_on(name, system_log):
     configure("eth0", STATIC.format("192.168.77.5"))
     assert network("start", name, "eth0", status=1).stderr.startswith("rc.network: ")

@@ -58,8 +58,8 @@ read_stat() {
     process_start=$1
 }
 
-# read_record: sets $leader, the leader of the instance's session, and $leader_start, which tells it from another process
-# that was given the same number later
+# read_record: sets $leader, the leader of the instance's session, and $leader_start, which tells it from another
+# process that was given the same number later
 read_record() {
     { read -r leader leader_start <"$record"; } 2>/dev/null
 }
@@ -95,5 +95,5 @@ gone_after() {
 # end_processes: asks the leader, which may tidy up, then ends whatever is left of its session
 end_processes() {
     is_running && kill -TERM "$leader" 2>/dev/null
-    gone_after 0 15 || gone_after KILL 10 || fail "$job: a process of ${record##*/} does not end"
+    gone_after 0 10 || gone_after KILL 10 || fail "$job: a process of ${record##*/} does not end"
 }
