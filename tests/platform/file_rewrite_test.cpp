@@ -247,6 +247,26 @@ TEST_F(file_rewrite, KLIBCFileSetKeyValue_64writersKilledAtRandom_loseNothing) {
     munmap(shared, sizeof(progress));
 }
 
+TEST_F(file_rewrite, KLIBCFileSetKeyValue_fileComesAndGoes_neverFails) {
+    const std::string file = path("file");
+    const pid_t other = start_child([&] {
+        for (int i = 0;; i++) {
+            close(open(file.c_str(), O_WRONLY | O_CREAT | O_CLOEXEC, 0644));
+            // the two fall into every step of each other
+            for (volatile int spin = i % 4096; spin > 0;)
+                spin = spin - 1;
+            unlink(file.c_str());
+        }
+        return 0;
+    });
+    int failures = 0;
+    for (int i = 0; i < 20000; i++)
+        failures += KLIBCFileSetKeyValue(file.c_str(), "A", std::to_string(i).c_str(), kPlain) != 0 ? 1 : 0;
+    EXPECT_EQ(failures, 0);
+    kill(other, SIGKILL);
+    EXPECT_EQ(wait_for(other), 128 + SIGKILL);
+}
+
 TEST_F(file_rewrite, KLIBCFileAddLine_manyWriters_loseNothing) {
     std::array<pid_t, 8> writers{};
     for (size_t i = 0; i < writers.size(); i++)

@@ -116,7 +116,7 @@ bool kova::resolve_path(const char *path, char (&resolved)[PATH_MAX]) {
     char target[PATH_MAX];
     const ssize_t length = readlink(resolved, target, sizeof target - 1);
     if (length < 0)
-        return errno == ENOENT;
+        return errno == ENOENT || errno == EINVAL; // no link: somebody may have made the file meanwhile
     target[length] = '\0';
     char joined[PATH_MAX];
     const char *slash = strrchr(resolved, '/');
