@@ -79,6 +79,23 @@ TEST_F(exec, KLIBCExec_cannotBeExecuted_gives127) {
     EXPECT_FAILS(KLIBCExec(path("no-header").c_str(), nullptr, nullptr, nullptr, nullptr), 127, 0x2A00);
 }
 
+TEST_F(exec, KLIBCExec_cannotBeExecuted_leavesTheReasonInErrno) {
+    const kept_file keep{"/etc/kova/platform.conf"};
+    write_file(path("plain"), "#!/bin/sh\nexit 0\n", 0644);
+    for (const char *const trace : {"no", "yes"}) {
+        // traced to a log that nobody reads, too
+        write_file("/etc/kova/platform.conf", std::string{"trace_commands="} + trace + "\n");
+        const char *const argv[] = {"plain", nullptr};
+        errno = 0;
+        EXPECT_EQ(KLIBCExec(path("plain").c_str(), nullptr, nullptr, nullptr, nullptr), 127);
+        EXPECT_EQ(errno, EACCES);
+        errno = 0;
+        EXPECT_EQ(KLIBCExecv(path("plain").c_str(), argv, 0), 127);
+        EXPECT_EQ(errno, EACCES);
+    }
+    closelog();
+}
+
 TEST_F(exec, KLIBCExec_noProcess_givesMinus1) {
     const int status = in_child([] {
         const rlimit none = {0, 0};

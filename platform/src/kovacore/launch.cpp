@@ -67,9 +67,11 @@ private:
     posix_spawnattr_t attributes_;
 };
 
+/** Leaves the reason in errno, as the other calls do. */
 int failure_of(int error) {
     if (error == 0)
         return 0;
+    errno = error;
     return error == EAGAIN || error == ENOMEM ? kNoProcess : kNotExecutable;
 }
 
@@ -217,6 +219,7 @@ heap_ptr<char> kova::trace_command(const char *const *argv) {
 }
 
 void kova::trace_result(const char *command, int status) {
+    const errno_keeper keep;
     if (command != nullptr)
         syslog(LOG_DEBUG, "run: %s -> %d", command, status);
 }
