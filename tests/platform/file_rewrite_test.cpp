@@ -127,7 +127,9 @@ TEST_F(file_rewrite, KLIBCFileSetKeyValue_lockDirectoryOfAStranger_isNotUsed) {
     const int status = in_child([&] {
         // in a private name space, so that no other test sees it
         if (unshare(CLONE_NEWNS) != 0 || mount("lock", "/run/lock", "tmpfs", 0, nullptr) != 0 ||
-            mkdir("/run/lock/kova", 0755) != 0 || chown("/run/lock/kova", 1000, 1000) != 0)
+            mkdir("/run/lock/kova", 0755) != 0)
+            return 2;
+        if (chown("/run/lock/kova", 1000, 1000) != 0)
             return 77;
         const int result = KLIBCFileSetKeyValue(path("file").c_str(), "A", "2", kPlain);
         return result == -1 && KLIBCErrGet() == 0x400 ? 0 : 1;
