@@ -6,6 +6,7 @@
 #include <cstring>
 
 #include <fcntl.h>
+#include <sys/prctl.h>
 #include <sys/resource.h>
 #include <sys/socket.h>
 #include <sys/time.h>
@@ -76,6 +77,23 @@ TEST_F(exec, KLIBCExec_cannotBeExecuted_gives127) {
     EXPECT_FAILS(KLIBCExec(path("no-interpreter").c_str(), nullptr, nullptr, nullptr, nullptr), 127, 0x2A00);
     write_file(path("no-header"), "exit 0\n", 0755);
     EXPECT_FAILS(KLIBCExec(path("no-header").c_str(), nullptr, nullptr, nullptr, nullptr), 127, 0x2A00);
+}
+
+TEST_F(exec, KLIBCExec_cannotBeExecuted_leavesTheReasonInErrno) {
+    const kept_file keep{"/etc/kova/platform.conf"};
+    write_file(path("plain"), "#!/bin/sh\nexit 0\n", 0644);
+    for (const char *const trace : {"no", "yes"}) {
+        // traced to a log that nobody reads, too
+        write_file("/etc/kova/platform.conf", std::string{"trace_commands="} + trace + "\n");
+        const char *const argv[] = {"plain", nullptr};
+        errno = 0;
+        EXPECT_EQ(KLIBCExec(path("plain").c_str(), nullptr, nullptr, nullptr, nullptr), 127);
+        EXPECT_EQ(errno, EACCES);
+        errno = 0;
+        EXPECT_EQ(KLIBCExecv(path("plain").c_str(), argv, 0), 127);
+        EXPECT_EQ(errno, EACCES);
+    }
+    closelog();
 }
 
 TEST_F(exec, KLIBCExec_noProcess_givesMinus1) {
@@ -242,6 +260,41 @@ TEST_F(exec, KLIBCExec_ownChildren_areNotWaitedFor) {
     const pid_t child = start_child([] { return 42; });
     EXPECT_WORKS(run("exit 1"), 1);
     EXPECT_EQ(wait_for(child), 42);
+}
+
+namespace {
+
+pid_t g_caller;
+volatile int g_strayed;
+
+/** Sends a signal to a group of processes again and again; ends with the group's leader. */
+int hammer(pid_t group, int signal) {
+    prctl(PR_SET_PDEATHSIG, SIGKILL);
+    while (kill(-group, signal) == 0)
+        usleep(20);
+    return 0;
+}
+
+} // namespace
+
+TEST_F(exec, KLIBCExecv_withoutWaiting_callersHandlersRunInTheCallerOnly) {
+    const int status = in_child([] {
+        g_caller = getpid();
+        const signal_setting handler{SIGUSR1, [](int) { g_strayed = g_strayed + (getpid() != g_caller ? 1 : 0); }};
+        setpgid(0, 0);
+        const pid_t sender = start_child([] {
+            setpgid(0, 0);
+            return hammer(getppid(), SIGUSR1);
+        });
+        const char *const argv[] = {"/bin/true", nullptr};
+        int failures = 0;
+        for (int i = 0; i < 200; i++)
+            failures += KLIBCExecv("/bin/true", argv, 0) != 0 ? 1 : 0;
+        kill(sender, SIGKILL);
+        wait_for(sender);
+        return failures != 0 ? 1 : g_strayed != 0 ? 2 : 0;
+    });
+    EXPECT_EQ(status, 0);
 }
 
 namespace {

@@ -127,7 +127,9 @@ TEST_F(file_rewrite, KLIBCFileSetKeyValue_lockDirectoryOfAStranger_isNotUsed) {
     const int status = in_child([&] {
         // in a private name space, so that no other test sees it
         if (unshare(CLONE_NEWNS) != 0 || mount("lock", "/run/lock", "tmpfs", 0, nullptr) != 0 ||
-            mkdir("/run/lock/kova", 0755) != 0 || chown("/run/lock/kova", 1000, 1000) != 0)
+            mkdir("/run/lock/kova", 0755) != 0)
+            return 2;
+        if (chown("/run/lock/kova", 1000, 1000) != 0)
             return 77;
         const int result = KLIBCFileSetKeyValue(path("file").c_str(), "A", "2", kPlain);
         return result == -1 && KLIBCErrGet() == 0x400 ? 0 : 1;
@@ -245,6 +247,26 @@ TEST_F(file_rewrite, KLIBCFileSetKeyValue_64writersKilledAtRandom_loseNothing) {
     EXPECT_EQ(KLIBCFileSetKeyValue(file.c_str(), "key0", "0", kPlain), 0);
     EXPECT_EQ(names_in(directory()), std::vector<std::string>{"file"});
     munmap(shared, sizeof(progress));
+}
+
+TEST_F(file_rewrite, KLIBCFileSetKeyValue_fileComesAndGoes_neverFails) {
+    const std::string file = path("file");
+    const pid_t other = start_child([&] {
+        for (int i = 0;; i++) {
+            close(open(file.c_str(), O_WRONLY | O_CREAT | O_CLOEXEC, 0644));
+            // the two fall into every step of each other
+            for (volatile int spin = i % 4096; spin > 0;)
+                spin = spin - 1;
+            unlink(file.c_str());
+        }
+        return 0;
+    });
+    int failures = 0;
+    for (int i = 0; i < 20000; i++)
+        failures += KLIBCFileSetKeyValue(file.c_str(), "A", std::to_string(i).c_str(), kPlain) != 0 ? 1 : 0;
+    EXPECT_EQ(failures, 0);
+    kill(other, SIGKILL);
+    EXPECT_EQ(wait_for(other), 128 + SIGKILL);
 }
 
 TEST_F(file_rewrite, KLIBCFileAddLine_manyWriters_loseNothing) {

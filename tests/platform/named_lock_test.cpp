@@ -346,6 +346,27 @@ TEST_F(named_lock, KLIBCFileLock_unprivilegedReaderBeforeAnyFile_canShare) {
     EXPECT_EQ(status, 0);
 }
 
+TEST_F(named_lock, KLIBCFileLock_unprivilegedReaderFirst_leavesNothingInTheWay) {
+    const int status = in_child([] {
+        // open to everybody, as systems have it
+        if (unshare(CLONE_NEWNS) != 0 || mount("lock", "/run/lock", "tmpfs", 0, "mode=1777") != 0)
+            return 1;
+        const int reader = in_child([] {
+            if (setresgid(65534, 65534, 65534) != 0 || setresuid(65534, 65534, 65534) != 0)
+                return 77;
+            if (KLIBCFileLock(kExclusive, 0) != -1 || KLIBCErrGet() != 0x400)
+                return 2;
+            return KLIBCFileLock(kShared, 0) == 0 ? KLIBCFileUnlock(kName) : 3;
+        });
+        if (reader != 0)
+            return reader;
+        return KLIBCFileLock(kExclusive, 0) == 0 ? KLIBCFileUnlock(kName) : 4;
+    });
+    if (status == 77)
+        GTEST_SKIP() << "no other user in this user namespace";
+    EXPECT_EQ(status, 0);
+}
+
 TEST_F(named_lock, KLIBCFileLock_linkInTheLocksPlace_isNotFollowed) {
     ASSERT_EQ(KLIBCFileLock(0x778805, 0), 0); // makes the directory
     ASSERT_EQ(KLIBCFileUnlock(0x778800), 0);

@@ -1,8 +1,10 @@
 #include "platform_test.h"
 
+#include <csignal>
 #include <cstring>
 
 #include <fcntl.h>
+#include <sched.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
@@ -67,6 +69,32 @@ TEST_F(plain_file, KLIBCFileTouch_presentFile_staysAsItIs) {
     struct stat status;
     ASSERT_EQ(stat(path("file").c_str(), &status), 0);
     EXPECT_EQ(status.st_mode, S_IFREG | 0600U);
+}
+
+TEST_F(plain_file, KLIBCFileTouch_secretMadeMeanwhile_keepsItsMode) {
+    const std::string file = path("secret");
+    const pid_t toucher = start_child([&] {
+        while (KLIBCFileTouch(file.c_str()) == 0)
+            ;
+        return 1;
+    });
+    int made = 0;
+    int opened_up = 0;
+    for (int i = 0; i < 20000; i++) {
+        const int fd = open(file.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, 0600);
+        if (fd >= 0) {
+            sched_yield();
+            struct stat status;
+            made++;
+            opened_up += fstat(fd, &status) == 0 && status.st_mode == (S_IFREG | 0600U) ? 0 : 1;
+            close(fd);
+        }
+        unlink(file.c_str());
+    }
+    kill(toucher, SIGKILL);
+    EXPECT_EQ(wait_for(toucher), 128 + SIGKILL);
+    EXPECT_GT(made, 100);
+    EXPECT_EQ(opened_up, 0);
 }
 
 TEST_F(plain_file, KLIBCFileTouch_noPlaceForAFile_fails) {

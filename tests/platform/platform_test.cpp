@@ -105,13 +105,15 @@ platform_test::~platform_test() {
 }
 
 kept_file::kept_file(std::string path) : path_(std::move(path)), existed_(fs::exists(path_)) {
-    if (existed_)
-        text_ = read_file(path_);
+    if (!existed_)
+        return;
+    mode_ = static_cast<unsigned>(fs::status(path_).permissions());
+    text_ = read_file(path_);
 }
 
 kept_file::~kept_file() {
     if (existed_)
-        write_file(path_, text_);
+        write_file(path_, text_, mode_);
     else
         fs::remove(path_);
 }

@@ -61,6 +61,7 @@ public:
 private:
     std::string path_;
     bool existed_;
+    unsigned mode_ = 0644;
     std::string text_;
 };
 

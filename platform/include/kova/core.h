@@ -173,9 +173,9 @@ int KLIBCFileITmpName(const char *szTarget, char *szTmp, int cbTmp);
 /**
  * Takes a named lock. Counted per process and name: asked again while held it succeeds at once and keeps the stronger
  * mode; a shared lock asked for as exclusive upgrades, waiting for other holders. The lock of a dead process is free; a
- * forked child neither holds nor releases its parent's. Files: /run/lock/kova/<name in hexadecimal>, readable by all,
- * so that everybody can take a shared lock; an unprivileged process is given one without a file while there is none
- * yet, as nobody has asked for that lock since the start of the system.
+ * forked child neither holds nor releases its parent's. Files: /run/lock/kova/<name in hexadecimal>, made by root and
+ * readable by all, so that everybody can take a shared lock; an unprivileged process is given one without a file while
+ * there is none yet, as nobody has asked for that lock since the start of the system.
  * @param lock  upper bits the name, lowest byte the mode: 5 shared, 6 exclusive (0x105, 0x106, 0x805 ...)
  * @param wait  longest wait in seconds
  * @return 0; -1 with 0xD00 (mode), or 0x400 (not free in time, or the lock file cannot be opened)
@@ -206,8 +206,9 @@ int KLIBCFileUnlockByFile(int fd);
  * /etc/kova/platform.conf every program is logged at LOG_DEBUG as "run: /sbin/ip link ... -> 0".
  * @param szProgram  absolute path
  * @param szArg1..4  arguments, the first NULL ends them
- * @return exit status; 127 with 0x2A00 when it cannot be executed; 128 + signal when killed; -1 with 0xD00, 0x200 or
- *         0x2A00 when no process could be made or another part of the caller's process took its status
+ * @return exit status; 127 with 0x2A00 and errno when it cannot be executed; 128 + signal when killed; -1 with 0xD00,
+ *         0x200 or 0x2A00 (errno says why) when no process could be made or another part of the caller's process took
+ *         its status
  */
 int KLIBCExec(const char *szProgram, const char *szArg1, const char *szArg2, const char *szArg3, const char *szArg4);
 /** The same with flags 0xBB (the only value, else 0xD00) and a NULL-terminated list of arguments (const char *). */

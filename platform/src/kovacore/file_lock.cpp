@@ -16,11 +16,14 @@ namespace {
 
 constexpr const char *kLockDirectory = "/run/lock/kova";
 
-/** Opens the directory. /run/lock may be open to everybody: one that a stranger made in advance is not used. */
+/**
+ * Opens the directory. /run/lock may be open to everybody: one that a stranger made in advance is not used, and only
+ * the system's own user makes it, or a reader's would be in its way.
+ */
 unique_fd open_lock_directory() {
     constexpr int kFlags = O_PATH | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC;
     unique_fd directory{open(kLockDirectory, kFlags)};
-    if (!directory && errno == ENOENT) {
+    if (!directory && errno == ENOENT && geteuid() == 0) {
         mkdir("/run/lock", 0755);
         // the mode once more: the caller's mask must not keep readers out
         if (mkdir(kLockDirectory, 0755) == 0)
@@ -113,7 +116,7 @@ bool kova::resolve_path(const char *path, char (&resolved)[PATH_MAX]) {
     char target[PATH_MAX];
     const ssize_t length = readlink(resolved, target, sizeof target - 1);
     if (length < 0)
-        return errno == ENOENT;
+        return errno == ENOENT || errno == EINVAL; // no link: somebody may have made the file meanwhile
     target[length] = '\0';
     char joined[PATH_MAX];
     const char *slash = strrchr(resolved, '/');

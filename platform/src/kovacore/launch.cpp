@@ -67,9 +67,11 @@ private:
     posix_spawnattr_t attributes_;
 };
 
+/** Leaves the reason in errno, as the other calls do. */
 int failure_of(int error) {
     if (error == 0)
         return 0;
+    errno = error;
     return error == EAGAIN || error == ENOMEM ? kNoProcess : kNotExecutable;
 }
 
@@ -133,7 +135,7 @@ bool reap_within(pid_t pid, int limit_ms, int &status) {
 struct orphan {
     const spawn_setup &setup;
     const launch &what;
-    volatile int error;
+    volatile int error; // what it stays when the process that starts it is killed first
 };
 
 /** Runs as a process of its own, on the memory of the caller, which stands still meanwhile. */
@@ -164,8 +166,14 @@ int kova::start_detached(const launch &what) {
     if (!setup.prepare(what))
         return kNoProcess;
     alignas(16) char stack[size_t{64} * 1024];
-    orphan started = {setup, what, 0};
+    orphan started = {setup, what, EAGAIN};
+    // on the caller's memory, a handler of the caller would run there a second time
+    sigset_t all;
+    sigset_t callers;
+    sigfillset(&all);
+    pthread_sigmask(SIG_SETMASK, &all, &callers);
     const pid_t parent = clone(start_orphan, stack + sizeof stack, CLONE_VM | CLONE_VFORK | SIGCHLD, &started);
+    pthread_sigmask(SIG_SETMASK, &callers, nullptr);
     if (parent < 0)
         return kNoProcess;
     int status;
@@ -211,6 +219,7 @@ heap_ptr<char> kova::trace_command(const char *const *argv) {
 }
 
 void kova::trace_result(const char *command, int status) {
+    const errno_keeper keep;
     if (command != nullptr)
         syslog(LOG_DEBUG, "run: %s -> %d", command, status);
 }

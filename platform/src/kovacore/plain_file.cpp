@@ -103,7 +103,13 @@ int KLIBCFileTouch(const char *szPath) {
     struct stat status;
     if (stat(szPath, &status) == 0)
         return S_ISDIR(status.st_mode) ? fail(HERE, kErrFileOpen) : 0;
-    const unique_fd fd{open(szPath, O_WRONLY | O_CREAT | O_CLOEXEC | O_NONBLOCK | O_NOCTTY, 0644)};
+    char path[PATH_MAX];
+    if (!resolve_path(szPath, path))
+        return fail(HERE, kErrFileOpen);
+    const unique_fd fd{open(path, O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, 0644)};
+    // one that somebody has made meanwhile keeps its mode
+    if (!fd && errno == EEXIST)
+        return 0;
     return fd && fchmod(fd.get(), 0644) == 0 ? 0 : fail(HERE, kErrFileOpen);
 }
 
