@@ -41,7 +41,7 @@ int ask_ipcalc(const place &at, const char *option, const char *key, const char 
 
 } // namespace
 
-int KOVANetCalNetwork(const char *szSubnet, char *szNetwork, int cbNetwork) {
+extern "C" int KOVANetCalNetwork(const char *szSubnet, char *szNetwork, int cbNetwork) {
     if (refuses_text(HERE, "szSubnet", szSubnet) || refuses_null(HERE, "szNetwork", szNetwork) ||
         refuses(HERE, cbNetwork > 0, "0 < cbNetwork")) {
         return -1;
@@ -49,7 +49,7 @@ int KOVANetCalNetwork(const char *szSubnet, char *szNetwork, int cbNetwork) {
     return ask_ipcalc(HERE, "-n", "NETWORK=", szSubnet, szNetwork, cbNetwork);
 }
 
-int KOVANetCalBroadcast(const char *szSubnet, char *szBroadcast, int cbBroadcast) {
+extern "C" int KOVANetCalBroadcast(const char *szSubnet, char *szBroadcast, int cbBroadcast) {
     if (refuses_text(HERE, "szSubnet", szSubnet) || refuses_null(HERE, "szBroadcast", szBroadcast) ||
         refuses(HERE, cbBroadcast > 0, "0 < cbBroadcast")) {
         return -1;
