@@ -90,7 +90,7 @@ int ErrKLIBIpMaskToSubnet(char *szIpMask, char *szSubnet);
  * @param szSubnet   what the tool is given, "192.168.1.77/24"; not empty
  * @param szNetwork  receives the address in dotted text; left as it was when the tool's first line holds none
  * @param cbNetwork  size of szNetwork, above 0; as much of the tool's line ("NETWORK=" included) is read, so that fewer
- *                   than 25 bytes can cut an address
+ *                   than 24 bytes can cut an address
  * @return 0, also when the tool gave no address; -1 with NET_ERR_BAD_PARAMETER, or when the tool cannot be started,
  * with the platform's code and a log line
  */
@@ -100,7 +100,7 @@ int KOVANetCalNetwork(const char *szSubnet, char *szNetwork, int cbNetwork);
  * Asks "/bin/ipcalc -b" for the broadcast address of a subnet.
  * @param szSubnet     as KOVANetCalNetwork
  * @param szBroadcast  receives the address, as KOVANetCalNetwork
- * @param cbBroadcast  as KOVANetCalNetwork; the line begins with "BROADCAST=", so that fewer than 27 bytes can cut an
+ * @param cbBroadcast  as KOVANetCalNetwork; the line begins with "BROADCAST=", so that fewer than 26 bytes can cut an
  *                     address
  * @return as KOVANetCalNetwork
  */
@@ -151,8 +151,8 @@ int BlKLIBIsv6IpAddrValid(const char *szV6IPAddr);
 /* ---- names ----------------------------------------------------------------------------------------------------- */
 
 /**
- * Whether a text is a name label: not empty, without blanks, control characters below 33 and any of "(),.:;<>[\]@ and
- * the double quote.
+ * Whether a text is a name label: not empty, without blanks, without characters below 33, without the double quote and
+ * without any of (),.:;<>[\]@
  * @return 1 or 0
  */
 int BlKLIBIsAtom(const char *szAtom);

@@ -2,12 +2,14 @@
  * @file
  * Change events: what the library announces to the rest of the appliance.
  *
- * Every call opens one event of component "net" (kova/plugin.h), sets its arguments in the order given here, runs the
+ * Every hook opens one event of component "net" (kova/plugin.h), sets its arguments in the order given here, runs the
  * plug-ins registered for it and gives the event back, whatever happened. Phase 4 (KLIB_PLUGIN_PRE) is before a change,
  * 5 (KLIB_PLUGIN_POST) after it; a phase from the caller is passed through. All return 0, or -1:
  *  - with NET_ERR_BAD_PARAMETER, logged, for an argument that is NULL or out of range, nothing announced;
  *  - else with the code that the platform left; the first step that fails ends the call. It is logged unless a call
- * says otherwise. No call takes a lock. Texts may be empty and are passed through unchanged.
+ *    says otherwise.
+ *
+ * No call takes a lock. Texts may be empty and are passed through unchanged.
  */
 #ifndef KOVANETSDK_EVENTS_H
 #define KOVANETSDK_EVENTS_H

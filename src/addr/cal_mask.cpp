@@ -6,7 +6,7 @@
 
 using namespace kova;
 
-int cKLIBICalMask(const uint32_t rgPart[4]) {
+extern "C" int cKLIBICalMask(const uint32_t rgPart[4]) {
     if (refuses_null(HERE, "rgPart", rgPart)) {
         return 0;
     }

@@ -24,14 +24,14 @@ bool is_atom(const char *begin, const char *end) {
 
 } // namespace
 
-int BlKLIBIsAtom(const char *szAtom) {
+extern "C" int BlKLIBIsAtom(const char *szAtom) {
     if (refuses_null_text(HERE, "szAtom", szAtom)) {
         return 0;
     }
     return is_atom(szAtom, szAtom + strlen(szAtom)) ? 1 : 0;
 }
 
-int BlKLIBIsDomain(const char *szDomain) {
+extern "C" int BlKLIBIsDomain(const char *szDomain) {
     if (refuses_null_text(HERE, "szDomain", szDomain)) {
         return 0;
     }

@@ -18,7 +18,7 @@ bool continues_name(char c) {
 
 } // namespace
 
-int BlKLIBIsHostname(const char *szHostname) {
+extern "C" int BlKLIBIsHostname(const char *szHostname) {
     if (refuses_null_text(HERE, "szHostname", szHostname)) {
         return 0;
     }

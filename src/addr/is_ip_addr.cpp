@@ -4,7 +4,7 @@
 
 using namespace kova;
 
-int BlKLIBIsIpAddr(const char *szIP) {
+extern "C" int BlKLIBIsIpAddr(const char *szIP) {
     if (refuses_null_text(HERE, "szIP", szIP)) {
         return 0;
     }

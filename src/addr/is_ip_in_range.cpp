@@ -7,7 +7,7 @@
 
 using namespace kova;
 
-int KLIBIsIpInRange(const char *szIP, const char *szBound1, const char *szBound2, int nFamily) {
+extern "C" int KLIBIsIpInRange(const char *szIP, const char *szBound1, const char *szBound2, int nFamily) {
     if (szIP == nullptr || szBound1 == nullptr || szBound2 == nullptr) {
         return -1;
     }

@@ -7,7 +7,7 @@
 
 using namespace kova;
 
-int BlKLIBIsIpMask(char *szMask) {
+extern "C" int BlKLIBIsIpMask(char *szMask) {
     if (refuses_null_text(HERE, "szMask", szMask)) {
         return 0;
     }

@@ -33,7 +33,7 @@ bool is_prefix_length(const char *text) {
 
 } // namespace
 
-int BlKLIBIsv6IpAddrValid(const char *szV6IPAddr) {
+extern "C" int BlKLIBIsv6IpAddrValid(const char *szV6IPAddr) {
     if (refuses_null_text(HERE, "szV6IPAddr", szV6IPAddr)) {
         return 0;
     }

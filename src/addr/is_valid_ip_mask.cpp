@@ -7,7 +7,7 @@
 
 using namespace kova;
 
-int BlKLIBIsValidIpMask(const char *szIP, const char *szMask) {
+extern "C" int BlKLIBIsValidIpMask(const char *szIP, const char *szMask) {
     if (refuses(HERE, szIP != nullptr, "((void *)0) != szIP") || refuses(HERE, szMask != nullptr, "NULL != szMask")) {
         return 0;
     }

@@ -4,49 +4,55 @@
 #include "core/report.h"
 
 #include <algorithm>
+#include <cstring>
 
 using namespace kova;
 
 namespace {
 
-using tool_line = char[512];
+/** Copies the word behind a key that begins the line; without one the output stays as it was. */
+void copy_value(const char *line, const char *key, char *output) {
+    constexpr char kBlanks[] = " \t\n\v\f\r";
+    const size_t key_length = strlen(key);
+    if (strncmp(line, key, key_length) != 0) {
+        return;
+    }
+    const char *const word = line + key_length + strspn(line + key_length, kBlanks);
+    const size_t length = strcspn(word, kBlanks);
+    if (length != 0) {
+        memcpy(output, word, length);
+        output[length] = '\0';
+    }
+}
 
-/** Reads the first line that the tool prints, of at most the size of the caller's buffer; empty when there is none. */
-int read_ipcalc(const place &at, const char *option, const char *szSubnet, int cbOutput, tool_line &line) {
+/** Runs the tool and gives back what its first line, of which no more than fits the output is read, has for the key. */
+int ask_ipcalc(const place &at, const char *option, const char *key, const char *szSubnet, char *szOutput,
+               int cbOutput) {
     const process_stream tool{KLIBCPopen("/bin/ipcalc", "r", option, szSubnet, static_cast<const char *>(nullptr))};
     if (!tool.is_held()) {
         return fail_keeping_code(at, -1, "excute cmd /bin/ipcalc -b %s failed", szSubnet);
     }
-    if (fgets(line, std::min(cbOutput, static_cast<int>(sizeof line)), tool.get()) == nullptr) {
-        line[0] = '\0';
+    char line[512];
+    if (fgets(line, std::min(cbOutput, static_cast<int>(sizeof line)), tool.get()) != nullptr) {
+        copy_value(line, key, szOutput);
     }
     return 0;
 }
 
 } // namespace
 
-int KOVANetCalNetwork(const char *szSubnet, char *szNetwork, int cbNetwork) {
+extern "C" int KOVANetCalNetwork(const char *szSubnet, char *szNetwork, int cbNetwork) {
     if (refuses_text(HERE, "szSubnet", szSubnet) || refuses_null(HERE, "szNetwork", szNetwork) ||
         refuses(HERE, cbNetwork > 0, "0 < cbNetwork")) {
         return -1;
     }
-    tool_line line;
-    if (read_ipcalc(HERE, "-n", szSubnet, cbNetwork, line) < 0) {
-        return -1;
-    }
-    sscanf(line, "NETWORK=%s", szNetwork); // shorter than the line, and so than the buffer
-    return 0;
+    return ask_ipcalc(HERE, "-n", "NETWORK=", szSubnet, szNetwork, cbNetwork);
 }
 
-int KOVANetCalBroadcast(const char *szSubnet, char *szBroadcast, int cbBroadcast) {
+extern "C" int KOVANetCalBroadcast(const char *szSubnet, char *szBroadcast, int cbBroadcast) {
     if (refuses_text(HERE, "szSubnet", szSubnet) || refuses_null(HERE, "szBroadcast", szBroadcast) ||
         refuses(HERE, cbBroadcast > 0, "0 < cbBroadcast")) {
         return -1;
     }
-    tool_line line;
-    if (read_ipcalc(HERE, "-b", szSubnet, cbBroadcast, line) < 0) {
-        return -1;
-    }
-    sscanf(line, "BROADCAST=%s", szBroadcast); // shorter than the line, and so than the buffer
-    return 0;
+    return ask_ipcalc(HERE, "-b", "BROADCAST=", szSubnet, szBroadcast, cbBroadcast);
 }

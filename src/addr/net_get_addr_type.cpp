@@ -5,7 +5,7 @@
 
 using namespace kova;
 
-int KOVANetGetAddrType(const char *szIP) {
+extern "C" int KOVANetGetAddrType(const char *szIP) {
     if (refuses_null_text(HERE, "szIP", szIP)) {
         return 0;
     }

@@ -4,7 +4,7 @@
 
 using namespace kova;
 
-int KOVANetIsPrivateIP(const char *szIP) {
+extern "C" int KOVANetIsPrivateIP(const char *szIP) {
     uint32_t part[4];
     if (refuses_null_text(HERE, "szIP", szIP) || cKLIBISepIP(szIP, part) != 4) {
         return 0;

@@ -5,7 +5,7 @@
 
 using namespace kova;
 
-int KOVANetIsSameSubnet(const char *szIP1, const char *szIP2, const char *szMask) {
+extern "C" int KOVANetIsSameSubnet(const char *szIP1, const char *szIP2, const char *szMask) {
     if (refuses_null_text(HERE, "szIP1", szIP1) || refuses_null_text(HERE, "szIP2", szIP2) ||
         refuses_null_text(HERE, "szMask", szMask)) {
         return 0;

@@ -3,7 +3,7 @@
 #include <arpa/inet.h>
 #include <bit>
 
-int KOVANetNetmaskToPrefix(const char *szMask) {
+extern "C" int KOVANetNetmaskToPrefix(const char *szMask) {
     in_addr mask;
     if (szMask == nullptr || inet_aton(szMask, &mask) == 0) {
         return -1;

@@ -3,7 +3,7 @@
 #include <cstdio>
 #include <cstring>
 
-const char *KOVANetNtoa(uint32_t nIP) {
+extern "C" const char *KOVANetNtoa(uint32_t nIP) {
     static char text[18];
     unsigned char byte[sizeof nIP];
     memcpy(byte, &nIP, sizeof byte);

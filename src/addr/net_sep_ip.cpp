@@ -17,7 +17,7 @@ uint32_t read_part(char **text) {
 
 } // namespace
 
-int cKLIBISepIP(const char *szIP, uint32_t rgPart[4]) {
+extern "C" int cKLIBISepIP(const char *szIP, uint32_t rgPart[4]) {
     if (refuses_null_text(HERE, "szIP", szIP) || refuses_null(HERE, "rgPart", rgPart)) {
         return 0;
     }

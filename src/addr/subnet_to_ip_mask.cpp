@@ -61,7 +61,7 @@ struct dotted {
 
 } // namespace
 
-int ErrKLIBSubnetToIpMask(char *szSubnet, char *szIpMask) {
+extern "C" int ErrKLIBSubnetToIpMask(char *szSubnet, char *szIpMask) {
     if (refuses_null_text(HERE, "szSubnet", szSubnet) ||
         refuses(HERE, strchr(szSubnet, '/') != nullptr, "((void *)0) != strchr(szSubnet, '/')")) {
         return -1;
@@ -79,7 +79,7 @@ int ErrKLIBSubnetToIpMask(char *szSubnet, char *szIpMask) {
     return 0;
 }
 
-int ErrKLIBIpMaskToSubnet(char *szIpMask, char *szSubnet) {
+extern "C" int ErrKLIBIpMaskToSubnet(char *szIpMask, char *szSubnet) {
     if (refuses_null_text(HERE, "szIpMask", szIpMask) ||
         refuses(HERE, strchr(szIpMask, '/') != nullptr, "((void *)0) != strchr(szIpMask, '/')")) {
         return -1;

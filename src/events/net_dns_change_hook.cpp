@@ -6,7 +6,7 @@
 
 using namespace kova;
 
-int KOVANetDNSChangeHook(int nPhase, const KLIBSZLIST *pDnsList) {
+extern "C" int KOVANetDNSChangeHook(int nPhase, const KLIBSZLIST *pDnsList) {
     if (refuses_null(HERE, "pDnsList", pDnsList)) {
         return -1;
     }

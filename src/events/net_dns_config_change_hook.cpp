@@ -6,7 +6,7 @@
 
 using namespace kova;
 
-int KOVANetDnsConfigChangeHook(int nPhase, const char *szInterface, const KLIBSZLIST *pDnsList) {
+extern "C" int KOVANetDnsConfigChangeHook(int nPhase, const char *szInterface, const KLIBSZLIST *pDnsList) {
     if (refuses_null_text(HERE, "szInterface", szInterface) || refuses_null(HERE, "pDnsList", pDnsList)) {
         return -1;
     }

@@ -5,8 +5,8 @@
 
 using namespace kova;
 
-int KOVANetGatewayConfigChangeHook(int nPhase, const char *szType, const char *szInterface, const char *szGatewayOld,
-                                   const char *szGatewayNew) {
+extern "C" int KOVANetGatewayConfigChangeHook(int nPhase, const char *szType, const char *szInterface,
+                                              const char *szGatewayOld, const char *szGatewayNew) {
     if (refuses_null_text(HERE, "szType", szType) || refuses_null_text(HERE, "szInterface", szInterface) ||
         refuses_null_text(HERE, "szGatewayOld", szGatewayOld) ||
         refuses_null_text(HERE, "szGatewayNew", szGatewayNew)) {

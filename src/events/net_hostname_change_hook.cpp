@@ -5,7 +5,7 @@
 
 using namespace kova;
 
-int KOVANetHostnameChangeHook(const char *szHostname) {
+extern "C" int KOVANetHostnameChangeHook(const char *szHostname) {
     if (refuses_null_text(HERE, "szHostname", szHostname)) {
         return -1;
     }

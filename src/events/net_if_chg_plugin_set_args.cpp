@@ -6,8 +6,8 @@
 
 using namespace kova;
 
-int KLIBNetIFChgPluginSetArgs(uint64_t hPlugin, const char *const *rgszOrigin, int cOrigin, const char *const *rgszNew,
-                              int cNew, int nResult) {
+extern "C" int KLIBNetIFChgPluginSetArgs(uint64_t hPlugin, const char *const *rgszOrigin, int cOrigin,
+                                         const char *const *rgszNew, int cNew, int nResult) {
     if (refuses(HERE, hPlugin != 0, "0 != hPlugin") || refuses_null(HERE, "rgszOrigin", rgszOrigin) ||
         refuses_null(HERE, "rgszNew", rgszNew)) {
         return -1;

@@ -22,8 +22,8 @@ bool refuses_prefix(const place &at, int nFamily, int nPrefixLength) {
 
 } // namespace
 
-int KOVANetIPChangePreHook(int nFamily, const char *szIfname, const char *szOriginAddress, const char *szNewAddress,
-                           int nPrefixLength) {
+extern "C" int KOVANetIPChangePreHook(int nFamily, const char *szIfname, const char *szOriginAddress,
+                                      const char *szNewAddress, int nPrefixLength) {
     if (refuses(HERE, nFamily == kIPv4 || nFamily == kIPv6, "(0 == nFamily || 1 == nFamily)") ||
         refuses_null_text(HERE, "szIfname", szIfname) || refuses_null_text(HERE, "szOriginAddress", szOriginAddress) ||
         refuses_null_text(HERE, "szNewAddress", szNewAddress) || refuses_prefix(HERE, nFamily, nPrefixLength)) {

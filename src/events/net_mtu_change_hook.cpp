@@ -5,7 +5,7 @@
 
 using namespace kova;
 
-int KOVANetMTUChangeHook(const char *szIfname, const char *szMTU) {
+extern "C" int KOVANetMTUChangeHook(const char *szIfname, const char *szMTU) {
     if (refuses_null_text(HERE, "szIfname", szIfname) || refuses_null_text(HERE, "szMTU", szMTU)) {
         return -1;
     }

@@ -1,6 +1,6 @@
 #include "iface/link_event.h"
 
-#include <kova/plugin.h>
+#include "core/guards.h"
 
 namespace kova {
 
@@ -13,7 +13,10 @@ struct event_handle {
     event_handle() = default;
     event_handle(const event_handle &) = delete;
     event_handle &operator=(const event_handle &) = delete;
-    ~event_handle() { KLIBPluginExit(value); }
+    ~event_handle() {
+        const errno_keeper keep;
+        KLIBPluginExit(value);
+    }
 };
 
 } // namespace

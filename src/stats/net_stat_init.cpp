@@ -113,7 +113,7 @@ void skip_header(FILE *file) {
 
 } // namespace
 
-NETSTAT *KLIBNetStatInit(int nItem) {
+extern "C" NETSTAT *KLIBNetStatInit(int nItem) {
     if (refuses(HERE, nItem != 0, "0 != nItem") || refuses(HERE, nItem > 0, "0 < nItem")) {
         return nullptr;
     }
@@ -128,11 +128,11 @@ NETSTAT *KLIBNetStatInit(int nItem) {
     return records;
 }
 
-void KLIBNetStatFree(NETSTAT *pStat) {
+extern "C" void KLIBNetStatFree(NETSTAT *pStat) {
     free(pStat);
 }
 
-int KLIBNetStatGetAll(NETSTAT *pStat, int nItem) {
+extern "C" int KLIBNetStatGetAll(NETSTAT *pStat, int nItem) {
     if (refuses_null(HERE, "pStat", pStat) || refuses(HERE, nItem > 0, "0 < nItem")) {
         return -1;
     }
@@ -155,7 +155,7 @@ int KLIBNetStatGetAll(NETSTAT *pStat, int nItem) {
     return filled;
 }
 
-int KLIBNetStatGetSingle(const char *szIfname, NETSTAT *pStat) {
+extern "C" int KLIBNetStatGetSingle(const char *szIfname, NETSTAT *pStat) {
     if (refuses_text(HERE, "szIfname", szIfname) || refuses_null(HERE, "pStat", pStat)) {
         return -1;
     }

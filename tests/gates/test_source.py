@@ -84,6 +84,6 @@ def test_unit_has_no_goto_and_no_unfinished_mark(path):
 
 
 def test_every_unit_has_its_test():
-    units = {path.stem for path in (ROOT / "src").glob("*/*.cpp") if 'extern "C"' in path.read_text()}
+    units = {path.stem for path in (ROOT / "src").glob("*/*.cpp") if not path.with_suffix(".h").exists()}  # helpers have one
     tests = {path.name.removesuffix("_test.cpp") for path in (ROOT / "tests" / "unit").glob("*_test.cpp")}
     assert units - tests == set()

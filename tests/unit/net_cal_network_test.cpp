@@ -58,16 +58,37 @@ TEST_F(net_cal_network, KOVANetCalNetwork_unmatchedOutput_leavesTheOutput) {
     }
 }
 
+TEST_F(net_cal_network, KOVANetCalNetwork_firstWordBehindTheKey_isTheAddress) {
+    for (const char *value : {"1.2.3.0", "1.2.3.0\n", " \t1.2.3.0\n", "1.2.3.0 PREFIX=24\n", "1.2.3.0\r\n"}) {
+        SCOPED_TRACE(value);
+        rig.answer("/bin/ipcalc -n", 0, std::string("NETWORK=") + value);
+        rig.answer("/bin/ipcalc -b", 0, std::string("BROADCAST=") + value);
+        EXPECT_OUTCOME(call(KOVANetCalNetwork, "x"), {.result = 0, .commands = {"/bin/ipcalc -n x"}});
+        EXPECT_EQ("1.2.3.0", output);
+        EXPECT_OUTCOME(call(KOVANetCalBroadcast, "x"), {.result = 0, .commands = {"/bin/ipcalc -b x"}});
+        EXPECT_EQ("1.2.3.0", output);
+    }
+    for (const char *line : {" NETWORK=1.2.3.0\n", "network=1.2.3.0\n", "NETWORK =1.2.3.0\n", "NETWORK= \n1.2.3.0\n"}) {
+        SCOPED_TRACE(line);
+        rig.answer("/bin/ipcalc -n", 0, line);
+        EXPECT_OUTCOME(call(KOVANetCalNetwork, "x"), {.result = 0, .commands = {"/bin/ipcalc -n x"}});
+        EXPECT_EQ("before", output);
+    }
+}
+
 TEST_F(net_cal_network, KOVANetCalNetwork_smallBuffer_readsThatMuchOfTheLine) {
     rig.answer("/bin/ipcalc -n", 0, "NETWORK=192.168.100.100\n");
     rig.answer("/bin/ipcalc -b", 0, "BROADCAST=192.168.100.255\n");
-    const std::map<size_t, std::string> networks{{7, "before"}, {16, "192.168"}, {24, "192.168.100.100"}};
+    const std::map<size_t, std::string> networks{
+        {7, "before"}, {16, "192.168"}, {23, "192.168.100.10"}, {24, "192.168.100.100"}};
     for (const auto &[size, network] : networks) {
         SCOPED_TRACE(size);
         EXPECT_OUTCOME(call(KOVANetCalNetwork, "x", size), {.result = 0, .commands = {"/bin/ipcalc -n x"}});
         EXPECT_EQ(network, output);
     }
     EXPECT_OUTCOME(call(KOVANetCalNetwork, "x", 1), {.result = 0, .commands = {"/bin/ipcalc -n x"}});
+    EXPECT_OUTCOME(call(KOVANetCalBroadcast, "x", 25), {.result = 0, .commands = {"/bin/ipcalc -b x"}});
+    EXPECT_EQ("192.168.100.25", output);
     EXPECT_OUTCOME(call(KOVANetCalBroadcast, "x", 26), {.result = 0, .commands = {"/bin/ipcalc -b x"}});
     EXPECT_EQ("192.168.100.255", output);
 }

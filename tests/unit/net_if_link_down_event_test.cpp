@@ -33,3 +33,11 @@ TEST_F(net_if_link_down_event, KLIBNetIfLinkDownEvent_failing_step_releases_the_
     EXPECT_OUTCOME(raise("eth0"),
                    {.result = -1, .code = 0x2A00, .unit = "platform", .events = {"net/if_link_down 5 IFNAME=eth0"}});
 }
+
+TEST_F(net_if_link_down_event, KLIBNetIfLinkDownEvent_event_not_opened_is_handed_back_too) {
+    raise("");
+    EXPECT_FALSE(rig.held.contains("event handles")); // no call of the event library at all
+    rig.fail("KLIBPluginSDKInit");
+    raise("eth0");
+    EXPECT_TRUE(rig.held.contains("event handles")); // an exit leaves its mark, also when nothing was open
+}
