@@ -42,7 +42,7 @@ cluster_view::cluster_view(const place &at, int kind) : kind_(kind), is_running_
 }
 
 bool cluster_view::admits(const char *szIfname, cluster_address &address) const {
-    if (is_running_ && (kind_ & kKeepHeartbeat) == 0 && strcmp(szIfname, heartbeat_) == 0) {
+    if ((kind_ & kKeepHeartbeat) == 0 && strcmp(szIfname, heartbeat_) == 0) {
         return false;
     }
     return !gives_addresses() || KOVAHAGetRelatedIFInfo(szIfname, address.szIP, address.szMask) != 0;

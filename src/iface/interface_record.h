@@ -49,7 +49,7 @@ public:
 private:
     int kind_;
     bool is_running_;
-    char heartbeat_[16] = "";
+    char heartbeat_[16] = ""; ///< "" without a cluster
 };
 
 /** Whether an interface may be in any result: up, without these flags, no member of a bridge or a switch bond. */

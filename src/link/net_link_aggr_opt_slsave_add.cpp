@@ -12,7 +12,7 @@ constexpr int kMaxSlaves = 32;
 using slave_name = char[16];
 
 int compare_names(const void *left, const void *right) {
-    return strcmp(static_cast<const char *>(left), static_cast<const char *>(right));
+    return strncmp(static_cast<const char *>(left), static_cast<const char *>(right), sizeof(slave_name));
 }
 
 } // namespace
@@ -24,13 +24,13 @@ extern "C" int KOVANetLinkAggrOptSlsaveAdd(KOVALINKAGGROPT *pOpt, const char *sz
         return -1;
     }
     if (pOpt->cSlaves >= kMaxSlaves) {
-        return fail(HERE, NET_ERR_FULL, -1, "No room for slave %s in [%s]", szSlave, pOpt->szName);
+        return fail(HERE, NET_ERR_FULL, -1, "No room for slave %s in [%.16s]", szSlave, pOpt->szName);
     }
     slave_name name = {}; // looked up as it will be stored, and without stray bytes behind it
     copy_text(name, szSlave);
     const auto number = static_cast<size_t>(pOpt->cSlaves);
     if (bsearch(name, pOpt->aszSlaves, number, sizeof(slave_name), compare_names) != nullptr) {
-        return fail(HERE, NET_ERR_EXISTS, -1, "Slave %s is already in [%s]", name, pOpt->szName);
+        return fail(HERE, NET_ERR_EXISTS, -1, "Slave %s is already in [%.16s]", name, pOpt->szName);
     }
     fail_quietly(HERE, NET_ERR_NOT_FOUND, 0);
     memcpy(pOpt->aszSlaves[number], name, sizeof name);

@@ -44,13 +44,13 @@ protected:
 };
 
 TEST_F(net_get_interface_info, KLIBNetGetInterfaceInfo_oneCard_fillsTheWholeRecord) {
-    kernel.add("eth0", {.flags = kUp | IFF_BROADCAST, .ip = "192.168.1.10", .mask = "255.255.255.0"});
+    kernel.add("eth0", {.flags = kUp | IFF_DYNAMIC, .ip = "192.168.1.10", .mask = "255.255.255.0"});
     EXPECT_OUTCOME(get(2), {.result = 1});
     EXPECT_STREQ("eth0", records[0].szIfname);
     EXPECT_STREQ("192.168.1.10", records[0].szIP);
     EXPECT_STREQ("255.255.255.0", records[0].szMask);
     EXPECT_EQ(2U, records[0].nLink);
-    EXPECT_EQ(kUp | IFF_BROADCAST, records[0].nFlags);
+    EXPECT_EQ(kUp | IFF_DYNAMIC, records[0].nFlags); // the highest of the 16
     EXPECT_EQ(0, memcmp("\x02\0\0\0\0\x01", records[0].abMac, 6));
     EXPECT_STREQ("", records[1].szIfname);
 }
@@ -163,6 +163,10 @@ TEST_F(net_get_interface_info, KLIBNetGetInterfaceInfo_switchName_hasTheLinkBehi
     kernel.add("ovs_eth0", {.flags = IFF_UP});
     EXPECT_OUTCOME(get(2), {.result = 2});
     EXPECT_EQ(2U, records[1].nLink);
+    rig.replace_file("/sys/devices/virtual/net/ovs_eth1", "");
+    kernel.add("ovs_eth1"); // over nothing
+    EXPECT_EQ(3, get(2).result);
+    EXPECT_EQ(0U, records[2].nLink);
 }
 
 // ---- VLANs

@@ -148,7 +148,8 @@ TEST_F(net_if_is_link, KOVANetIfIsLink_realPair_hasLinkWhenBothEndsAreUp) {
     rig.answer_ioctl({});
     shell("ip link add kv0 type veth peer name kv1 && ip link set kv0 up");
     EXPECT_OUTCOME(is_link("kv0"), {.result = 0});
-    shell("ip link set kv1 up");
+    shell("ip link set kv1 up"); // the kernel tells the other end a little later
+    shell("timeout 10 sh -c 'until ip link show kv0 | grep -q \"state UP\"; do sleep 0.02; done'");
     EXPECT_OUTCOME(is_link("kv0"), {.result = 1});
     shell("ip link del kv0");
 }

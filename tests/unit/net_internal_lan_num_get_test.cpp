@@ -24,7 +24,7 @@ TEST_F(net_internal_lan_num_get, KOVANetInternalLanNumGet_kernelNumber_winsOverT
 TEST_F(net_internal_lan_num_get, KOVANetInternalLanNumGet_unusableNumber_isTheDefault) {
     write_file("/etc.defaults/kovainfo.conf", "maxlanport=\"2\"\n");
     for (const std::string &text : texts{"", "\n", "0\n", "-3\n", "many\n", "99999999999999999999\n", "2147483648\n",
-                                         std::string("\0\x01\xff", 3), long_text(100000, 'x')}) {
+                                         "-4294967292\n", std::string("\0\x01\xff", 3), long_text(100000, 'x')}) {
         EXPECT_EQ(2, number(text)) << text.substr(0, 30);
     }
 }

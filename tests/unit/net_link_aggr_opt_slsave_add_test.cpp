@@ -64,6 +64,23 @@ TEST_F(net_link_aggr_opt_slsave_add, KOVANetLinkAggrOptSlsaveAdd_thirtyThirdName
     EXPECT_OUTCOME(add("eth0"), full);
 }
 
+TEST_F(net_link_aggr_opt_slsave_add, KOVANetLinkAggrOptSlsaveAdd_unterminatedFields_endWithTheirBytes) {
+    memset(&bond, 'u', sizeof bond);
+    for (const int row : {0, 1}) {
+        memset(bond.aszSlaves[row], 'v', sizeof bond.aszSlaves[row]);
+    }
+    bond.cSlaves = 2;
+    EXPECT_OUTCOME(add("eth0"), added());
+    EXPECT_STREQ("eth0", bond.aszSlaves[0]);
+    EXPECT_EQ(std::string(16, 'v'), std::string(bond.aszSlaves[1], 16));
+    EXPECT_EQ(std::string(16, 'v'), std::string(bond.aszSlaves[2], 16));
+    const std::string unit = "ERR net_link_aggr_opt_slsave_add:N ";
+    const std::string name = "[" + long_text(16, 'u') + "]";
+    EXPECT_EQ(texts{unit + "Slave eth0 is already in " + name}, add("eth0").log);
+    bond.cSlaves = 32;
+    EXPECT_EQ(texts{unit + "No room for slave eth1 in " + name}, add("eth1").log);
+}
+
 TEST_F(net_link_aggr_opt_slsave_add, KOVANetLinkAggrOptSlsaveAdd_badArguments_areRefused) {
     EXPECT_OUTCOME(add(nullptr), refusal("net_link_aggr_opt_slsave_add", "((void *)0) != szSlave"));
     EXPECT_OUTCOME(add(""), refusal("net_link_aggr_opt_slsave_add", "'\\0' != *szSlave"));

@@ -18,11 +18,12 @@ protected:
 };
 
 TEST_F(net_ovs_if_is_slave, KLIBNetOVSIfIsSlave_wordsBehindTheBond_areMembers) {
-    rig.replace_file(kBonds, "ovs_bond0 eth0  eth1\n\n   ovs_bond1 eth10 \nlonely\nbond2 eth5");
+    rig.replace_file(kBonds, "ovs_bond0 eth0  eth1\n\n   ovs_bond1 eth10 \nlonely\n\tbond3 eth8\t\r\nbond2 eth5");
     for (const auto &[name, expected] : std::map<std::string, int>{{"eth0", 1},
                                                                    {"eth1", 1},
                                                                    {"eth10", 1},
                                                                    {"eth5", 1},
+                                                                   {"eth8", 1},
                                                                    {"eth", 0},
                                                                    {"eth100", 0},
                                                                    {"ovs_bond0", 0},
