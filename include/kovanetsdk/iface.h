@@ -266,7 +266,7 @@ int KOVANetSetCard1(NETINFO *pNew, NETINFO *pOld);
  * Sets a static IPv4 address: rewrites the interface's file (DEVICE, ONBOOT, IPADDR, NETMASK, BOOTPROTO=static, without
  * MASTER and SLAVE), stops its DHCP client (a failure is only logged) and sets the address with KOVANetSetIP. The file
  * is backed up as "<file>.tmp<seconds>" and moved back when a step fails; one that cannot be backed up changes all the
- * same. Takes no lock: the caller holds 0x106.
+ * same. Only the file is put back: a DHCP client that was stopped stays so. Takes no lock: the caller holds 0x106.
  * @param szIfname  interface
  * @param szIP      dotted address
  * @param szMask    dotted mask

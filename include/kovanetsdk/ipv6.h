@@ -65,8 +65,8 @@ int KOVANetIPv6IsSameSubnet(const char *szV6IPAddr1, const char *szV6IPAddr2, un
  * /proc/sys/net/ipv6/conf/IF/disable_ipv6.
  * @param nSwitch  1 off; 0 on, and waits up to 5 seconds for the link-local address to settle; anything else on, at
  * once
- * @return 0, also when the address did not settle; -1 with 0xD00 (the name), 0xBC00 (no such interface) or 0xB00 (the
- *         kernel refuses)
+ * @return 0, also when the address did not settle; -1 with 0xD00 (the name), 0xBC00 (no such interface), the code of
+ *         the enumeration, 0xB00 (the kernel refuses), or without a code (no switch: the kernel has no IPv6)
  */
 int KOVALnxIPv6ProcAction(const char *szIfname, int nSwitch);
 

@@ -4,14 +4,29 @@
 
 #include <cstring>
 #include <ctime>
+#include <sys/stat.h>
 
 namespace kova {
+
+namespace {
+
+/** The tool makes its copy as its caller's and under the caller's umask. */
+void give_owner_and_mode(const char *from, const char *to) {
+    struct stat status;
+    if (stat(from, &status) == 0 && chown(to, status.st_uid, status.st_gid) == 0) {
+        chmod(to, status.st_mode & 07777);
+    }
+}
+
+} // namespace
 
 file_backup::file_backup(const place &at, const path_text &file)
     : at_(at), file_(file), copy_("%s.tmp%ld", file.c_str(), static_cast<long>(time(nullptr))) {
     const int status = KLIBCExec("/bin/cp", "-f", file_.c_str(), copy_.c_str(), nullptr);
     is_made_ = status == 0;
-    if (!is_made_) {
+    if (is_made_) {
+        give_owner_and_mode(file_.c_str(), copy_.c_str());
+    } else {
         at_.begin = lead::unit;
         // a tool that ran and failed leaves no errno
         log_info(at_, "copy (%s, %s) failed.(strerror=%s)", file_.c_str(), copy_.c_str(),

@@ -24,7 +24,7 @@ bool is_short(const char *szIfname) {
 int require_known_and_down(const char *szIfname) {
     const owner<statistics_kind> statistics{KLIBNetStatInit(1)};
     if (!statistics.is_held()) {
-        return -1;
+        return fail_keeping_code(HERE, -1, "Failed to alloc memory.");
     }
     if (KLIBNetStatGetSingle(szIfname, statistics.get()) < 0) {
         return fail(HERE, NET_ERR_NOT_FOUND, -1, "No interface %s", szIfname);

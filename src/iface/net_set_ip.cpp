@@ -17,13 +17,14 @@ using namespace kova;
 namespace {
 
 constexpr int kLongestPrefixV4 = 32;
+constexpr size_t kLongestTextV4 = 31; // what BlKLIBIsIpAddr looks at
 constexpr int kLongestPrefixV6 = 128;
 constexpr size_t kMostV6Addresses = 16;
 
 /** Addresses of one interface, joined by ",". */
 using address_list = char[kMostV6Addresses * sizeof(KOVAV6IP::szIP)];
 
-/** "<ip>/<prefix>"; one that does not fit is no address. */
+/** "<ip>/<prefix>"; every address that is valid fits. */
 class subnet_text : public built_text<64> {
 public:
     subnet_text(const char *szIP, int prefix) : built_text("%s/%d", szIP, prefix) {}
@@ -85,10 +86,10 @@ int change_ipv4(const char *szIfname, const char *szIP, int prefix, bool adds) {
     if (prefix < 0 || prefix > kLongestPrefixV4) {
         return fail_keeping_code(HERE, -1, "prefix length is wrong");
     }
-    const subnet_text subnet{szIP, prefix};
-    if (!BlKLIBIsIpAddr(szIP) || !subnet.fits()) {
+    if (!BlKLIBIsIpAddr(szIP) || strlen(szIP) > kLongestTextV4) {
         return fail_keeping_code(HERE, -1, "your ip %s is not valid", szIP);
     }
+    const subnet_text subnet{szIP, prefix};
     char old[1024] = "";
     if (KOVAILnxGetIP(szIfname, old, sizeof old) < 0) {
         return fail_keeping_code(HERE, -1, "get old v4 IP failed");
@@ -132,10 +133,10 @@ int change_ipv6(const char *szIfname, const char *szIP, int prefix, bool adds) {
     if (prefix < 0 || prefix > kLongestPrefixV6) {
         return fail_keeping_code(HERE, -1, "prefix length is wrong");
     }
-    const subnet_text subnet{szIP, prefix};
-    if (!BlKLIBIsv6IpAddrValid(szIP) || !subnet.fits()) {
+    if (!BlKLIBIsv6IpAddrValid(szIP)) {
         return fail_keeping_code(HERE, -1, "your v6ip %s is not valid", szIP);
     }
+    const subnet_text subnet{szIP, prefix};
     KOVAV6IP current[kMostV6Addresses];
     const int count = KOVALnxV6IPGet(szIfname, current, kMostV6Addresses);
     if (count < 0) {

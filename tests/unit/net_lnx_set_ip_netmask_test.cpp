@@ -2,6 +2,8 @@
 
 #include <cerrno>
 #include <kovanetsdk/iface.h>
+#include <sys/stat.h>
+#include <unistd.h>
 
 using namespace kova_test;
 
@@ -117,6 +119,16 @@ TEST_F(net_lnx_set_ip_netmask, KOVAILnxSetIPNetmask_without_backup_a_failure_mov
     EXPECT_EQ("somebody else's\n", read_file(foreign));
 }
 
+TEST_F(net_lnx_set_ip_netmask, KOVAILnxSetIPNetmask_copy_without_process_tells_why) {
+    rig.answer("/bin/cp", -1, "", [] { errno = EAGAIN; });
+    EXPECT_OUTCOME(set(), {.log = {"INFO net_lnx_set_ip_netmask:N copy (/etc/sysconfig/network-scripts/ifcfg-eth0, "
+                                   "/etc/sysconfig/network-scripts/ifcfg-eth0.tmp1700000000) "
+                                   "failed.(strerror=Resource temporarily unavailable)"},
+                           .commands = {kCopy, kStop, kTakeDown, kSetNew},
+                           .events = {kEvent}});
+    expect_file(kAfter);
+}
+
 TEST_F(net_lnx_set_ip_netmask, KOVAILnxSetIPNetmask_without_backup_a_success_deletes_nothing) {
     rig.answer("/bin/cp", 1);
     write_file(ifcfg("eth0.tmp1700000000"), "somebody else's\n");
@@ -169,6 +181,21 @@ TEST_F(net_lnx_set_ip_netmask, KOVAILnxSetIPNetmask_failing_step_puts_the_file_b
     }
     EXPECT_EQ(0, set().result);
     expect_file(kAfter);
+}
+
+TEST_F(net_lnx_set_ip_netmask, KOVAILnxSetIPNetmask_file_put_back_keeps_its_mode_and_owner) {
+    const mode_t callers = umask(077);
+    for (const mode_t mode : {0644U, 0664U, 0640U, 0600U}) {
+        ASSERT_EQ(0, chown(ifcfg("eth0").c_str(), 0, 8));
+        ASSERT_EQ(0, chmod(ifcfg("eth0").c_str(), mode));
+        EXPECT_EQ(-1, set("10.1.2.3", "no mask").result);
+        expect_file(kBefore);
+        struct stat status = {};
+        EXPECT_EQ(0, stat(ifcfg("eth0").c_str(), &status));
+        EXPECT_EQ(mode, status.st_mode & 07777);
+        EXPECT_EQ(8U, status.st_gid);
+    }
+    umask(callers);
 }
 
 TEST_F(net_lnx_set_ip_netmask, KOVAILnxSetIPNetmask_every_map_operation_may_fail) {

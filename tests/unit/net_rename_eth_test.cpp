@@ -76,7 +76,10 @@ TEST_F(net_rename_eth, KOVANetRenameEth_failing_step_is_told) {
 TEST_F(net_rename_eth, KOVANetRenameEth_without_memory_fails) {
     NEEDS_OWN_ALLOCATOR();
     rig.fail("calloc");
-    EXPECT_OUTCOME(rename("eth0", "lan0"), {.result = -1, .code = 0x200, .unit = "net_stat_init"});
+    EXPECT_OUTCOME(rename("eth0", "lan0"), {.result = -1,
+                                            .code = 0x200,
+                                            .unit = "net_stat_init",
+                                            .log = {"ERR net_rename_eth:N Failed to alloc memory."}});
 }
 
 TEST_F(net_rename_eth, KOVANetRenameEth_renames_a_real_interface) {

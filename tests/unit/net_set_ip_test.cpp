@@ -99,10 +99,22 @@ TEST_F(net_set_ip, KOVANetSetIP_text_that_is_no_address_is_told) {
     }
 }
 
-TEST_F(net_set_ip, KOVANetSetIP_address_too_long_for_a_subnet_is_told) {
-    const std::string address = "10.0.0." + long_text(60, '0') + "1"; // its first 31 characters are an address
-    const outcome got = set("-4", address.c_str(), 24, "add");
-    EXPECT_OUTCOME(got, {.result = -1, .log = {"ERR net_set_ip:N your ip " + address + " is not valid"}});
+TEST_F(net_set_ip, KOVANetSetIP_text_that_only_begins_with_an_address_is_told_and_takes_nothing_down) {
+    const std::string longest = "10.0.0." + long_text(23, '0') + "1"; // 31 characters, all that the check looks at
+    EXPECT_OUTCOME(set("-4", longest.c_str(), 24, "del"),
+                   {.commands = {"/sbin/ip -4 address del " + longest + "/24 dev eth0"}});
+    for (const std::string &rest : texts{"x", "1", ".1", long_text(28, '0'), long_text(60, '0')}) {
+        const std::string address = longest + rest;
+        EXPECT_OUTCOME(set("-4", address.c_str(), 24, "add"),
+                       {.result = -1, .log = {"ERR net_set_ip:N your ip " + address + " is not valid"}});
+    }
+}
+
+TEST_F(net_set_ip, KOVANetSetIP_longest_ipv6_text_fits) {
+    give_ipv6({});
+    const std::string longest = "ffff:ffff:ffff:ffff:ffff:ffff:255.255.255.255";
+    EXPECT_OUTCOME(set("-6", longest.c_str(), 128, "del"),
+                   {.commands = {"/sbin/ip -6 address del " + longest + "/128 dev eth0"}});
 }
 
 TEST_F(net_set_ip, KOVANetSetIP_text_that_is_no_ipv6_address_is_told) {
