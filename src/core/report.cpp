@@ -121,7 +121,7 @@ void report_refused(const place &at, const char *condition, const char *name) {
 }
 
 bool is_interface_name(const char *text) {
-    constexpr size_t kLongest = 240; // with any prefix and suffix of ours still one file name
+    constexpr size_t kLongest = 235; // its "ifcfg-", backed up with ".tmp" and the time, is still one name
     for (const char *c = text; *c != '\0'; ++c) {
         const auto byte = static_cast<unsigned char>(*c);
         if (byte <= ' ' || byte == 0x7f || byte == '/') {

@@ -61,7 +61,7 @@ TEST_F(lnx_ipv6_proc_action, KOVALnxIPv6ProcAction_interface_that_does_not_count
     kernel.add("eth1", {.flags = 0});
     kernel.add("eth2", {.flags = IFF_UP | IFF_SLAVE});
     for (const std::string &name :
-         texts{"lo", "eth1", "eth2", "eth9", "all", long_text(15), long_text(16), long_text(240)}) {
+         texts{"lo", "eth1", "eth2", "eth9", "all", long_text(15), long_text(16), long_text(235)}) {
         for (const int nSwitch : {0, 1}) {
             EXPECT_OUTCOME(act(nSwitch, name.c_str()), {.result = -1, .code = 0xBC00, .unit = "net_is_dev_type_match"});
         }

@@ -37,7 +37,7 @@ TEST_F(net_is_if_up, KOVANetIsIFUp_lowest_bit_decides) {
 
 TEST_F(net_is_if_up, KOVANetIsIFUp_no_file_is_down) {
     for (const std::string &name :
-         texts{"eth9", long_text(15), long_text(16), long_text(17), long_text(63), long_text(240)}) {
+         texts{"eth9", long_text(15), long_text(16), long_text(17), long_text(63), long_text(235)}) {
         EXPECT_OUTCOME(is_up(name.c_str()), {.result = 0});
     }
     rig.fail("fopen");

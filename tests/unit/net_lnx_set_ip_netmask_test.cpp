@@ -79,6 +79,16 @@ TEST_F(net_lnx_set_ip_netmask, KOVAILnxSetIPNetmask_name_that_is_none_is_refused
     expect_file(kBefore);
 }
 
+TEST_F(net_lnx_set_ip_netmask, KOVAILnxSetIPNetmask_longest_name_still_has_its_backup) {
+    const std::string longest = long_text(235);
+    EXPECT_OUTCOME(set("10.1.2.3", "255.0.0.0", (longest + "a").c_str()),
+                   refusal("net_lnx_set_ip_netmask", "is_interface_name(szIfname)"));
+    write_file(ifcfg(longest), kBefore);
+    EXPECT_EQ(-1, set("10.1.2.3", "255.0.0.0", longest.c_str()).result); // the kernel does not know it
+    EXPECT_EQ(kBefore, read_file(ifcfg(longest)));
+    EXPECT_EQ((texts{"ifcfg-" + longest, "ifcfg-eth0"}), list_dir(kDirectory));
+}
+
 TEST_F(net_lnx_set_ip_netmask, KOVAILnxSetIPNetmask_new_address_is_stored_and_set) {
     EXPECT_OUTCOME(set(), {.commands = {kCopy, kStop, kTakeDown, kSetNew}, .events = {kEvent}});
     expect_file(kAfter);

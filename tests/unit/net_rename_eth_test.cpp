@@ -38,7 +38,7 @@ TEST_F(net_rename_eth, KOVANetRenameEth_name_that_is_none_is_refused) {
 }
 
 TEST_F(net_rename_eth, KOVANetRenameEth_name_of_seventeen_characters_is_refused) {
-    for (const size_t length : {17U, 63U, 64U, 240U}) {
+    for (const size_t length : {17U, 63U, 64U, 235U}) {
         EXPECT_OUTCOME(rename(long_text(length).c_str(), "lan0"), refusal("net_rename_eth", "strlen(szOld) < 17"));
         EXPECT_OUTCOME(rename("eth0", long_text(length).c_str()), refusal("net_rename_eth", "strlen(szNew) < 17"));
     }
