@@ -258,3 +258,10 @@ def test_empty_master_is_no_bond_member():
 @pytest.mark.parametrize("words", [[], ["status"], ["nat-start-dhcp"], ["--help", "eth0"]])
 def test_unknown_verb_is_bad_usage(words):
     assert network(*words, status=2).stderr.startswith("usage: rc.network ")
+
+
+def test_lock_directory_is_made_for_root():
+    run("rm", "-rf", "/run/lock/kova")
+    run("/etc/rc.network", "start", "lo", status=None)
+    made = pathlib.Path("/run/lock/kova").stat()
+    assert (made.st_uid, made.st_mode & 0o777) == (0, 0o755)
