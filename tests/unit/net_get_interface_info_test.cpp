@@ -353,6 +353,14 @@ TEST_F(net_get_interface_info, KLIBNetGetInterfaceInfo_noMemoryForTheList_failsA
         ::testing::ExitedWithCode(0), "");
 }
 
+TEST_F(net_get_interface_info, KLIBNetGetInterfaceInfo_list_isMadeOncePerProcess) {
+    NEEDS_OWN_ALLOCATOR();
+    kernel.add("eth0");
+    EXPECT_OUTCOME(get(2), {.result = 1});
+    rig.fail_from("calloc");
+    EXPECT_OUTCOME(get(2), {.result = 1});
+}
+
 TEST_F(net_get_interface_info, KLIBNetGetInterfaceInfo_realInterfaces_areRead) {
     rig.answer_ioctl({});
     rig.redirect("/proc/net/dev", "/proc/net/dev");
