@@ -367,8 +367,11 @@ def test_stopped_command_stops_the_box_and_goes_on(alarm, prefix):
     terminal.wait_for("Stopped")
     terminal.type("echo shell \"\"again\n")
     terminal.wait_for("shell again")
-    terminal.type("fg\nthrough\n")
-    terminal.wait_for("through")
+    terminal.type("fg\n")
+    terminal.wait_for(f"{BOX} --")  # the shell names what it goes on with
+    terminal.type("through\n")
+    terminal.wait_for("through")  # the terminal's echo
+    terminal.wait_for("through")  # the command's answer: it reads, and will read the end, too
     terminal.type("\x04")
     terminal.wait_for("ended")
     terminal.type("echo status $?; exit 4\n")
