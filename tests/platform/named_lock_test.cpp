@@ -193,8 +193,11 @@ TEST_F(named_lock, KLIBCFileLock_deadOwnerWithLivingChild_isFree) {
     const int status = in_child([&] {
         if (KLIBCFileLock(kExclusive, 1) != 0)
             return 1;
-        const pid_t survivor = start_child([] { return static_cast<int>(sleep(30)); });
-        return write(pid_pipe[1], &survivor, sizeof survivor) == sizeof survivor ? kill(getpid(), SIGKILL) : 1;
+        start_child([&] {
+            const pid_t self = getpid(); // told by the child itself, which has let go of the lock by then
+            return write(pid_pipe[1], &self, sizeof self) == sizeof self ? static_cast<int>(sleep(30)) : 1;
+        });
+        return kill(getpid(), SIGKILL);
     });
     EXPECT_EQ(status, 128 + SIGKILL);
     pid_t survivor = 0;
