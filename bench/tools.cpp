@@ -1,0 +1,27 @@
+// The tool against the tools administrators know.
+#include "rows.h"
+#include "world.h"
+
+#include <memory>
+
+namespace kova {
+
+namespace {
+
+measure run_of(std::vector<std::string> arguments) {
+    const auto program = std::make_shared<silent_program>(std::move(arguments));
+    return timed([program] { program->run(); });
+}
+
+sides list_against_ip() {
+    run_program({"kovanet", "card", "set", "eth0", "static", "192.168.50.10/24"}, "");
+    return {run_of({"kovanet", "card", "list"}), run_of({"ip", "-br", "addr"})};
+}
+
+} // namespace
+
+contests tool_contests() {
+    return {{"card-list", "ip", "kovanet card list", "ip -br addr", 1.5, 200, list_against_ip}};
+}
+
+} // namespace kova
