@@ -8,6 +8,8 @@ namespace kova {
 
 namespace {
 
+constexpr int kMany = 1000;
+
 measure run_of(std::vector<std::string> arguments) {
     const auto program = std::make_shared<silent_program>(std::move(arguments));
     return timed([program] { program->run(); });
@@ -18,10 +20,19 @@ sides list_against_ip() {
     return {run_of({"kovanet", "card", "list"}), run_of({"ip", "-br", "addr"})};
 }
 
+sides stats_against_ip() {
+    const auto world = std::make_shared<interfaces>(kMany, interfaces::state::down);
+    const measure ours = run_of({"kovanet", "stats"});
+    return {[world, ours] { return ours(); }, run_of({"ip", "-s", "link"})};
+}
+
 } // namespace
 
 contests tool_contests() {
-    return {{"card-list", "ip", "kovanet card list", "ip -br addr", 1.5, 200, list_against_ip}};
+    return {
+        {"card-list", "ip", "kovanet card list", "ip -br addr", 1.5, 200, list_against_ip},
+        {"stats-list", "ip", "kovanet stats, 1,000 interfaces", "ip -s link", std::nullopt, 20, stats_against_ip},
+    };
 }
 
 } // namespace kova

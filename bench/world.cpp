@@ -57,8 +57,9 @@ void read_whole(const char *path) {
 interfaces::interfaces(int count, state wanted) {
     const std::string batch = "/tmp/interfaces";
     std::ostringstream commands;
-    for (int missing = count - interface_count(); missing > 0; missing -= 2) {
-        add_pair(commands, missing, wanted);
+    const int pairs = (count - interface_count()) / 2;
+    for (int i = 1; i <= pairs; ++i) {
+        add_pair(commands, i, wanted);
     }
     write_file(batch, commands.str());
     run_program({"ip", "-batch", batch}, "");
