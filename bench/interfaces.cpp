@@ -7,11 +7,14 @@
 #include <fcntl.h>
 #include <kovanetsdk/iface.h>
 #include <kovanetsdk/stats.h>
+#include <linux/if_vlan.h>
+#include <linux/sockios.h>
 #include <memory>
 #include <net/if.h>
 #include <sys/ioctl.h>
 #include <sys/socket.h>
 #include <sys/stat.h>
+#include <sys/utsname.h>
 #include <unistd.h>
 
 namespace kova {
@@ -25,48 +28,53 @@ constexpr char kCounters[] = "/proc/net/dev";
 
 // ---- counters
 
-sides counters_against(std::function<void(void)> theirs) {
+sides counters_against(const measure &theirs) {
     const auto world = std::make_shared<interfaces>(kMany, interfaces::state::down);
     const std::shared_ptr<NETSTAT> records{KLIBNetStatInit(kMany), KLIBNetStatFree};
     return {timed([world, records] {
                 require_done(KLIBNetStatGetAll(records.get(), kMany) == kMany, "KLIBNetStatGetAll failed");
             }),
-            timed(std::move(theirs))};
+            theirs};
 }
 
 sides counters_against_floor() {
-    return counters_against([] { read_whole(kCounters); });
+    return counters_against(timed([] { read_whole(kCounters); }));
 }
 
 sides counters_against_ip() {
-    const auto ip = std::make_shared<silent_program>(std::vector<std::string>{"ip", "-j", "-s", "link"});
-    return counters_against([ip] { ip->run(); });
+    return counters_against(time_of_run({"ip", "-j", "-s", "link"}));
 }
 
 // ---- cards
 
-int read_cards() {
+void read_cards() {
     IFINFO records[kCards];
-    return KLIBNetGetInterfaceInfo(records, kCards, kLogicalCards);
+    // every one but the loopback
+    require_done(KLIBNetGetInterfaceInfo(records, kCards, kLogicalCards) == kCards - 1,
+                 "KLIBNetGetInterfaceInfo failed");
 }
 
-void read_file(const char *path) {
-    struct stat status;
+/** Reads a small file the way configuration files are read, if it is there. */
+void read_if_there(const std::string &path) {
     char text[65536];
-    const unique_fd file = open_file(path, O_RDONLY);
-    require(fstat(file.get(), &status) == 0 && read(file.get(), text, sizeof text) >= 0 &&
-                read(file.get(), text, sizeof text) == 0,
-            path);
+    struct stat status;
+    const unique_fd file{open(path.c_str(), O_RDONLY | O_CLOEXEC)};
+    if (file.get() >= 0) {
+        require(fstat(file.get(), &status) == 0, path);
+        while (read(file.get(), text, sizeof text) > 0) {
+        }
+    }
 }
 
-/** What is asked about the machine before its interfaces: VLAN support, and the cluster's state. */
-void ask_about_machine() {
-    const int modules = open("/proc/modules", O_RDONLY | O_CLOEXEC);
-    close(modules);
-    for (const char *path : {"/sys/module/8021q", "/proc/net/vlan/config"}) {
-        (void)!access(path, F_OK);
+bool has_vlans() {
+    if (access("/sys/module/8021q", F_OK) == 0) {
+        return true;
     }
-    read_file("/etc/kova/platform.conf");
+    utsname system;
+    require(uname(&system) == 0, "uname");
+    read_if_there("/proc/modules");
+    read_if_there(std::string("/lib/modules/") + system.release + "/modules.builtin");
+    return access("/proc/net/vlan/config", F_OK) == 0;
 }
 
 /** A name with the paths that tell whether its interface belongs to a bridge or a virtual switch. */
@@ -76,10 +84,16 @@ struct card {
     std::string switch_port = "/sys/devices/virtual/net/ovs_" + name;
 };
 
-void ask_about_card(int socket, const card &one) {
+void ask_about_card(int socket, const card &one, bool vlans) {
     ifreq request = {};
     memcpy(request.ifr_name, one.name.c_str(), one.name.size() + 1);
     require(ioctl(socket, SIOCGIFFLAGS, &request) == 0, "flags");
+    if (vlans) {
+        vlan_ioctl_args below = {};
+        below.cmd = GET_VLAN_REALDEV_NAME_CMD;
+        memcpy(below.device1, one.name.c_str(), one.name.size() + 1);
+        require_done(ioctl(socket, SIOCGIFVLAN, &below) < 0, "an interface is a VLAN");
+    }
     if ((request.ifr_flags & IFF_LOOPBACK) != 0) {
         return;
     }
@@ -93,11 +107,12 @@ void ask_about_card(int socket, const card &one) {
 
 /** The requests of the enumeration, with names and paths ready made and the answers thrown away. */
 void ask_about_cards(const std::vector<card> &cards) {
-    ask_about_machine();
+    const bool vlans = has_vlans();
+    read_if_there("/etc/kova/platform.conf"); // whether there is a cluster
     read_whole(kCounters);
     const unique_fd requests{socket(AF_INET, SOCK_DGRAM | SOCK_CLOEXEC, 0)};
     for (const card &one : cards) {
-        ask_about_card(requests.get(), one);
+        ask_about_card(requests.get(), one, vlans);
     }
 }
 
@@ -112,21 +127,14 @@ std::vector<card> all_cards() {
     return cards;
 }
 
-sides cards_against(std::function<void(void)> theirs, const std::shared_ptr<interfaces> &world) {
-    // every one but the loopback
-    return {timed([world] { require_done(read_cards() == kCards - 1, "KLIBNetGetInterfaceInfo failed"); }),
-            timed(std::move(theirs))};
-}
-
 sides cards_against_floor() {
     const auto world = std::make_shared<interfaces>(kCards, interfaces::state::addressed);
-    return cards_against([cards = all_cards()] { ask_about_cards(cards); }, world);
+    return {timed([world] { read_cards(); }), timed([cards = all_cards()] { ask_about_cards(cards); })};
 }
 
 sides cards_against_ip() {
     const auto world = std::make_shared<interfaces>(kCards, interfaces::state::addressed);
-    const auto ip = std::make_shared<silent_program>(std::vector<std::string>{"ip", "-j", "addr"});
-    return cards_against([ip] { ip->run(); }, world);
+    return {timed([world] { read_cards(); }), time_of_run({"ip", "-j", "addr"})};
 }
 
 } // namespace

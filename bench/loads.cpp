@@ -5,8 +5,6 @@
 #include <dlfcn.h>
 #include <filesystem>
 #include <kovanetsdk/addr.h>
-#include <link.h>
-#include <memory>
 
 namespace kova {
 
@@ -16,13 +14,8 @@ std::string program_beside(const char *name) {
     return std::filesystem::read_symlink("/proc/self/exe").parent_path() / name;
 }
 
-measure start_of(const char *name) {
-    const auto program = std::make_shared<silent_program>(std::vector{program_beside(name)});
-    return timed([program] { program->run(); });
-}
-
 sides linked_against_plain() {
-    return {start_of("kova-bench-linked"), start_of("kova-bench-plain")};
+    return {time_of_run({program_beside("kova-bench-linked")}), time_of_run({program_beside("kova-bench-plain")})};
 }
 
 /** The library as this process runs it. */

@@ -78,11 +78,12 @@ void hold(benchmark::State &state, const contest &held) {
     state.counters[kRatio] = median(ours) / median(theirs);
 }
 
-void enter(const contest &entered, bool quick) {
-    const auto body = [&entered](benchmark::State &state) {
+void enter(const contest &entered, bool quick, table_reporter &reporter) {
+    const auto body = [&entered, &reporter](benchmark::State &state) {
         try {
             hold(state, entered);
         } catch (const std::exception &error) {
+            reporter.note_failure(entered, error.what());
             state.SkipWithError(error.what());
         }
     };
@@ -124,15 +125,18 @@ void write_json(const bench_options &options, const table_reporter &reporter) {
 
 int measure_all(const bench_options &options, const contests &all) {
     set_disk(options.disk);
+    table_reporter reporter{all};
     for (const contest &one : all) {
         const auto asked = std::find(options.rows.begin(), options.rows.end(), one.row);
         if (options.rows.empty() || asked != options.rows.end()) {
-            enter(one, options.quick);
+            enter(one, options.quick, reporter);
         }
     }
-    table_reporter reporter{all};
     benchmark::RunSpecifiedBenchmarks(&reporter);
     reporter.print_sum();
+    if (options.quick) {
+        puts("Measured in two rounds: everything can be measured, the ratios mean nothing");
+    }
     if (!options.json_file.empty()) {
         write_json(options, reporter);
     }

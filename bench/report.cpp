@@ -77,9 +77,9 @@ void table_reporter::ReportRuns(const std::vector<Run> &runs) {
         printf("%s: %s\n", held->row.c_str(), held->ours.c_str());
         last_row_ = held->row;
     }
-    if (runs[0].error_occurred) {
-        ++failures_;
-        printf("  %-42s failed: %s\n", held->theirs.c_str(), runs[0].error_message.c_str());
+    const auto failure = failures_.find(held->name());
+    if (failure != failures_.end()) {
+        printf("  %-42s failed: %s\n", held->theirs.c_str(), failure->second.c_str());
     } else {
         records_.push_back(record_of(*held, runs));
         print_line(records_.back());
@@ -92,7 +92,7 @@ void table_reporter::print_sum() const {
         return std::count_if(records_.begin(), records_.end(),
                              [met](const json &record) { return record["met"] == met; });
     };
-    printf("%td goals met, %td missed, %d failed\n", with(true), with(false), failures_);
+    printf("%td goals met, %td missed, %zu failed\n", with(true), with(false), failures_.size());
 }
 
 } // namespace kova

@@ -7,6 +7,7 @@
 #include "contest.h"
 
 #include <benchmark/benchmark.h>
+#include <map>
 #include <nlohmann/json.hpp>
 
 namespace kova {
@@ -28,17 +29,19 @@ public:
     bool ReportContext(const Context &context) override;
     void ReportRuns(const std::vector<Run> &runs) override;
 
+    /** Remembers that a contest could not be held to its end. */
+    void note_failure(const contest &held, const char *reason) { failures_[held.name()] = reason; }
     /** Says how many goals were met. */
     void print_sum() const;
     /** One record per contest; docs/bench.md names the fields. */
     [[nodiscard]] const nlohmann::ordered_json &records() const { return records_; }
-    [[nodiscard]] bool has_failures() const { return failures_ > 0; }
+    [[nodiscard]] bool has_failures() const { return !failures_.empty(); }
 
 private:
     const contests &all_;
     std::string last_row_;
     nlohmann::ordered_json records_ = nlohmann::ordered_json::array();
-    int failures_ = 0;
+    std::map<std::string, std::string> failures_; ///< reasons by name of the contest
 };
 
 } // namespace kova

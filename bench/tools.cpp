@@ -10,20 +10,15 @@ namespace {
 
 constexpr int kMany = 1000;
 
-measure run_of(std::vector<std::string> arguments) {
-    const auto program = std::make_shared<silent_program>(std::move(arguments));
-    return timed([program] { program->run(); });
-}
-
 sides list_against_ip() {
     run_program({"kovanet", "card", "set", "eth0", "static", "192.168.50.10/24"}, "");
-    return {run_of({"kovanet", "card", "list"}), run_of({"ip", "-br", "addr"})};
+    return {time_of_run({"kovanet", "card", "list"}), time_of_run({"ip", "-br", "addr"})};
 }
 
 sides stats_against_ip() {
     const auto world = std::make_shared<interfaces>(kMany, interfaces::state::down);
-    const measure ours = run_of({"kovanet", "stats"});
-    return {[world, ours] { return ours(); }, run_of({"ip", "-s", "link"})};
+    const measure ours = time_of_run({"kovanet", "stats"});
+    return {[world, ours] { return ours(); }, time_of_run({"ip", "-s", "link"})};
 }
 
 } // namespace

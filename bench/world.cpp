@@ -3,6 +3,7 @@
 #include <cstdlib>
 #include <fcntl.h>
 #include <filesystem>
+#include <memory>
 #include <sstream>
 #include <stdexcept>
 #include <sys/wait.h>
@@ -103,6 +104,11 @@ void silent_program::run() const {
     int status;
     require(waitpid(pid, &status, 0) == pid, "cannot wait for " + arguments_[0]);
     require_done(status == 0, (arguments_[0] + " failed").c_str());
+}
+
+measure time_of_run(std::vector<std::string> arguments) {
+    const auto program = std::make_shared<silent_program>(std::move(arguments));
+    return timed([program] { program->run(); });
 }
 
 } // namespace kova

@@ -4,6 +4,8 @@
  */
 #pragma once
 
+#include "contest.h"
+
 #include <box/system.h>
 #include <spawn.h>
 #include <string>
@@ -59,5 +61,8 @@ private:
     std::vector<std::string> arguments_;
     posix_spawn_file_actions_t actions_;
 };
+
+/** What a run of a program takes. */
+measure time_of_run(std::vector<std::string> arguments);
 
 } // namespace kova
