@@ -83,6 +83,8 @@ FAILING(int, KLIBCModuleIsLoad, (const char *module), (module), -1, 0x900)
 FAILING(int, KLIBCFileEnumDir, (const char *dir, KLIBSZLIST *list, const char *prefix, int flags),
         (dir, list, prefix, flags), -1, 0x900)
 FAILING(int, KLIBCFileReadLines, (const char *path, KLIBSZLIST *list), (path, list), -1, 0x900)
+FAILING(int, KLIBCFileITmpName, (const char *target, char *tmp, int cb), (target, tmp, cb), -1, 0xD00)
+FAILING(int, KLIBPluginHasInit, (uint64_t handle), (handle), 0, 0)
 
 // ---- containers
 
@@ -301,7 +303,7 @@ extern "C" int KLIBPluginSDKInit(const char *component, const char *event, uint6
     }
     const int result = next(component, event, handle);
     if (result >= 0) {
-        EXPECT_EQ("net", std::string(component));
+        EXPECT_EQ(std::string(event) == "service" ? "service" : "net", std::string(component));
         events[*handle] = {event, ""};
         count("event handles", 1);
     }
@@ -412,6 +414,53 @@ extern "C" int socket(int domain, int type, int protocol) noexcept {
         return -1;
     }
     return next(domain, type, protocol);
+}
+
+extern "C" int gethostname(char *name, size_t size) noexcept {
+    static const auto next = real<int (*)(char *, size_t)>("gethostname");
+    if (is_observing() && current_rig->on_gethostname) {
+        return current_rig->on_gethostname(name, size);
+    }
+    return next(name, size);
+}
+
+extern "C" int sethostname(const char *name, size_t size) noexcept {
+    static const auto next = real<int (*)(const char *, size_t)>("sethostname");
+    if (is_failing("sethostname", 0)) {
+        errno = EPERM;
+        return -1;
+    }
+    return next(name, size);
+}
+
+// ---- files
+
+extern "C" int fsync(int fd) {
+    static const auto next = real<int (*)(int)>("fsync");
+    if (is_failing("fsync", 0)) {
+        errno = EIO;
+        return -1;
+    }
+    return next(fd);
+}
+
+extern "C" int fclose(FILE *file) {
+    static const auto next = real<int (*)(FILE *)>("fclose");
+    const bool fails = is_failing("fclose", 0);
+    const int result = next(file);
+    if (fails) {
+        errno = EIO;
+    }
+    return fails ? EOF : result;
+}
+
+extern "C" int rename(const char *from, const char *to) noexcept {
+    static const auto next = real<int (*)(const char *, const char *)>("rename");
+    if (is_failing("rename", 0)) {
+        errno = EBUSY;
+        return -1;
+    }
+    return next(from, to);
 }
 
 // ---- paths

@@ -156,6 +156,10 @@ void test_rig::answer_ioctl(ioctl_answer answer) {
     on_ioctl = std::move(answer);
 }
 
+void test_rig::answer_gethostname(std::function<int(char *, size_t)> answer) {
+    on_gethostname = std::move(answer);
+}
+
 void test_rig::redirect(const std::string &path, const std::string &other) {
     redirects_[path] = other;
 }

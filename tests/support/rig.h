@@ -68,7 +68,8 @@ public:
 
     // ---- failures
 
-    /** Makes the nth next call of a platform operation, or of malloc, calloc, realloc, fopen, open, socket, fail. */
+    /** Makes the nth next call of a platform operation, or of malloc, calloc, realloc, fopen, open, socket, fsync,
+     * fclose, rename, sethostname, fail. */
     void fail(const std::string &operation, int nth = 1);
     /** The same, and every call after it. */
     void fail_from(const std::string &operation, int nth = 1);
@@ -77,6 +78,8 @@ public:
 
     /** Answers ioctl requests; nothing lets the kernel answer. */
     void answer_ioctl(ioctl_answer answer);
+    /** Stands in for gethostname. */
+    void answer_gethostname(std::function<int(char *name, size_t size)> answer);
     /** Opens, accesses and lists another path wherever this one, or something below it, is meant. */
     void redirect(const std::string &path, const std::string &other);
     /** The same with a file that holds this content. */
@@ -96,6 +99,7 @@ public:
     outcome now;
     bool is_observing = false;
     ioctl_answer on_ioctl;
+    std::function<int(char *, size_t)> on_gethostname;
     std::function<void(long)> during_sleep;
     std::map<std::string, int> held; ///< containers, handles and streams that are open, by kind
     long slept_ms = 0;               ///< the clocks are ahead by what was slept
