@@ -4,6 +4,7 @@
 #include "rules.h"
 #include "table.h"
 
+#include <kova/core.h>
 #include <kovanetsdk/hostname.h>
 
 namespace kova {
@@ -34,6 +35,15 @@ void show(bool as_json) {
     }
 }
 
+/** Only the reload of the logger fails without a code. */
+[[noreturn]] void set_failed() {
+    if (KLIBCErrGet() == 0) {
+        throw failure{kCallFailed, "the host name is set, but nobody was told: the system logger could not be "
+                                   "reloaded; see what /sbin/initctl reload syslog-ng says"};
+    }
+    call_failed("cannot set the host name everywhere");
+}
+
 void set(const std::string &name) {
     require_root();
     require("host name \"" + name + "\"", refuse_new_hostname(name));
@@ -41,7 +51,7 @@ void set(const std::string &name) {
         const step_note note{"setting the host name"};
         clear_error();
         if (KOVALnxSetHostname(name.c_str()) < 0) {
-            call_failed("cannot set the host name");
+            set_failed();
         }
     }
     const std::string now = current_name().value_or("");

@@ -5,6 +5,7 @@
 
 #include <algorithm>
 #include <iterator>
+#include <kova/core.h>
 #include <kovanetsdk/events.h>
 
 namespace kova {
@@ -17,27 +18,38 @@ constexpr struct {
     {"ip", KLIB_SERVICE_IP_CHANGE}, {"hostname", KLIB_SERVICE_HOSTNAME_CHANGE}, {"mtu", KLIB_SERVICE_MTU_CHANGE}};
 
 struct service_words {
-    std::vector<std::string> changes;
+    std::string changes;
     std::string keyword;
     int action = 0;
 };
 
-uint32_t bit_of(const std::string &name) {
-    const auto *found = std::find_if(std::begin(kChanges), std::end(kChanges),
-                                     [&name](const auto &change) { return name == change.name; });
-    return found->bit;
+/** The bits of names with commas between them; nothing when one is not known. */
+std::optional<uint32_t> flags_of(const std::string &changes) {
+    uint32_t flags = 0;
+    for (const std::string &name : CLI::detail::split(changes, ',')) {
+        const auto *found = std::find_if(std::begin(kChanges), std::end(kChanges),
+                                         [&name](const auto &change) { return name == change.name; });
+        if (found == std::end(kChanges)) {
+            return std::nullopt;
+        }
+        flags |= found->bit;
+    }
+    return flags;
+}
+
+std::string complaint_about(const std::string &changes) {
+    return flags_of(changes) ? "" : "\"" + changes + "\" is not ip, hostname, mtu, or several with commas between them";
 }
 
 void notify(const service_words &words) {
     require_root();
-    uint32_t flags = 0;
-    for (const std::string &name : words.changes) {
-        flags |= bit_of(name);
-    }
     const step_note note{"telling the services"};
     clear_error();
-    if (KLIBServicePlugin(words.action, flags) < 0) {
+    if (KLIBServicePlugin(words.action, flags_of(words.changes).value_or(0)) < 0) {
         call_failed("cannot tell the services");
+    }
+    if (KLIBCErrGet() != 0) { // the call goes on after a plug-in that fails, and so does this one
+        call_failed("not every service followed");
     }
 }
 
@@ -48,9 +60,7 @@ void add_service(CLI::App &object, const global_options &) {
     CLI::App &tell = *object.add_subcommand("notify", "tell the services of a change, as before it and as after it");
     tell.add_option("CHANGES", words.changes, "ip, hostname, mtu, or several with commas between them")
         ->required()
-        ->expected(1)
-        ->delimiter(',')
-        ->check(CLI::IsMember({"ip", "hostname", "mtu"}));
+        ->check(complaint_about);
     auto *action_key = tell.add_option("action", words.keyword, "the word action")->check(CLI::IsMember({"action"}));
     action_key->needs(tell.add_option("NUMBER", words.action, "what they are to do, as their plug-ins understand it"));
     tell.callback([&words] { notify(words); });
