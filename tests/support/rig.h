@@ -68,8 +68,11 @@ public:
 
     // ---- failures
 
-    /** Makes the nth next call of a platform operation, or of malloc, calloc, realloc, fopen, open, socket, fsync,
-     * fclose, rename, sethostname, fail. */
+    /**
+     * Makes the nth next call of an operation fail: one of the platform, whose code is in the register then, or malloc,
+     * calloc, realloc, fopen, open, opendir, access, socket, ioctl, or one of unit/failing_calls.cpp. A name that the
+     * rig does not know fails the test.
+     */
     void fail(const std::string &operation, int nth = 1);
     /** The same, and every call after it. */
     void fail_from(const std::string &operation, int nth = 1);
@@ -95,6 +98,8 @@ public:
     int note_command(const texts &words, std::string *output);
     bool is_failing(const std::string &operation);
     std::string redirected(const char *path) const;
+    /** The path that was asked for when this one was opened. */
+    std::string asked_for(const std::string &path) const;
 
     outcome now;
     bool is_observing = false;
@@ -123,6 +128,11 @@ private:
 
 /** The rig of the test that runs; null between tests. */
 extern test_rig *current_rig;
+
+/** Takes away what a test, or the call before, left where the library writes, and lays out the empty directories. */
+void lay_out_clean_appliance();
+/** What the open descriptors of this process lead to. */
+texts open_descriptors();
 
 /** Base of the unit tests: a clean appliance before each test, and a look for anything left open after it. */
 class unit_test : public ::testing::Test {
