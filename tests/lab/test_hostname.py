@@ -1,6 +1,6 @@
 # box: --no-network
-"""The host name: kernel, files, log and plug-ins, in the box's own UTS namespace, and what a reader or a kill sees of the
-files while they are replaced."""
+"""The host name: kernel, files, log and plug-ins, in the box's own UTS namespace, and what a reader sees of the files, or
+a kill leaves of them, while they are replaced."""
 
 import concurrent.futures
 import contextlib
@@ -95,8 +95,8 @@ def plugin(tmp_path):
     script = PLUGINS / "50-test"
     script.parent.mkdir(parents=True, exist_ok=True)
     script.write_text(
-        f"#!/bin/sh\n{{ echo \"$PLUGIN_EVENT $PLUGIN_PHASE $HOSTNAME $(uname -n) $(cat {HOSTNAME})\"; cat {HOSTS}; cat; }}"
-        f" >>{notes}\n"
+        f"#!/bin/sh\nexec >>{notes}\necho $PLUGIN_EVENT $PLUGIN_PHASE $HOSTNAME $(uname -n) $(cat {HOSTNAME})\n"
+        f"cat {HOSTS} -\n"
     )
     script.chmod(0o755)
     yield notes

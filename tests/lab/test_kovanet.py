@@ -68,7 +68,8 @@ def keys(name):
 def everything():
     """The network's state, as far as a refused command could have changed it."""
     files = {path.name: path.read_text() for path in SCRIPTS.iterdir() if path.is_file()}
-    return os.uname().nodename, run("ip", "-o", "addr").stdout, run("ip", "-o", "link").stdout, run("ip", "route").stdout, files
+    shown = [run("ip", *words).stdout for words in (["-o", "addr"], ["-o", "link"], ["route"])]
+    return os.uname().nodename, shown, files
 
 
 @contextlib.contextmanager

@@ -181,7 +181,7 @@ def test_dynamic_dns_is_reloaded_once_the_address_changed(keep, notes, flags, re
 @pytest.fixture
 def relay(keep):
     """A program in the relay's place that lives until it is ended; gives the pids of those that run."""
-    keep(RELAY).write_text("#!/bin/sh\nwhile :; do sleep 0.1; done\n")
+    keep(RELAY).write_text("#!/usr/bin/python3\nimport signal\nsignal.pause()\n")
     RELAY.chmod(0o755)
     yield lambda: processes(f"{RELAY} -C ")
     for pid in processes(f"{RELAY} -C "):
@@ -226,10 +226,14 @@ def test_stop_of_one_relay_leaves_the_other(relay, bridge):
     other.wait()
 
 
-def test_a_relay_that_ignores_the_request_is_killed(relay):
-    RELAY.write_text("#!/bin/sh\ntrap '' TERM\nwhile :; do sleep 0.1; done\n")
+def test_a_relay_that_ignores_the_request_is_killed(relay, tmp_path):
+    ready = tmp_path / "ready"
+    RELAY.write_text(
+        "#!/usr/bin/python3\nimport signal\nsignal.signal(signal.SIGTERM, lambda *_: None)\n"
+        f"open('{ready}', 'w').close()\nwhile True:\n    signal.pause()\n"
+    )
     process = subprocess.Popen([RELAY, "-C", "br0", "-S", "eth0"])
-    wait_for(lambda: "sleep" in run("ps", "-o", "args", "--ppid", process.pid, status=None).stdout, what="the relay")
+    wait_for(ready.exists, what="the relay")
     assert library.KLIBServiceStopBeforeIPChange() == 0
     assert process.wait() == -signal.SIGKILL
 
