@@ -1,6 +1,7 @@
 /**
  * @file
- * Change events: what the library announces to the rest of the appliance.
+ * Change events: what the library announces to the rest of the appliance, and the event that has its services follow a
+ * change.
  *
  * Every hook opens one event of component "net" (kova/plugin.h), sets its arguments in the order given here, runs the
  * plug-ins registered for it and gives the event back, whatever happened. Phase 4 (KLIB_PLUGIN_PRE) is before a change,
@@ -9,7 +10,7 @@
  *  - else with the code that the platform left; the first step that fails ends the call. It is logged unless a call
  *    says otherwise.
  *
- * No call takes a lock. Texts may be empty and are passed through unchanged.
+ * No hook takes a lock. Texts may be empty and are passed through unchanged.
  */
 #ifndef KOVANETSDK_EVENTS_H
 #define KOVANETSDK_EVENTS_H
@@ -88,6 +89,28 @@ int KOVANetHostnameChangeHook(const char *szHostname);
  */
 int KLIBNetIFChgPluginSetArgs(uint64_t hPlugin, const char *const *rgszOrigin, int cOrigin, const char *const *rgszNew,
                               int cNew, int nResult);
+
+/** What changes or changed; several may be combined. */
+enum { KLIB_SERVICE_IP_CHANGE = 0x1, KLIB_SERVICE_HOSTNAME_CHANGE = 0x2, KLIB_SERVICE_MTU_CHANGE = 0x4 };
+
+/**
+ * Has the services follow a change: raises the event "service" of component "service", first in phase 4, in which they
+ * stop or prepare, then in phase 5, in which they take up the new state. Its arguments, all integers:
+ * SERVICE_IP_CHANGE, SERVICE_HOSTNAME_CHANGE, SERVICE_MTU_CHANGE (1 or 0), SERVICE_DAEMON_ACTION, RESULT (0). Both
+ * phases run, and the call succeeds, also when a plug-in fails; that is logged for each phase. Holds the lock
+ * 0x1000006, so that dispatches do not mix.
+ * @param nDaemonAction  what the services are to do, passed through to the plug-ins
+ * @param nChangeFlags   KLIB_SERVICE_... bits; others are not looked at
+ * @return 0; -1, logged, with NET_ERR_LOCK, or with the platform's code when the event cannot be opened
+ */
+int KLIBServicePlugin(int nDaemonAction, uint32_t nChangeFlags);
+
+/**
+ * Stops what must be down before an address changes: the job "pppoerelay" ("/sbin/stop pppoerelay"), the PPPoE relays.
+ * Takes no lock, logs nothing.
+ * @return 0, also when it does not run; -1 with the platform's code
+ */
+int KLIBServiceStopBeforeIPChange(void);
 
 #ifdef __cplusplus
 }

@@ -10,6 +10,7 @@
 #include <kovanetsdk/core.h>
 #include <kovanetsdk/dhcp.h>
 #include <kovanetsdk/events.h>
+#include <kovanetsdk/hostname.h>
 #include <kovanetsdk/iface.h>
 #include <kovanetsdk/ipv6.h>
 #include <kovanetsdk/link.h>

@@ -68,7 +68,8 @@ def keys(name):
 def everything():
     """The network's state, as far as a refused command could have changed it."""
     files = {path.name: path.read_text() for path in SCRIPTS.iterdir() if path.is_file()}
-    return run("ip", "-o", "addr").stdout, run("ip", "-o", "link").stdout, run("ip", "route").stdout, files
+    shown = [run("ip", *words).stdout for words in (["-o", "addr"], ["-o", "link"], ["route"])]
+    return os.uname().nodename, shown, files
 
 
 @contextlib.contextmanager
@@ -186,7 +187,8 @@ def test_card_set_dhcp_and_back(stopped_clients, tmp_path):
     with DhcpServer("lan0", "10.9.0", folder=tmp_path):
         kovanet("card", "set", "lan0", "dhcp")
         assert keys("lan0")["BOOTPROTO"] == "dhcp"
-        card = wait_for(lambda: (seen := data("card", "show", "lan0"))["configured_address"] and seen, what="the lease")
+        # the address comes last
+        card = wait_for(lambda: (seen := data("card", "show", "lan0"))["address"] and seen, what="the lease")
         assert card["source"] == "dhcp"
         assert re.fullmatch(r"10\.9\.0\.(1[0-9]|20)", card["address"])
         assert (card["configured_address"], card["prefix"]) == (card["address"], 24)
@@ -483,6 +485,8 @@ BAD = {
     "addr flush lan0": USAGE, "addr flush lan0 5": USAGE, "stats --count 2": USAGE, "stats --watch 0": USAGE,
     "stats --watch --count 0": USAGE, "stats --watch --count -1": USAGE, "stats --watch eth0": USAGE,
     "block set lan0 ha": USAGE, "block set lan0 ha yes": USAGE, "block set lan0 other on": USAGE, "check": USAGE,
+    "hostname": USAGE, "hostname set": USAGE, "hostname show more": USAGE, "hostname set a b": USAGE,
+    "service": USAGE, "service notify": USAGE, "service notify other": USAGE, "service notify ip action": USAGE,
     "check address": USAGE, "check address 10.0.0.1 mask": USAGE, "card list --bogus": USAGE, "--bogus": USAGE,
     # values that are not acceptable
     "card set lan0 static 10.9.0.256/24": NO, "card set lan0 static 127.0.0.1/8": NO,
@@ -495,7 +499,7 @@ BAD = {
     "addr add lan0 10.9.0.9/33": NO, "addr add lan0 10.9.0.9/0": NO, "addr add lan0 300.1.1.1/24": NO,
     "addr add lan0 fe80::1": NO, "addr add lan0 fe80::1/129": NO, "addr add lan0 fe80:::1/64": NO,
     "addr del lan0 10.9.0.9": NO, "addr list a/b": NO, "stats a/b": NO, "block show a/b": NO,
-    "block set ../lan0 ha on": NO,
+    "block set ../lan0 ha on": NO, "hostname set a/b": NO, "hostname set .a": NO,
     # what is not there
     "card show nope": NOT_FOUND, "card show lo": NOT_FOUND, "card set nope dhcp": NOT_FOUND,
     "card set nope static 10.9.0.9/24": NOT_FOUND, "card set lo dhcp": NOT_FOUND, "link show nope": NOT_FOUND,
@@ -532,7 +536,8 @@ def test_a_mistyped_word_gets_a_suggestion():
 
 @pytest.mark.parametrize("words", ["card set lan0 dhcp", "card set lan0 static 10.9.0.9/24", "link up lan0",
                                    "link down lan0", "link rename lan0 lan1", "addr add lan0 10.9.0.9/24",
-                                   "addr del lan0 10.9.0.9/24", "addr flush lan0 4", "block set lan0 ha on"])  # fmt: skip
+                                   "addr del lan0 10.9.0.9/24", "addr flush lan0 4", "block set lan0 ha on",
+                                   "hostname set other", "service notify ip"])  # fmt: skip
 def test_changes_need_root(words):
     before = everything()
     done = run("unshare", "--user", KOVANET, *words.split(), status=NO_PERMISSION)
@@ -541,14 +546,15 @@ def test_changes_need_root(words):
 
 
 def test_reading_needs_no_root(addressed):
-    for words in (["card", "list", "--json"], ["link", "show", "--json"], ["addr", "list", "--json"]):
+    for words in (["card", "list", "--json"], ["link", "show", "--json"], ["addr", "list", "--json"],
+                  ["hostname", "show", "--json"]):
         assert run("unshare", "--user", KOVANET, *words).stdout == kovanet(*words).stdout
 
 
 @pytest.mark.parametrize("command,section", [
     ("card list", "kovanet card list"), ("card show lan0", "kovanet card list"), ("link show", "kovanet link show"),
     ("addr list", "kovanet addr list"), ("stats", "kovanet stats"), ("block show lan0", "kovanet block show"),
-    ("check hostname nas01", "kovanet check"),
+    ("hostname show", "kovanet hostname show"), ("check hostname nas01", "kovanet check"),
 ])  # fmt: skip
 def test_json_has_exactly_the_documented_fields(addressed, command, section):
     printed = data(*command.split())
@@ -627,6 +633,7 @@ def test_the_name_of_an_interface_cannot_write_to_the_terminal():
 
 COMMANDS = ["", "card", "card list", "card show", "card set", "link", "link show", "link up", "link down", "link rename",
             "addr", "addr list", "addr add", "addr del", "addr flush", "stats", "block", "block show", "block set",
+            "hostname", "hostname show", "hostname set", "service", "service notify",
             "check", "check address", "check mask", "check prefix", "check ipv6", "check hostname", "check domain"]  # fmt: skip
 
 
@@ -641,7 +648,7 @@ def test_help_has_examples_and_exit_codes(words):
 
 def test_the_examples_of_the_help_are_understood():
     """Every example that only reads works as it stands."""
-    for name in ("card", "link", "addr", "check"):
+    for name in ("card", "link", "addr", "hostname", "check"):
         examples = re.findall(r"^  kovanet (.+)$", kovanet(name, "--help").stdout, re.MULTILINE)
         assert examples
         for example in examples:

@@ -102,6 +102,8 @@ int fake_kernel::answer_about(fake_interface &device, unsigned long request, ifr
     case SIOCSIFFLAGS:
         device.flags = static_cast<unsigned short>(record.ifr_flags);
         return 0;
+    case SIOCSIFNAME:
+        return 0;
     case SIOCGIFADDR:
         return put_address(device.ip, record.ifr_addr);
     case SIOCGIFNETMASK:

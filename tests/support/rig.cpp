@@ -1,4 +1,4 @@
-#include "support/rig.h"
+#include "support/fault_points.h"
 
 #include <algorithm>
 #include <csignal>
@@ -49,20 +49,6 @@ std::string join(const texts &words) {
 
 bool begins_with_words(const std::string &line, const std::string &beginning) {
     return line.rfind(beginning, 0) == 0 && (line.size() == beginning.size() || line[beginning.size()] == ' ');
-}
-
-texts open_descriptors() {
-    texts found;
-    for (const auto &entry : fs::directory_iterator("/proc/self/fd")) {
-        std::error_code gone;
-        const std::string target = fs::read_symlink(entry.path(), gone).string();
-        if (!gone) { // the iterator's own is gone by now
-            found.push_back(target);
-        }
-    }
-    std::erase_if(found, [](const std::string &target) { return target.rfind("/proc/", 0) == 0; });
-    std::sort(found.begin(), found.end());
-    return found;
 }
 
 /** Where what begins at a position and consists of such characters ends. */
@@ -145,15 +131,21 @@ void test_rig::let_run(const std::string &command) {
 }
 
 void test_rig::fail(const std::string &operation, int nth) {
+    EXPECT_TRUE(fault_operations().count(operation)) << operation << " is nothing that the rig can make fail";
     failures_[operation] = {nth - 1, false};
 }
 
 void test_rig::fail_from(const std::string &operation, int nth) {
-    failures_[operation] = {nth - 1, true};
+    fail(operation, nth);
+    failures_[operation].stays = true;
 }
 
 void test_rig::answer_ioctl(ioctl_answer answer) {
     on_ioctl = std::move(answer);
+}
+
+void test_rig::answer_gethostname(std::function<int(char *, size_t)> answer) {
+    on_gethostname = std::move(answer);
 }
 
 void test_rig::redirect(const std::string &path, const std::string &other) {
@@ -235,7 +227,30 @@ std::string test_rig::redirected(const char *path) const {
     return asked;
 }
 
-void unit_test::SetUp() {
+std::string test_rig::asked_for(const std::string &path) const {
+    for (const auto &[from, to] : redirects_) {
+        if (to == path) {
+            return from;
+        }
+    }
+    return path;
+}
+
+texts open_descriptors() {
+    texts found;
+    for (const auto &entry : fs::directory_iterator("/proc/self/fd")) {
+        std::error_code gone;
+        const std::string target = fs::read_symlink(entry.path(), gone).string();
+        if (!gone) { // the iterator's own is gone by now
+            found.push_back(target);
+        }
+    }
+    std::erase_if(found, [](const std::string &target) { return target.rfind("/proc/", 0) == 0; });
+    std::sort(found.begin(), found.end());
+    return found;
+}
+
+void lay_out_clean_appliance() {
     for (const char *path : {"/etc/sysconfig", "/etc.defaults", "/etc/kova", "/etc/kovainfo.conf", "/etc/dhclient",
                              "/etc/ppp", "/run/ddns", "/run/lock/kova", "/usr/kova", "/etc/dhcpd"}) {
         fs::remove_all(path);
@@ -244,6 +259,10 @@ void unit_test::SetUp() {
                              "/etc/ppp", "/run/ddns"}) {
         fs::create_directories(path);
     }
+}
+
+void unit_test::SetUp() {
+    lay_out_clean_appliance();
     descriptors_ = open_descriptors();
     current_rig = &rig;
 }

@@ -68,7 +68,11 @@ public:
 
     // ---- failures
 
-    /** Makes the nth next call of a platform operation, or of malloc, calloc, realloc, fopen, open, socket, fail. */
+    /**
+     * Makes the nth next call of an operation fail: one of the platform, whose code is in the register then, or malloc,
+     * calloc, realloc, fopen, open, opendir, access, socket, ioctl, or one of unit/failing_calls.cpp. A name that the
+     * rig does not know fails the test.
+     */
     void fail(const std::string &operation, int nth = 1);
     /** The same, and every call after it. */
     void fail_from(const std::string &operation, int nth = 1);
@@ -77,6 +81,8 @@ public:
 
     /** Answers ioctl requests; nothing lets the kernel answer. */
     void answer_ioctl(ioctl_answer answer);
+    /** Stands in for gethostname. */
+    void answer_gethostname(std::function<int(char *name, size_t size)> answer);
     /** Opens, accesses and lists another path wherever this one, or something below it, is meant. */
     void redirect(const std::string &path, const std::string &other);
     /** The same with a file that holds this content. */
@@ -92,10 +98,13 @@ public:
     int note_command(const texts &words, std::string *output);
     bool is_failing(const std::string &operation);
     std::string redirected(const char *path) const;
+    /** The path that was asked for when this one was opened. */
+    std::string asked_for(const std::string &path) const;
 
     outcome now;
     bool is_observing = false;
     ioctl_answer on_ioctl;
+    std::function<int(char *, size_t)> on_gethostname;
     std::function<void(long)> during_sleep;
     std::map<std::string, int> held; ///< containers, handles and streams that are open, by kind
     long slept_ms = 0;               ///< the clocks are ahead by what was slept
@@ -119,6 +128,11 @@ private:
 
 /** The rig of the test that runs; null between tests. */
 extern test_rig *current_rig;
+
+/** Takes away what a test, or the call before, left where the library writes, and lays out the empty directories. */
+void lay_out_clean_appliance();
+/** What the open descriptors of this process lead to. */
+texts open_descriptors();
 
 /** Base of the unit tests: a clean appliance before each test, and a look for anything left open after it. */
 class unit_test : public ::testing::Test {

@@ -49,6 +49,12 @@ constexpr object kObjects[] = {
     {"block", "reasons that keep an interface from changes", add_block,
      "  kovanet block show eth0\n"
      "  kovanet block set eth0 ha on"},
+    {"hostname", "the name of the appliance", add_hostname,
+     "  kovanet hostname show\n"
+     "  kovanet hostname set nas01"},
+    {"service", "what the services are told", add_service,
+     "  kovanet service notify ip\n"
+     "  kovanet service notify ip,mtu action 1"},
     {"check", "whether a value is valid", add_check,
      "  kovanet check address 192.168.1.10 mask 255.255.255.0\n"
      "  kovanet check prefix 192.168.1.0/24\n"

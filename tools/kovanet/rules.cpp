@@ -127,6 +127,20 @@ refusal refuse_hostname(const std::string &name) {
     return "a host name holds only letters, digits, \"-\" and \"_\"";
 }
 
+refusal refuse_new_hostname(const std::string &name) {
+    const auto is_part = [](unsigned char c) { return isalnum(c) != 0 || c == '-' || c == '_' || c == '.'; };
+    if (name.empty() || name.size() > 63) {
+        return "a host name has 1 to 63 characters";
+    }
+    if (!std::all_of(name.begin(), name.end(), is_part)) {
+        return "a host name holds only letters, digits, \"-\", \"_\" and \".\"";
+    }
+    if (name[0] == '-' || name[0] == '.') {
+        return "a host name begins with a letter, a digit or \"_\"";
+    }
+    return std::nullopt;
+}
+
 refusal refuse_domain(const std::string &name) {
     if (BlKLIBIsDomain(name.c_str()) == 1) {
         return std::nullopt;

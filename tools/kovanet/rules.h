@@ -21,6 +21,8 @@ refusal refuse_prefix(const std::string &prefix);
 /** With or without "/LENGTH". */
 refusal refuse_ipv6(const std::string &address);
 refusal refuse_hostname(const std::string &name);
+/** What may be set as the host name, which also has longer names, and with a domain. */
+refusal refuse_new_hostname(const std::string &name);
 refusal refuse_domain(const std::string &name);
 refusal refuse_interface_name(const std::string &name);
 

@@ -1,0 +1,59 @@
+/**
+ * @file
+ * Calls of the C library that a unit test can make fail: those that bring a file to its place, and the host name.
+ */
+#include "support/fault_points.h"
+
+#include <cstdio>
+#include <dlfcn.h>
+#include <unistd.h>
+
+using kova_test::can_fail;
+using kova_test::current_rig;
+
+namespace {
+
+bool is_failing(const char *operation) {
+    return current_rig != nullptr && current_rig->is_failing(operation);
+}
+
+/** The definition that this one stands before. */
+template<typename Function> Function *real(const char *name) {
+    return reinterpret_cast<Function *>(dlsym(RTLD_NEXT, name));
+}
+
+int failure(int error) {
+    errno = error;
+    return -1;
+}
+
+const bool known[] = {can_fail("fsync"), can_fail("fclose"), can_fail("rename"), can_fail("sethostname")};
+
+} // namespace
+
+extern "C" int fsync(int fd) {
+    return is_failing("fsync") ? failure(EIO) : real<int(int)>("fsync")(fd);
+}
+
+/** The stream is closed all the same. */
+extern "C" int fclose(FILE *stream) {
+    static const auto next = real<int(FILE *)>("fclose");
+    const bool fails = is_failing("fclose");
+    const int result = next(stream);
+    return fails ? failure(EIO) : result;
+}
+
+extern "C" int rename(const char *from, const char *to) noexcept {
+    return is_failing("rename") ? failure(EBUSY) : real<int(const char *, const char *)>("rename")(from, to);
+}
+
+extern "C" int sethostname(const char *name, size_t size) noexcept {
+    return is_failing("sethostname") ? failure(EPERM) : real<int(const char *, size_t)>("sethostname")(name, size);
+}
+
+extern "C" int gethostname(char *name, size_t size) noexcept {
+    if (current_rig != nullptr && current_rig->is_observing && current_rig->on_gethostname) {
+        return current_rig->on_gethostname(name, size);
+    }
+    return real<int(char *, size_t)>("gethostname")(name, size);
+}
