@@ -117,7 +117,10 @@ int KLIBCINFORemoveKey(const char *szKey);
 int KLIBCFileExist(const char *szPath);
 /** @return 1 when the path is an existing directory (links followed), else 0 */
 int KLIBCFileCheckDir(const char *szPath);
-/** Creates an empty file (0644) when nothing is there. @return 0; -1 with 0xD00 or 0x900 */
+/**
+ * Creates an empty file (0644) when nothing is there; locks and files touched as KLIBCFileSetKeyValue.
+ * @return 0; -1 as KLIBCFileSetKeyValue, also (0x900) when the path is a directory
+ */
 int KLIBCFileTouch(const char *szPath);
 
 /**
@@ -320,7 +323,8 @@ int KLIBCSupportDualhead(void);
 
 /**
  * Ciphers a buffer with the machine's key (/etc/kova/secret.key, made at first use, 0600). Its own inverse; keeps the
- * length, makes no zero byte from a text and no other from a zero, pads the rest of the output with zeros.
+ * length, makes no zero byte from a text and no other from a zero, pads the rest of the output with zeros. The key is
+ * made under the locks of KLIBCFileSetKeyValue.
  * @param cbIn   0 or more
  * @param cbOut  at least cbIn; pOut may be pIn
  * @return 0; -1 with 0xD00, 0x900 (no key) or 0xB00 (the key cannot be stored)
