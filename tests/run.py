@@ -3,7 +3,7 @@
 
 usage: ./test [--list] [NAME...]
 
-A NAME is a ring (unit, platform, sanitize, valgrind, lab, gates), a test file (test_jobs, test_abi) or a source
+A NAME is a ring (unit, platform, crash, sanitize, valgrind, lab, gates), a test file (test_jobs, test_abi) or a source
 unit (net_set_ip); without a name everything runs. The last line counts the test cases.
 """
 import argparse
@@ -22,14 +22,18 @@ BUILD = ROOT / "build"
 BOX = BUILD / "lab" / "kova-box"
 PYTHON = "/usr/bin/python3"
 UNIT_PROGRAMS = {"unit": "tests/kovanet-unit-tests", "platform": "tests/platform/kova-platform-tests"}
-SLOWEST = 900  # seconds for one step
+PROGRAMS = {**UNIT_PROGRAMS, "crash": "tests/crash/kova-crash-tests"}
+SLOWEST = 1800  # seconds for one step, on a machine that has much else to do
 
 
 class Step:
-    """One test program in one box (or on the host), whose results come as a JUnit file."""
+    """
+    One test program in one box (or on the host), whose results come as a JUnit file. Lines of its output that begin
+    with the text "shown" are measurements, to be seen also when all is well.
+    """
 
-    def __init__(self, ring, name, command, report, environment=None):
-        self.ring, self.name, self.command, self.report = ring, name, command, report
+    def __init__(self, ring, name, command, report, environment=None, shown=None):
+        self.ring, self.name, self.command, self.report, self.shown = ring, name, command, report, shown
         self.environment = {**os.environ, **(environment or {})}
 
     def run(self):
@@ -75,13 +79,14 @@ def boxed(out, options, command):
     return [str(BOX), "--share", str(out), *options, "--", *command]
 
 
-def gtest_step(out, ring, kind, build, unit=None, wrapper=(), without=()):
-    program = build / UNIT_PROGRAMS[kind]
+def gtest_step(out, ring, kind, build, unit=None, wrapper=(), without=(), shown=None):
+    program = build / PROGRAMS[kind]
     report = out / f"{ring}-{kind}-{unit or 'all'}.xml"
     chosen = f"{unit}.*" if unit else "*"
     command = [*wrapper, str(program), f"--gtest_output=xml:{report}", "--gtest_brief=1",
                f"--gtest_filter={chosen}{'-' + ':'.join(without) if without else ''}"]
-    return Step(ring, f"{kind}{'/' + unit if unit else ''}", boxed(out, [], command), report)
+    return Step(ring, f"{kind}{'/' + unit if unit else ''}", boxed(out, [], command), report,
+                shown=shown)
 
 
 def units_of(kind):
@@ -109,6 +114,7 @@ def all_steps(out):
         yield pytest_step(out, "gates", path, inside_box=False)
     for kind in UNIT_PROGRAMS:
         yield gtest_step(out, kind, kind, BUILD)
+    yield gtest_step(out, "crash", "crash", BUILD, shown="kill points of ")
     for kind in UNIT_PROGRAMS:
         yield gtest_step(out, "sanitize", kind, BUILD / "sanitize")
     for kind in UNIT_PROGRAMS:
@@ -154,6 +160,9 @@ def show(step):
         print(f"       skipped {reason}")
     if step.failed:
         print(step.output, flush=True)
+    elif step.shown:
+        print("".join(f"       {line}\n" for line in step.output.splitlines() if line.startswith(step.shown)), end="",
+              flush=True)
 
 
 def main():
