@@ -70,8 +70,7 @@ int KLIBCFileGetKeyValue(const char *szPath, const char *szKey, char *szValue, i
  * mode and the owner are kept. The file is created (0644) when absent. The rewrite goes through a temporary file beside
  * the target that is synced and renamed, serialised against other writers of the same file, so that a reader or a crash
  * finds the old file or the new one, whole. Nothing is written when the file already says so. Files touched: the
- * target,
- * ".<name>.<hash>" beside it, /run/lock/kova/write-<hash>; other writers are waited for up to 30 seconds.
+ * target, ".<name>.<hash>" beside it, /run/lock/kova/write-<hash>; other writers are waited for up to 30 seconds.
  * @param szPath    the file, at most 64 MiB; a symbolic link is followed to the file it names
  * @param szKey     the key: not empty, without "=" at its start, newline or other control characters
  * @param szValue   the value, stored verbatim; one with CR or LF is refused (0xD00)

@@ -31,8 +31,8 @@ private:
 };
 
 /**
- * One rewrite: open, add() the new text, commit() or create(). Other writers of the file wait from open() to the end of the object.
- * Failures go to the error register.
+ * One rewrite: open, add() the new text, commit() or create(). Other writers of the file wait from open() to the end of
+ * the object. Failures go to the error register.
  */
 class file_rewrite {
 public:
