@@ -12,7 +12,7 @@ import pytest
 ROOT = pathlib.Path(__file__).resolve().parent.parent.parent
 BUILD = pathlib.Path(os.environ["KOVA_BUILD"]) / "coverage"
 COUNTS = pathlib.Path(os.environ["GCOV_PREFIX"] + str(BUILD))
-FLOOR = {"src": 99.0, "platform/src": 95.5}  # percent of a tree's lines; the only place that says so
+FLOOR = {"src": 99.0, "platform/src": 95.0}  # percent of a tree's lines; the only place that says so
 
 
 def source_of(note):
