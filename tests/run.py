@@ -3,8 +3,8 @@
 
 usage: ./test [--list] [NAME...]
 
-A NAME is a ring (unit, platform, sanitize, valgrind, lab, gates), a test file (test_jobs, test_abi) or a source
-unit (net_set_ip); without a name everything runs. The last line counts the test cases.
+A NAME is a ring (unit, platform, crash, sanitize, valgrind, coverage, lab, gates), a test file (test_jobs, test_abi) or
+a source unit (net_set_ip); without a name everything runs. The last line counts the test cases.
 """
 import argparse
 import concurrent.futures
@@ -22,15 +22,22 @@ BUILD = ROOT / "build"
 BOX = BUILD / "lab" / "kova-box"
 PYTHON = "/usr/bin/python3"
 UNIT_PROGRAMS = {"unit": "tests/kovanet-unit-tests", "platform": "tests/platform/kova-platform-tests"}
-SLOWEST = 900  # seconds for one step
+PROGRAMS = {**UNIT_PROGRAMS, "crash": "tests/crash/kova-crash-tests"}
+COUNTED = [kind for kind in PROGRAMS if kind != "crash"]  # whose lines count as tested; the killed count nothing
+SLOWEST = 1800  # seconds for one step, on a machine that has much else to do
 
 
 class Step:
-    """One test program in one box (or on the host), whose results come as a JUnit file."""
+    """
+    One test program in one box (or on the host), whose results come as a JUnit file. Lines of its output that begin
+    with the text "shown" are measurements, to be seen also when all is well. One that is "last" judges what the others
+    have left.
+    """
 
-    def __init__(self, ring, name, command, report, environment=None):
-        self.ring, self.name, self.command, self.report = ring, name, command, report
+    def __init__(self, ring, name, command, report, environment=None, shown=None, last=False):
+        self.ring, self.name, self.command, self.report, self.shown = ring, name, command, report, shown
         self.environment = {**os.environ, **(environment or {})}
+        self.last = last
 
     def run(self):
         begin = time.monotonic()
@@ -75,13 +82,13 @@ def boxed(out, options, command):
     return [str(BOX), "--share", str(out), *options, "--", *command]
 
 
-def gtest_step(out, ring, kind, build, unit=None, wrapper=(), without=()):
-    program = build / UNIT_PROGRAMS[kind]
+def gtest_step(out, ring, kind, build, unit=None, wrapper=(), without=(), **more):
+    program = build / PROGRAMS[kind]
     report = out / f"{ring}-{kind}-{unit or 'all'}.xml"
     chosen = f"{unit}.*" if unit else "*"
     command = [*wrapper, str(program), f"--gtest_output=xml:{report}", "--gtest_brief=1",
                f"--gtest_filter={chosen}{'-' + ':'.join(without) if without else ''}"]
-    return Step(ring, f"{kind}{'/' + unit if unit else ''}", boxed(out, [], command), report)
+    return Step(ring, f"{kind}{'/' + unit if unit else ''}", boxed(out, [], command), report, **more)
 
 
 def units_of(kind):
@@ -95,13 +102,25 @@ def box_options(path):
     return first.removeprefix("# box:").split() if first.startswith("# box:") else []
 
 
-def pytest_step(out, ring, path, inside_box):
+def pytest_step(out, ring, path, inside_box, options=(), environment=None, **more):
     report = out / f"{path.stem}.xml"
-    command = [PYTHON, "-B", "-m", "pytest", "-q", "-p", "no:cacheprovider", f"--junitxml={report}", str(path)]
-    environment = {"KOVA_BUILD": str(BUILD), "KOVA_BOX_PROGRAM": str(BOX)}
+    command = [PYTHON, "-B", "-m", "pytest", "-q", "-p", "no:cacheprovider", *options, f"--junitxml={report}", str(path)]
+    environment = {"KOVA_BUILD": str(BUILD), "KOVA_BOX_PROGRAM": str(BOX), **(environment or {})}
     if inside_box:
         command = boxed(out, ["--tree", str(BUILD / "stage"), *box_options(path)], command)
-    return Step(ring, path.stem, command, report, environment)
+    return Step(ring, path.stem, command, report, environment, **more)
+
+
+def coverage_steps(out):
+    """The tests on libraries that count, and at last what they have counted."""
+    counting = BUILD / "coverage"
+    counts = {"GCOV_PREFIX": str(out / "coverage")}
+    preloaded = {"LD_LIBRARY_PATH": f"{counting / 'src'}:{counting / 'platform'}",
+                 "LD_PRELOAD": str(counting / "tests" / "coverage" / "libkova-leave.so")}
+    for kind in COUNTED:
+        yield gtest_step(out, "coverage", kind, BUILD, environment={**counts, **preloaded})
+    yield pytest_step(out, "coverage", ROOT / "tests" / "coverage" / "test_coverage.py", inside_box=False,
+                      options=["--capture=no"], environment=counts, shown="coverage of ", last=True)
 
 
 def all_steps(out):
@@ -109,10 +128,12 @@ def all_steps(out):
         yield pytest_step(out, "gates", path, inside_box=False)
     for kind in UNIT_PROGRAMS:
         yield gtest_step(out, kind, kind, BUILD)
+    yield gtest_step(out, "crash", "crash", BUILD, shown="kill points of ")
     for kind in UNIT_PROGRAMS:
         yield gtest_step(out, "sanitize", kind, BUILD / "sanitize")
     for kind in UNIT_PROGRAMS:
         yield gtest_step(out, "valgrind", kind, BUILD, wrapper=VALGRIND, without=NOT_UNDER_VALGRIND)
+    yield from coverage_steps(out)
     for path in sorted((ROOT / "tests" / "lab").glob("test_*.py")):
         yield pytest_step(out, "lab", path, inside_box=path.name != "test_box.py")
 
@@ -154,6 +175,9 @@ def show(step):
         print(f"       skipped {reason}")
     if step.failed:
         print(step.output, flush=True)
+    elif step.shown:
+        print("".join(f"       {line}\n" for line in step.output.splitlines() if line.startswith(step.shown)), end="",
+              flush=True)
 
 
 def main():
@@ -169,9 +193,10 @@ def main():
             print("\n".join(f"{step.ring}/{step.name}" for step in steps))
             print("units:", *units_of("unit"), *units_of("platform"))
             return 0
-        with concurrent.futures.ThreadPoolExecutor(max_workers=os.cpu_count()) as pool:
-            for future in concurrent.futures.as_completed([pool.submit(step.run) for step in steps]):
-                show(future.result())
+        for now in ([step for step in steps if not step.last], [step for step in steps if step.last]):
+            with concurrent.futures.ThreadPoolExecutor(max_workers=os.cpu_count()) as pool:
+                for future in concurrent.futures.as_completed([pool.submit(step.run) for step in now]):
+                    show(future.result())
     finally:
         shutil.rmtree(out, ignore_errors=True)
     passed, failed, skipped = (sum(getattr(step, field) for step in steps) for field in ("passed", "failed", "skipped"))

@@ -4,18 +4,28 @@
 
 #include <cstring>
 #include <ctime>
+#include <fcntl.h>
 #include <sys/stat.h>
 
 namespace kova {
 
 namespace {
 
-/** The tool makes its copy as its caller's and under the caller's umask. */
-void give_owner_and_mode(const char *from, const char *to) {
+/** The tool makes its copy as its caller's, under the caller's umask, and does not wait until it is on the disk. */
+void complete_copy(const char *from, const char *to) {
+    const descriptor copy{open(to, O_RDONLY | O_CLOEXEC)};
     struct stat status;
-    if (stat(from, &status) == 0 && chown(to, status.st_uid, status.st_gid) == 0) {
-        chmod(to, status.st_mode & 07777);
+    if (copy.is_held() && stat(from, &status) == 0 && fchown(copy.get(), status.st_uid, status.st_gid) == 0) {
+        fchmod(copy.get(), status.st_mode & 07777);
     }
+    fsync(copy.get());
+}
+
+/** A rename is on the disk when its directory is. */
+void sync_directory_of(const char *path) {
+    const path_text name{"%.*s", static_cast<int>(strrchr(path, '/') - path), path};
+    const descriptor directory{open(name.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC)};
+    fsync(directory.get());
 }
 
 } // namespace
@@ -25,7 +35,7 @@ file_backup::file_backup(const place &at, const path_text &file)
     const int status = KLIBCExec("/bin/cp", "-f", file_.c_str(), copy_.c_str(), nullptr);
     is_made_ = status == 0;
     if (is_made_) {
-        give_owner_and_mode(file_.c_str(), copy_.c_str());
+        complete_copy(file_.c_str(), copy_.c_str());
     } else {
         at_.begin = lead::unit;
         // a tool that ran and failed leaves no errno
@@ -37,9 +47,14 @@ file_backup::file_backup(const place &at, const path_text &file)
 
 file_backup::~file_backup() {
     const errno_keeper keep;
-    if (is_made_ && rename(copy_.c_str(), file_.c_str()) != 0) {
-        log_err(at_, "rename fail.");
+    if (!is_made_) {
+        return;
     }
+    if (rename(copy_.c_str(), file_.c_str()) != 0) {
+        log_err(at_, "rename fail.");
+        return;
+    }
+    sync_directory_of(file_.c_str());
 }
 
 void file_backup::keep_new() {

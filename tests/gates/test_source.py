@@ -40,6 +40,10 @@ def test_shellcheck():
     run("shellcheck", "-x", *scripts)
 
 
+def test_pyflakes():
+    run("/usr/bin/python3", "-m", "pyflakes", *tracked("*.py"))
+
+
 def allowed(layer, include, families):
     """Whether a layer may include a header: arrows point down only."""
     first = include.split("/")[0]

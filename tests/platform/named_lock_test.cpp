@@ -93,6 +93,18 @@ TEST_F(named_lock, KLIBCFileLock_shared_letsReadersIn) {
     EXPECT_FALSE(is_free(kExclusive));
 }
 
+TEST_F(named_lock, KLIBCFileLock_makerKilledBeforeTheModeWasRight_isPutRight) {
+    ASSERT_EQ(KLIBCFileLock(kShared, 5), 0);
+    ASSERT_EQ(chmod("/run/lock/kova/4200", 0600), 0);
+    ASSERT_EQ(chmod("/run/lock/kova", 0700), 0);
+    EXPECT_EQ(in_child([] { return KLIBCFileLock(kShared, 0); }), 0);
+    struct stat status;
+    ASSERT_EQ(stat("/run/lock/kova", &status), 0);
+    EXPECT_EQ(status.st_mode, S_IFDIR | 0755U);
+    ASSERT_EQ(stat("/run/lock/kova/4200", &status), 0);
+    EXPECT_EQ(status.st_mode, S_IFREG | 0644U);
+}
+
 TEST_F(named_lock, KLIBCFileLock_otherName_isIndependent) {
     EXPECT_WORKS(KLIBCFileLock(kExclusive, 5), 0);
     EXPECT_WORKS(KLIBCFileLock(0x4306, 5), 0);

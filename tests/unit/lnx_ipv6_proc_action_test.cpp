@@ -155,6 +155,8 @@ TEST_F(lnx_ipv6_proc_action, KOVALnxIPv6ProcAction_switches_a_real_interface) {
     current_rig = &real;
     shell("ip link add kovat0 type veth peer name kovat1");
     shell("ip link set kovat0 up && ip link set kovat1 up");
+    // an interface without carrier gets no address, and the kernel hands the carrier on a little later
+    shell("timeout 10 sh -c 'until ip link show kovat0 | grep -q \"state UP\"; do sleep 0.02; done'");
     const std::string path = "/proc/sys/net/ipv6/conf/kovat0/disable_ipv6";
     EXPECT_OUTCOME(real.observe([] { return KOVALnxIPv6ProcAction("kovat0", 1); }), {.result = 0});
     EXPECT_EQ("1\n", read_file(path));

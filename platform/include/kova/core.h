@@ -70,8 +70,7 @@ int KLIBCFileGetKeyValue(const char *szPath, const char *szKey, char *szValue, i
  * mode and the owner are kept. The file is created (0644) when absent. The rewrite goes through a temporary file beside
  * the target that is synced and renamed, serialised against other writers of the same file, so that a reader or a crash
  * finds the old file or the new one, whole. Nothing is written when the file already says so. Files touched: the
- * target,
- * ".<name>.<hash>" beside it, /run/lock/kova/write-<hash>; other writers are waited for up to 30 seconds.
+ * target, ".<name>.<hash>" beside it, /run/lock/kova/write-<hash>; other writers are waited for up to 30 seconds.
  * @param szPath    the file, at most 64 MiB; a symbolic link is followed to the file it names
  * @param szKey     the key: not empty, without "=" at its start, newline or other control characters
  * @param szValue   the value, stored verbatim; one with CR or LF is refused (0xD00)
@@ -117,7 +116,10 @@ int KLIBCINFORemoveKey(const char *szKey);
 int KLIBCFileExist(const char *szPath);
 /** @return 1 when the path is an existing directory (links followed), else 0 */
 int KLIBCFileCheckDir(const char *szPath);
-/** Creates an empty file (0644) when nothing is there. @return 0; -1 with 0xD00 or 0x900 */
+/**
+ * Creates an empty file (0644) when nothing is there; locks and files touched as KLIBCFileSetKeyValue.
+ * @return 0; -1 as KLIBCFileSetKeyValue, also (0x900) when the path is a directory
+ */
 int KLIBCFileTouch(const char *szPath);
 
 /**
@@ -320,7 +322,8 @@ int KLIBCSupportDualhead(void);
 
 /**
  * Ciphers a buffer with the machine's key (/etc/kova/secret.key, made at first use, 0600). Its own inverse; keeps the
- * length, makes no zero byte from a text and no other from a zero, pads the rest of the output with zeros.
+ * length, makes no zero byte from a text and no other from a zero, pads the rest of the output with zeros. The key is
+ * made under the locks of KLIBCFileSetKeyValue.
  * @param cbIn   0 or more
  * @param cbOut  at least cbIn; pOut may be pIn
  * @return 0; -1 with 0xD00, 0x900 (no key) or 0xB00 (the key cannot be stored)

@@ -2,13 +2,12 @@
 
 #include <array>
 #include <bit>
-#include <cstdio>
 #include <cstring>
-#include <fcntl.h>
 #include <sys/random.h>
 #include <sys/stat.h>
 
 #include "common/report.h"
+#include "kovacore/file_rewrite.h"
 #include "kovacore/line_source.h"
 
 using namespace kova;
@@ -84,21 +83,17 @@ bool read_key(secret_key &key) {
     return fd && read_some(fd.get(), key.data(), kKeySize) == static_cast<ssize_t>(kKeySize);
 }
 
-/** Makes the key under another name and links it: whoever is first wins, and nobody reads half a key. */
+/** Whoever is first makes the key, and nobody reads half of one. */
 bool make_key() {
-    secret_key key;
-    if (getrandom(key.data(), kKeySize, 0) != static_cast<ssize_t>(kKeySize))
+    char key[kKeySize];
+    if (getrandom(key, sizeof key, 0) != static_cast<ssize_t>(sizeof key))
         return false;
     mkdir(kKeyDirectory, 0755);
-    char name[] = "/etc/kova/.secret.key.XXXXXX";
-    const unique_fd fd{mkostemp(name, O_CLOEXEC)};
-    if (!fd)
+    file_rewrite file;
+    if (file.open(kKeyFile) < 0)
         return false;
-    const bool stored = write(fd.get(), key.data(), kKeySize) == static_cast<ssize_t>(kKeySize) &&
-                        fsync(fd.get()) == 0 && (link(name, kKeyFile) == 0 || errno == EEXIST);
-    unlink(name);
-    const unique_fd directory{open(kKeyDirectory, O_RDONLY | O_DIRECTORY | O_CLOEXEC)};
-    return stored && directory && (fsync(directory.get()) == 0 || errno == EINVAL);
+    file.fresh().add({key, sizeof key});
+    return file.create(0600) == 0;
 }
 
 } // namespace

@@ -18,16 +18,15 @@ constexpr const char *kLockDirectory = "/run/lock/kova";
 
 /**
  * Opens the directory. /run/lock may be open to everybody: one that a stranger made in advance is not used, and only
- * the system's own user makes it, or a reader's would be in its way.
+ * the system's own user makes it, or a reader's would be in its way. The mode is looked at every time: the mask of who
+ * made it, killed before it could be put right, must not keep readers out.
  */
 unique_fd open_lock_directory() {
     constexpr int kFlags = O_PATH | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC;
     unique_fd directory{open(kLockDirectory, kFlags)};
     if (!directory && errno == ENOENT && geteuid() == 0) {
         mkdir("/run/lock", 0755);
-        // the mode once more: the caller's mask must not keep readers out
-        if (mkdir(kLockDirectory, 0755) == 0)
-            chmod(kLockDirectory, 0755);
+        mkdir(kLockDirectory, 0755);
         directory.reset(open(kLockDirectory, kFlags));
     }
     struct stat status;
@@ -35,12 +34,18 @@ unique_fd open_lock_directory() {
         errno = EPERM;
         directory.reset();
     }
+    if (directory && (status.st_mode & 0555) != 0555 && status.st_uid == geteuid())
+        chmod(kLockDirectory, 0755);
     return directory;
 }
 
-unique_fd create_lock_file(int directory, const char *name) {
-    unique_fd fd{openat(directory, name, O_RDWR | O_CREAT | O_NOFOLLOW | O_CLOEXEC, 0644)};
-    if (fd)
+/** As with the directory, whoever may write puts a mode right that a killed one could not. */
+unique_fd open_to_write(int directory, const char *name) {
+    unique_fd fd{openat(directory, name, O_RDWR | O_NOFOLLOW | O_CLOEXEC)};
+    if (!fd && errno == ENOENT)
+        fd.reset(openat(directory, name, O_RDWR | O_CREAT | O_NOFOLLOW | O_CLOEXEC, 0644));
+    struct stat status;
+    if (fd && fstat(fd.get(), &status) == 0 && (status.st_mode & 0444) != 0444)
         fchmod(fd.get(), 0644);
     return fd;
 }
@@ -72,9 +77,7 @@ unique_fd kova::open_lock_file(const char *name, lock_mode mode) {
     const unique_fd directory = open_lock_directory();
     if (!directory)
         return {};
-    unique_fd fd{openat(directory.get(), name, O_RDWR | O_NOFOLLOW | O_CLOEXEC)};
-    if (!fd && errno == ENOENT)
-        fd = create_lock_file(directory.get(), name);
+    unique_fd fd = open_to_write(directory.get(), name);
     if (!fd && errno == EACCES && mode == lock_mode::kShared)
         fd.reset(openat(directory.get(), name, O_RDONLY | O_NOFOLLOW | O_CLOEXEC));
     return fd;

@@ -52,8 +52,9 @@ public:
         return static_cast<bool>(fd_);
     }
     [[nodiscard]] int fd() const { return fd_.get(); }
-    bool rename_to(const char *target) {
-        if (rename(path_, target) < 0)
+    /** @param flags RENAME_NOREPLACE: fails when something has the name */
+    bool rename_to(const char *target, unsigned flags) {
+        if (renameat2(AT_FDCWD, path_, AT_FDCWD, target, flags) < 0)
             return false;
         fd_.reset();
         return true;
@@ -139,28 +140,35 @@ int file_rewrite::read_old() {
 }
 
 /** The owner before the mode: changing the owner takes mode bits away. */
-int file_rewrite::fill_temporary(int fd) {
+int file_rewrite::fill_temporary(int fd, mode_t mode_of_new) {
     if (!write_all(fd, fresh_.view()))
         return fail(HERE, kErrFileWrite);
     if (existed_ && fchown(fd, status_.st_uid, status_.st_gid) < 0)
         return fail(HERE, kErrFileWrite);
-    if (fchmod(fd, existed_ ? status_.st_mode & 07777 : 0644) < 0 || fsync(fd) < 0)
+    if (fchmod(fd, existed_ ? status_.st_mode & 07777 : mode_of_new) < 0 || fsync(fd) < 0)
         return fail(HERE, kErrFileWrite);
     return 0;
 }
 
-int file_rewrite::commit() {
+int file_rewrite::put_in_place(mode_t mode_of_new, unsigned rename_flags) {
     if (fresh_.out_of_memory())
         return fail(HERE, kErrMemory);
-    if (fresh_.view() == old_.view())
-        return 0;
 
     temporary_file temporary{path_};
     if (!temporary.create())
         return fail(HERE, kErrFileOpen);
-    if (fill_temporary(temporary.fd()) < 0)
+    if (fill_temporary(temporary.fd(), mode_of_new) < 0)
         return -1;
-    if (!temporary.rename_to(path_))
-        return fail(HERE, kErrRename);
+    if (!temporary.rename_to(path_, rename_flags))
+        return rename_flags != 0 && errno == EEXIST ? 0 : fail(HERE, kErrRename);
     return sync_directory_of(path_) ? 0 : fail(HERE, kErrFileWrite);
+}
+
+int file_rewrite::commit() {
+    const bool is_same = !fresh_.out_of_memory() && fresh_.view() == old_.view();
+    return is_same ? 0 : put_in_place(0644, 0);
+}
+
+int file_rewrite::create(mode_t mode) {
+    return existed_ ? 0 : put_in_place(mode, RENAME_NOREPLACE);
 }

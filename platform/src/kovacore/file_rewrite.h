@@ -31,8 +31,8 @@ private:
 };
 
 /**
- * One rewrite: open, add() the new text, commit(). Other writers of the file wait from open() to the end of the object.
- * Failures go to the error register.
+ * One rewrite: open, add() the new text, commit() or create(). Other writers of the file wait from open() to the end of
+ * the object. Failures go to the error register.
  */
 class file_rewrite {
 public:
@@ -48,10 +48,13 @@ public:
 
     /** Puts the new text in place; nothing is written when it is the old one. @return 0 or -1 */
     int commit();
+    /** Makes a missing file of the new text, also an empty one; a file that somebody has made stays. @return 0 or -1 */
+    int create(mode_t mode);
 
 private:
     int read_old();
-    int fill_temporary(int fd);
+    int fill_temporary(int fd, mode_t mode_of_new);
+    int put_in_place(mode_t mode_of_new, unsigned rename_flags);
 
     char path_[PATH_MAX];
     scoped_lock lock_;

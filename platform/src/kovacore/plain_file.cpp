@@ -103,14 +103,8 @@ int KLIBCFileTouch(const char *szPath) {
     struct stat status;
     if (stat(szPath, &status) == 0)
         return S_ISDIR(status.st_mode) ? fail(HERE, kErrFileOpen) : 0;
-    char path[PATH_MAX];
-    if (!resolve_path(szPath, path))
-        return fail(HERE, kErrFileOpen);
-    const unique_fd fd{open(path, O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, 0644)};
-    // one that somebody has made meanwhile keeps its mode
-    if (!fd && errno == EEXIST)
-        return 0;
-    return fd && fchmod(fd.get(), 0644) == 0 ? 0 : fail(HERE, kErrFileOpen);
+    file_rewrite file;
+    return file.open(szPath) < 0 ? -1 : file.create(0644);
 }
 
 int KLIBCFileEnumDir(const char *szDir, KLIBSZLIST *pList, const char *szPrefix, int flags) {

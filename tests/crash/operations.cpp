@@ -1,0 +1,153 @@
+#include "operations.h"
+
+#include <cstdio>
+#include <kova/core.h>
+#include <kovanetsdk/kovanetsdk.h>
+
+namespace kova_test {
+
+namespace {
+
+constexpr char kPlain[] = "%s=%s\n";
+constexpr char kQuoted[] = "%s=\"%s\"\n";
+constexpr char kInfo[] = "/etc/kovainfo.conf";
+constexpr char kIfcfg[] = "/etc/sysconfig/network-scripts/ifcfg-eth0";
+constexpr char kNoProtocol[] = "DEVICE=eth0\nONBOOT=yes\n";
+constexpr char kAddress[] = "192.168.7.10";
+constexpr char kMask[] = "255.255.255.0";
+constexpr char kBrokenMask[] = "255.255.255.999";
+
+bool set_keys(const char *path) {
+    KLIBSZHASH *const set = KLIBCSzHashAlloc(8);
+    KLIBSZHASH *const removed = KLIBCSzHashAlloc(8);
+    const bool works = KLIBCSzHashSetValue(set, "KEY", "new") == 0 && KLIBCSzHashSetValue(set, "MORE", "1") == 0 &&
+                       KLIBCSzHashSetValue(removed, "MASTER", "") == 0 &&
+                       KLIBCFileSetKeys(path, set, removed, kPlain) == 0;
+    KLIBCSzHashFree(set);
+    KLIBCSzHashFree(removed);
+    return works;
+}
+
+bool cipher(const char *) {
+    char hidden[16];
+    return KLIBCCryptBufCrypt("password", 8, hidden, sizeof hidden) == 0;
+}
+
+bool lock_by_name(const char *) {
+    return KLIBCFileLock(0x105, 5) == 0 && KLIBCFileLock(0x106, 5) == 0 && KLIBCFileUnlock(0x100) == 0 &&
+           KLIBCFileUnlock(0x100) == 0;
+}
+
+bool lock_by_file(const char *path) {
+    int fd = -1;
+    return KLIBCFileLockTimeByFile(path, 1, 30, &fd) == 0 && KLIBCFileUnlockByFile(fd) == 1;
+}
+
+NETINFO card(int source) {
+    NETINFO card = {};
+    card.nIPSource = source;
+    snprintf(card.szIfname, sizeof card.szIfname, "eth0");
+    snprintf(card.szIP, sizeof card.szIP, "%s", kAddress);
+    snprintf(card.szMask, sizeof card.szMask, "%s", kMask);
+    return card;
+}
+
+bool set_card(int source) {
+    NETINFO wanted = card(source);
+    return KOVANetSetCard1(&wanted, nullptr) == 0;
+}
+
+/** The file of an address that is refused after it was written. */
+bool set_broken_mask(const char *path) {
+    const std::pair<const char *, const char *> lines[] = {
+        {"DEVICE", "eth0"}, {"ONBOOT", "yes"}, {"IPADDR", kAddress}, {"NETMASK", kBrokenMask}, {"BOOTPROTO", "static"}};
+    bool works = KLIBCFileRemoveKey(path, "MASTER") == 0;
+    for (const auto &[key, value] : lines) {
+        works = works && KLIBCFileSetKeyValue(path, key, value, kPlain) == 0;
+    }
+    return works;
+}
+
+} // namespace
+
+const std::vector<operation> &operations() {
+    static const std::vector<operation> all = {
+        // ---- platform
+        {"KLIBCFileSetKeyValue_presentKey", 48,
+         [](const char *path) { return KLIBCFileSetKeyValue(path, "KEY", "new", kPlain) == 0; }},
+        {"KLIBCFileSetKeyValue_newKey", 48,
+         [](const char *path) { return KLIBCFileSetKeyValue(path, "NEW", "new value", kQuoted) == 0; }},
+        {"KLIBCFileSetKeys", 48, set_keys},
+        {"KLIBCFileRemoveKey", 50, [](const char *path) { return KLIBCFileRemoveKey(path, "KEY") == 0; },
+         works_on::kPresentFile},
+        {"KLIBCINFOSetKeyValue", 44, [](const char *) { return KLIBCINFOSetKeyValue("KEY", "new") == 0; },
+         works_on::kAnyFile, kInfo},
+        {"KLIBCINFORemoveKey", 50, [](const char *) { return KLIBCINFORemoveKey("KEY") == 0; }, works_on::kPresentFile,
+         kInfo},
+        {"KLIBCFileTouch", 48, [](const char *path) { return KLIBCFileTouch(path) == 0; }, works_on::kMissingFile},
+        {"KLIBCFileAddLine_atTheEnd", 48,
+         [](const char *path) { return KLIBCFileAddLine(path, nullptr, "line", 0) == 0; }},
+        {"KLIBCFileAddLine_behindMarker", 48,
+         [](const char *path) { return KLIBCFileAddLine(path, "MARKER", "line", 512) == 0; }},
+        {"KLIBCFileReplaceSubStr", 50,
+         [](const char *path) { return KLIBCFileReplaceSubStr(path, "old", "much newer") == 0; },
+         works_on::kPresentFile},
+        {.name = "KLIBCCryptBufCrypt",
+         .floor = 60,
+         .call = cipher,
+         .files = works_on::kMissingFile,
+         .path = "/etc/kova/secret.key",
+         .mode = 0600,
+         .is_random = true},
+        {"KLIBCFileLock", 28, lock_by_name, works_on::kNoFile},
+        {"KLIBCFileLockTimeByFile", 22, lock_by_file, works_on::kNoFile},
+
+        // ---- library
+        {.name = "KLIBNetSetIfCfg",
+         .floor = 74,
+         .call = [](const char *) { return KLIBNetSetIfCfg("eth0", "KEY", "new") == 0; },
+         .path = kIfcfg,
+         .is_built_of_others = true},
+        {.name = "KOVANetSetIfBlock",
+         .floor = 144,
+         .call = [](const char *) { return KOVANetSetIfBlock("eth0", 1, 1) == 0; },
+         .files = works_on::kPresentFile,
+         .path = kIfcfg,
+         .is_built_of_others = true,
+         .first_part = [](const char *path) { return KLIBCFileSetKeyValue(path, "BLOCK_HA", "yes", kQuoted) == 0; }},
+        {.name = "BlKOVALnxIsDHCP_repair",
+         .floor = 94,
+         .call = [](const char *) { return BlKOVALnxIsDHCP("eth0") == 0; },
+         .path = kIfcfg,
+         .text = kNoProtocol,
+         .is_built_of_others = true},
+        {.name = "KOVAILnxSetIPNetmask",
+         .floor = 176,
+         .call = [](const char *) { return KOVAILnxSetIPNetmask("eth0", kAddress, kMask) == 0; },
+         .path = kIfcfg,
+         .is_built_of_others = true,
+         .keeps_backup = true},
+        {.name = "KOVAILnxSetIPNetmask_failing",
+         .floor = 124,
+         .call = [](const char *) { return KOVAILnxSetIPNetmask("eth0", kAddress, kBrokenMask) == -1; },
+         .path = kIfcfg,
+         .is_built_of_others = true,
+         .puts_back = true,
+         .keeps_backup = true,
+         .first_part = set_broken_mask},
+        {.name = "KOVANetSetCard1_static",
+         .floor = 226,
+         .call = [](const char *) { return set_card(1); },
+         .path = kIfcfg,
+         .is_built_of_others = true,
+         .keeps_backup = true},
+        {.name = "KOVANetSetCard1_dhcp",
+         .floor = 120,
+         .call = [](const char *) { return set_card(0); },
+         .path = kIfcfg,
+         .is_built_of_others = true},
+    };
+    return all;
+}
+
+} // namespace kova_test
