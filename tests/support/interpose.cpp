@@ -16,6 +16,7 @@
 #include <map>
 #include <sys/ioctl.h>
 #include <sys/socket.h>
+#include <sys/stat.h>
 #include <syslog.h>
 #include <time.h>
 #include <unistd.h>
@@ -82,6 +83,10 @@ FAILING(int, KLIBCSzHashSetValue, (KLIBSZHASH * hash, const char *key, const cha
 FAILING(int, KLIBCModuleIsLoad, (const char *module), (module), -1, 0x900)
 FAILING(int, KLIBCFileEnumDir, (const char *dir, KLIBSZLIST *list, const char *prefix, int flags),
         (dir, list, prefix, flags), -1, 0x900)
+FAILING(int, KLIBCINFOSetKeyValue, (const char *key, const char *value), (key, value), -1, 0xB00)
+FAILING(int, KLIBCFileGetLine, (const char *path, const char *prefix, char *line, int cb, int flags),
+        (path, prefix, line, cb, flags), -1, 0x900)
+FAILING(FILE *, KLIBCFileTempFileOpen, (char *path), (path), nullptr, 0x900)
 FAILING(int, KLIBCFileReadLines, (const char *path, KLIBSZLIST *list), (path, list), -1, 0x900)
 
 // ---- containers
@@ -478,6 +483,24 @@ extern "C" int access(const char *path, int mode) noexcept {
 
 extern "C" DIR *opendir(const char *path) {
     return real<DIR *(*)(const char *)>("opendir")(meant(path).c_str());
+}
+
+// ---- what a finished file goes through
+
+extern "C" int fsync(int fd) {
+    if (is_failing("fsync", 0)) {
+        errno = EIO;
+        return -1;
+    }
+    return real<int (*)(int)>("fsync")(fd);
+}
+
+extern "C" int chmod(const char *path, mode_t mode) noexcept {
+    if (is_failing("chmod", 0)) {
+        errno = EPERM;
+        return -1;
+    }
+    return real<int (*)(const char *, mode_t)>("chmod")(path, mode);
 }
 
 // ---- time
