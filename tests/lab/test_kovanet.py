@@ -482,7 +482,8 @@ BAD = {
     "card set lan0 dhcp 10.9.0.9/24": USAGE, "link up": USAGE, "link rename lan0": USAGE, "addr add lan0": USAGE,
     "addr flush lan0": USAGE, "addr flush lan0 5": USAGE, "stats --count 2": USAGE, "stats --watch 0": USAGE,
     "stats --watch --count 0": USAGE, "stats --watch --count -1": USAGE, "stats --watch eth0": USAGE,
-    "block set lan0 ha": USAGE, "block set lan0 ha yes": USAGE, "block set lan0 other on": USAGE, "check": USAGE,
+    "dns": USAGE, "dns set": USAGE, "dns mode": USAGE, "dns mode Static": USAGE, "dns mode static auto": USAGE,
+    "dns show more": USAGE, "dns update now": USAGE, "block set lan0 ha": USAGE, "block set lan0 ha yes": USAGE, "block set lan0 other on": USAGE, "check": USAGE,
     "check address": USAGE, "check address 10.0.0.1 mask": USAGE, "card list --bogus": USAGE, "--bogus": USAGE,
     # values that are not acceptable
     "card set lan0 static 10.9.0.256/24": NO, "card set lan0 static 127.0.0.1/8": NO,
@@ -495,7 +496,8 @@ BAD = {
     "addr add lan0 10.9.0.9/33": NO, "addr add lan0 10.9.0.9/0": NO, "addr add lan0 300.1.1.1/24": NO,
     "addr add lan0 fe80::1": NO, "addr add lan0 fe80::1/129": NO, "addr add lan0 fe80:::1/64": NO,
     "addr del lan0 10.9.0.9": NO, "addr list a/b": NO, "stats a/b": NO, "block show a/b": NO,
-    "block set ../lan0 ha on": NO,
+    "block set ../lan0 ha on": NO, "dns set 1.2.3": NO, "dns set 10.9.0.1 1.2.3": NO, "dns set 10.9.0.1 host": NO,
+    "dns set fe80::1%lan0": NO,
     # what is not there
     "card show nope": NOT_FOUND, "card show lo": NOT_FOUND, "card set nope dhcp": NOT_FOUND,
     "card set nope static 10.9.0.9/24": NOT_FOUND, "card set lo dhcp": NOT_FOUND, "link show nope": NOT_FOUND,
@@ -532,7 +534,8 @@ def test_a_mistyped_word_gets_a_suggestion():
 
 @pytest.mark.parametrize("words", ["card set lan0 dhcp", "card set lan0 static 10.9.0.9/24", "link up lan0",
                                    "link down lan0", "link rename lan0 lan1", "addr add lan0 10.9.0.9/24",
-                                   "addr del lan0 10.9.0.9/24", "addr flush lan0 4", "block set lan0 ha on"])  # fmt: skip
+                                   "addr del lan0 10.9.0.9/24", "addr flush lan0 4", "block set lan0 ha on",
+                                   "dns set 10.9.0.1", "dns mode auto", "dns update"])  # fmt: skip
 def test_changes_need_root(words):
     before = everything()
     done = run("unshare", "--user", KOVANET, *words.split(), status=NO_PERMISSION)

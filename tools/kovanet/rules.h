@@ -22,6 +22,8 @@ refusal refuse_prefix(const std::string &prefix);
 refusal refuse_ipv6(const std::string &address);
 refusal refuse_hostname(const std::string &name);
 refusal refuse_domain(const std::string &name);
+/** A name server: an address of either family. */
+refusal refuse_server(const std::string &address);
 refusal refuse_interface_name(const std::string &name);
 
 /** Ends the program when there is a refusal. */
