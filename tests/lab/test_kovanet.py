@@ -67,7 +67,8 @@ def keys(name):
 
 def everything():
     """The network's state, as far as a refused command could have changed it."""
-    files = {path.name: path.read_text() for path in SCRIPTS.iterdir() if path.is_file()}
+    files = {path.name: path.read_text() for folder in (SCRIPTS, pathlib.Path("/etc")) for path in folder.iterdir()
+             if path.is_file() and path.name.startswith(("ifcfg-", "resolv.conf", "kovainfo.conf"))}
     return run("ip", "-o", "addr").stdout, run("ip", "-o", "link").stdout, run("ip", "route").stdout, files
 
 
@@ -544,14 +545,15 @@ def test_changes_need_root(words):
 
 
 def test_reading_needs_no_root(addressed):
-    for words in (["card", "list", "--json"], ["link", "show", "--json"], ["addr", "list", "--json"]):
+    for words in (["card", "list", "--json"], ["link", "show", "--json"], ["addr", "list", "--json"],
+                  ["dns", "show", "--json"]):
         assert run("unshare", "--user", KOVANET, *words).stdout == kovanet(*words).stdout
 
 
 @pytest.mark.parametrize("command,section", [
     ("card list", "kovanet card list"), ("card show lan0", "kovanet card list"), ("link show", "kovanet link show"),
     ("addr list", "kovanet addr list"), ("stats", "kovanet stats"), ("block show lan0", "kovanet block show"),
-    ("check hostname nas01", "kovanet check"),
+    ("dns show", "kovanet dns show"), ("check hostname nas01", "kovanet check"),
 ])  # fmt: skip
 def test_json_has_exactly_the_documented_fields(addressed, command, section):
     printed = data(*command.split())
@@ -630,6 +632,7 @@ def test_the_name_of_an_interface_cannot_write_to_the_terminal():
 
 COMMANDS = ["", "card", "card list", "card show", "card set", "link", "link show", "link up", "link down", "link rename",
             "addr", "addr list", "addr add", "addr del", "addr flush", "stats", "block", "block show", "block set",
+            "dns", "dns show", "dns set", "dns mode", "dns update",
             "check", "check address", "check mask", "check prefix", "check ipv6", "check hostname", "check domain"]  # fmt: skip
 
 
@@ -644,7 +647,7 @@ def test_help_has_examples_and_exit_codes(words):
 
 def test_the_examples_of_the_help_are_understood():
     """Every example that only reads works as it stands."""
-    for name in ("card", "link", "addr", "check"):
+    for name in ("card", "link", "addr", "dns", "check"):
         examples = re.findall(r"^  kovanet (.+)$", kovanet(name, "--help").stdout, re.MULTILINE)
         assert examples
         for example in examples:
