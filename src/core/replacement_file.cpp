@@ -1,8 +1,23 @@
 #include "core/replacement_file.h"
 
+#include <cstring>
+#include <fcntl.h>
 #include <sys/stat.h>
 
 namespace kova {
+
+namespace {
+
+/** A rename is on the disk when its directory is. Cuts the path off behind its last slash. */
+void sync_directory_of(char *path) {
+    strrchr(path, '/')[1] = '\0';
+    const descriptor directory{open(path, O_RDONLY | O_DIRECTORY | O_CLOEXEC)};
+    if (directory.is_held()) {
+        fsync(directory.get());
+    }
+}
+
+} // namespace
 
 replacement_file::replacement_file(const char *target) : target_(target) {
     const int length = snprintf(path_, sizeof path_, "%s.XXXXXX", target);
@@ -28,7 +43,11 @@ bool replacement_file::finish() const {
 
 bool replacement_file::replace() {
     is_temporary_ = rename(path_, target_) != 0;
-    return !is_temporary_;
+    if (is_temporary_) {
+        return false;
+    }
+    sync_directory_of(path_);
+    return true;
 }
 
 } // namespace kova

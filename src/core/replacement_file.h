@@ -22,7 +22,7 @@ public:
     [[nodiscard]] FILE *get() const { return stream_.get(); }
     /** Everything is written: makes the file readable by all and brings it to the disk. */
     [[nodiscard]] bool finish() const;
-    /** Renames the finished file over its target. */
+    /** Renames the finished file over its target. Where the directory cannot be synced, it is in place all the same. */
     [[nodiscard]] bool replace();
 
 private:

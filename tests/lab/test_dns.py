@@ -7,7 +7,6 @@ import ctypes
 import os
 import pathlib
 import re
-import signal
 import socket
 import struct
 import subprocess
@@ -16,9 +15,11 @@ import time
 import pytest
 from conftest import OTHER_SIDE, Daemon, DhcpServer, on_other_side, processes, run, wait_for
 from sdk import library
+from steps import Watch, killed_at_each_step
 
 RESOLV = pathlib.Path("/etc/resolv.conf")
 STATIC = pathlib.Path("/etc/resolv.conf.static")
+INFO = pathlib.Path("/etc/kovainfo.conf")
 OPTION = pathlib.Path("/etc/resolv.conf.option")
 SOURCE4 = pathlib.Path("/etc/iproute2/config/resolv4.conf")
 SOURCE6 = pathlib.Path("/etc/iproute2/config/resolv6.conf")
@@ -66,11 +67,11 @@ def leasing(folder, server, *more):
 
 @pytest.fixture(autouse=True)
 def appliance(keep):
-    for path in (RESOLV, STATIC, OPTION, SOURCE4, SOURCE6, "/etc/kovainfo.conf", "/etc/kova/kovarelayd.conf"):
+    for path in (RESOLV, STATIC, OPTION, SOURCE4, SOURCE6, INFO, "/etc/kova/kovarelayd.conf"):
         keep(path)
     for path in (STATIC, OPTION, SOURCE4, SOURCE6):
         path.unlink(missing_ok=True)
-    pathlib.Path("/etc/kovainfo.conf").write_text('dns_mode="auto"\n')
+    INFO.write_text('dns_mode="auto"\n')
     RESOLV.write_text("# nothing yet\n")
     for address in (f"{FIRST}/24", f"{SECOND}/24", f"{IPV6}/64"):
         on_other_side("ip", "addr", "replace", address, "dev", "eth0", *(["nodad"] if ":" in address else []))
@@ -103,7 +104,7 @@ def test_servers_just_set_answer(two_servers):
         kovanet("set", server)
         assert RESOLV.read_text() == STATIC.read_text() == file_of(server)
         assert resolved() == ANSWERS[server]
-        shown = run("busybox", "nslookup", "one.example").stdout
+        shown = run("busybox", "nslookup", "-type=a", "one.example").stdout
         assert re.search(rf"Server:\s+{re.escape(server)}\b", shown) and ANSWERS[server] in shown
 
 
@@ -364,9 +365,17 @@ def test_relay_refuses_an_unusable_address(text):
     assert "cannot relay" in run("/usr/kova/sbin/kovarelayd", status=1).stderr
 
 
-def test_pppoe_relay_job_can_be_stopped_and_needs_its_settings():
-    run("/sbin/stop", "pppoerelay")
+def test_pppoe_relay_job_can_be_stopped(keep):
+    relay, settings = keep("/usr/sbin/pppoe-relay"), keep("/etc/sysconfig/pppoe-relay/eth0")
+    settings.parent.mkdir(parents=True, exist_ok=True)
     assert "does not say enable=yes" in run("/sbin/start", "pppoerelay", "IFACE=eth0", status=1).stderr
+    settings.write_text("enable=yes\nserver=eth1\n")
+    relay.write_text("#!/bin/sh\nwhile sleep 0.1; do :; done\n")
+    relay.chmod(0o755)
+    run("/sbin/start", "pppoerelay", "IFACE=eth0")
+    wait_for(lambda: processes(f"{relay} -C eth0 -S eth1"), what="the relay")
+    assert library.KLIBServicectlJobStop(b"pppoerelay") == 0
+    assert not processes(str(relay))
     assert library.KLIBServicectlJobStop(b"pppoerelay") == 0
 
 
@@ -375,114 +384,77 @@ def test_pppoe_relay_job_can_be_stopped_and_needs_its_settings():
 OLD = file_of(*(f"10.1.0.{number}" for number in range(1, 251)))
 NEW = file_of(*(f"10.2.0.{number}" for number in range(1, 251)))  # more than one write takes
 
-READING = """
-import sys
-whole = {open(path).read() for path in sys.argv[1:3]}
-reads = 0
-seen = set()
-print("reads", flush=True)
-while True:
-    try:
-        text = open("/etc/resolv.conf").read()
-    except FileNotFoundError:
-        text = "missing"
-    if text not in whole:
-        sys.exit(f"torn after {reads} reads: {text[:80]!r}, {len(text)} characters")
-    reads += 1
-    seen.add(text)
-    if reads % 500 == 0:
-        print(reads, len(seen), flush=True)
+WRITING = """
+import ctypes, sys
+sys.path.insert(0, sys.argv[1])
+from sdk import core, library
+core.KLIBCSzListAlloc.restype = ctypes.c_void_p
+for turn in range(50):
+    servers = ctypes.c_void_p(core.KLIBCSzListAlloc(512))
+    for number in range(1, 251):
+        core.KLIBCSzListPush(ctypes.byref(servers), b"10.%d.0.%d" % (1 + turn % 2, number))
+    assert library.KOVANetDNSFileSet(servers, None) == 0
 """
 
 
-@contextlib.contextmanager
-def reader(folder):
-    """A program that reads the file again and again and ends when it is missing or torn; gives a call that tells how
-    often it has read, and how many of the two contents it has seen."""
-    (folder / "old").write_text(OLD)
-    (folder / "new").write_text(NEW)
+def litter(target):
+    """The temporary files that a killed writer has left beside its target."""
+    return [path for path in target.parent.iterdir() if re.fullmatch(rf"{re.escape(target.name)}\.\w{{6}}", path.name)]
+
+
+def replace(target, text):
+    fresh = target.with_name("fresh")
+    fresh.write_text(text)
+    fresh.rename(target)
+
+
+def test_reader_never_sees_a_torn_file_while_many_write():
     RESOLV.write_text(OLD)
-    log = folder / "reads"
-    with log.open("w") as out, subprocess.Popen(["/usr/bin/python3", "-c", READING, folder / "old", folder / "new"],
-                                                stdout=out, stderr=subprocess.STDOUT) as process:  # fmt: skip
-        wait_for(log.read_text, what="the reader")
-
-        def progress():
-            assert process.poll() is None, log.read_text()
-            line = log.read_text().splitlines()[-1].split()
-            return (int(line[0]), int(line[1])) if line[0] != "reads" else (0, 0)
-
-        yield progress
-        process.terminate()
-
-
-def test_reader_never_sees_a_torn_file_while_many_write(tmp_path):
-    OPTION.unlink(missing_ok=True)
-    program = ("import sys; sys.path.insert(0, sys.argv[1]); from sdk import library, core; import ctypes\n"
-               "core.KLIBCSzListAlloc.restype = ctypes.c_void_p\n"
-               "for turn in range(50):\n"
-               "    servers = ctypes.c_void_p(core.KLIBCSzListAlloc(512))\n"
-               "    for number in range(1, 251):\n"
-               "        core.KLIBCSzListPush(ctypes.byref(servers), b'10.%d.0.%d' % (1 + turn % 2, number))\n"
-               "    assert library.KOVANetDNSFileSet(servers, None) == 0\n")
-    with reader(tmp_path) as progress:
-        writers = [subprocess.Popen(["/usr/bin/python3", "-B", "-c", program, pathlib.Path(__file__).parent])
+    with Watch(RESOLV) as watch:
+        wait_for(lambda: watch.reads, what="the first read")
+        writers = [subprocess.Popen(["/usr/bin/python3", "-B", "-c", WRITING, pathlib.Path(__file__).parent])
                    for _ in range(4)]
         assert [writer.wait(120) for writer in writers] == [0] * 4
-        wait_for(lambda: progress()[0] >= 500 and progress()[1] == 2, 60, "reads of both contents")
-    assert sorted(path.name for path in RESOLV.parent.glob("resolv.conf*")) == ["resolv.conf"]
+        reads = watch.reads
+        wait_for(lambda: watch.reads > reads + 1, what="a read of the last content")
+    assert reads > 100 and watch.contents == {OLD, NEW}
+    assert not litter(RESOLV)
 
 
-PTRACE_TRACEME, PTRACE_KILL, PTRACE_SYSCALL, PTRACE_SETOPTIONS = 0, 8, 24, 0x4200
-PTRACE_O_EXITKILL, PTRACE_O_TRACESYSGOOD = 0x100000, 1
-libc = ctypes.CDLL(None, use_errno=True)
+def test_writer_killed_at_every_step_leaves_a_whole_file():
+    SOURCE4.write_text(NEW)
+    RESOLV.write_text(OLD)
 
+    def prepare():
+        replace(RESOLV, OLD)
+        return "/usr/bin/kovanet", "dns", "update"
 
-def kill_at_stop(call, number):
-    """Runs a call in a child and kills the child at a stop: each system call stops twice, before and after. Gives
-    whether there were that many."""
-    child = os.fork()
-    if child == 0:
-        libc.ptrace(PTRACE_TRACEME, 0, None, None)
-        os.kill(os.getpid(), signal.SIGSTOP)
-        call()
-        os._exit(0)
-    _, status = os.waitpid(child, 0)
-    assert os.WIFSTOPPED(status)
-    libc.ptrace(PTRACE_SETOPTIONS, child, None, PTRACE_O_EXITKILL | PTRACE_O_TRACESYSGOOD)
-    stops, pending = 0, 0
-    while stops < number:
-        assert libc.ptrace(PTRACE_SYSCALL, child, None, pending) == 0
-        _, status = os.waitpid(child, 0)
-        if os.WIFEXITED(status):
-            assert os.WEXITSTATUS(status) == 0
-            return False
-        is_call = os.WSTOPSIG(status) == signal.SIGTRAP | 0x80
-        stops += is_call
-        pending = 0 if is_call else os.WSTOPSIG(status)
-    os.kill(child, signal.SIGKILL)
-    os.waitpid(child, 0)
-    return True
-
-
-def test_writer_killed_at_every_step_leaves_a_whole_file(tmp_path):
-    contents = {"old": OLD, "new": NEW}
-    outcomes, stops = [], 0
-    with reader(tmp_path) as progress:
-        went_on = True
-        while went_on:
-            stops += 1
-            RESOLV.with_name("resolv.conf.fresh").write_text(OLD)
-            RESOLV.with_name("resolv.conf.fresh").rename(RESOLV)
-            SOURCE4.write_text(NEW)
-            went_on = kill_at_stop(library.KOVANetDNSUpdate, stops)
-            outcomes += [name for name, content in contents.items() if RESOLV.read_text() == content]
-            assert len(outcomes) == stops, f"neither file after stop {stops}"
-        wait_for(lambda: progress()[0] >= 500 and progress()[1] == 2, 60, "reads of both contents")
-    # the new file from one step on, and only from there: the rename
-    assert outcomes == sorted(outcomes, reverse=True) and {"old", "new"} == set(outcomes)
-    assert outcomes.count("old") > 40
-    for litter in RESOLV.parent.glob("resolv.conf.*"):
-        assert re.fullmatch(r"resolv\.conf\.\w{6}", litter.name)
-        litter.unlink()
+    with Watch(RESOLV) as watch:
+        left = [RESOLV.read_text() for _ in killed_at_each_step(prepare)]
+        assert RESOLV.read_text() == NEW, "it got through in the end"
+    assert watch.contents == {OLD, NEW} and watch.reads > len(left)
+    # the new file from one step on, the rename, and with steps before and after it
+    renamed = left.index(NEW)
+    assert renamed > 10 and left == [OLD] * renamed + [NEW] * (len(left) - renamed)
+    assert litter(RESOLV), "none was killed between the making of the file and its rename"
+    for path in litter(RESOLV):
+        path.unlink()
     assert library.KOVANetDNSUpdate() == 0, "no dead writer keeps the lock"
+
+
+def test_setter_killed_at_every_step_leaves_whole_files():
+    servers = [line.split()[1] for line in NEW.splitlines()]
+    auto, static = 'dns_mode="auto"\n', 'dns_mode="static"\n'
+    before = {STATIC: OLD, RESOLV: OLD, INFO: auto}
+
+    def prepare():
+        for path, text in before.items():
+            replace(path, text)
+        return "/usr/bin/kovanet", "dns", "set", *servers
+
+    left = {tuple(path.read_text() for path in before) for _ in killed_at_each_step(prepare)}
+    # one file after the other, each whole: the list, the mode, what is in use
+    assert left == {(OLD, OLD, auto), (NEW, OLD, auto), (NEW, OLD, static), (NEW, NEW, static)}
+    for path in litter(STATIC) + litter(RESOLV):
+        path.unlink()
+    assert kovanet("show").stdout.startswith("mode:       static\n")

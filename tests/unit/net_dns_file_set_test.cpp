@@ -107,6 +107,16 @@ TEST_F(net_dns_file_set, KOVANetDNSFileSet_fileThatIsNotOnTheDisk_fails) {
     expect_untouched();
 }
 
+TEST_F(net_dns_file_set, KOVANetDNSFileSet_directoryThatCannotBeSynced_hasTheNewFileAllTheSame) {
+    for (const char *operation : {"fsync", "open"}) {
+        write_file(kResolvConf, kOld);
+        rig.fail(operation, operation == std::string("fsync") ? 2 : 1);
+        EXPECT_OUTCOME(set(two), {.events = change_of(kBoth)});
+        EXPECT_EQ("nameserver\t10.0.0.1\nnameserver\tfe80::1\n", read_file(kResolvConf));
+        expect_files({"resolv.conf"});
+    }
+}
+
 TEST_F(net_dns_file_set, KOVANetDNSFileSet_directoryInTheFilesPlace_raisesOneEventAndFails) {
     std::filesystem::remove(kResolvConf);
     write_file(kResolvConf + "/inside", "kept");
