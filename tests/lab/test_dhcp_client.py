@@ -88,7 +88,8 @@ def test_lease_sets_address_route_info_and_resolver_source(server):
     assert info_of("lan0").stat().st_mode & 0o777 == 0o644
     assert SOURCE.read_text() == "nameserver\t192.168.50.53\nnameserver\t192.168.50.54\n"
     wait_for(lambda: routes("default") == ["default via 192.168.50.1 dev lan0"], what="the default route")
-    assert address in pathlib.Path("/tmp/dhcpv4.leases.lan0").read_text()
+    leases = pathlib.Path("/tmp/dhcpv4.leases.lan0")  # which the client writes anew in place
+    wait_for(lambda: address in leases.read_text(), what="the lease in its file")
     wait_for(lambda: RESOLV.read_text() == SOURCE.read_text(), 30, "the resolver file made of the source")
     run("ping", "-c", "1", "-W", "5", "192.168.50.1")
 
