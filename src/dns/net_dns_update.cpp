@@ -41,7 +41,8 @@ struct source_reader {
         for (int i = 0; i < count_of(lines); ++i) {
             char line[kLineSize];
             copy_text(line, KLIBCSzListGet(lines, i));
-            sscanf(KLIBCStrTrimSpace(line, line), "nameserver\t%s", server); // the line is no longer than the server
+            // cppcheck-suppress invalidscanf ; the line is no longer than the server
+            sscanf(KLIBCStrTrimSpace(line, line), "nameserver\t%s", server);
             if (push(servers, server) < 0) {
                 return -1;
             }

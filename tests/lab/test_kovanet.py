@@ -484,7 +484,8 @@ BAD = {
     "addr flush lan0": USAGE, "addr flush lan0 5": USAGE, "stats --count 2": USAGE, "stats --watch 0": USAGE,
     "stats --watch --count 0": USAGE, "stats --watch --count -1": USAGE, "stats --watch eth0": USAGE,
     "dns": USAGE, "dns set": USAGE, "dns mode": USAGE, "dns mode Static": USAGE, "dns mode static auto": USAGE,
-    "dns show more": USAGE, "dns update now": USAGE, "block set lan0 ha": USAGE, "block set lan0 ha yes": USAGE, "block set lan0 other on": USAGE, "check": USAGE,
+    "dns show more": USAGE, "dns update now": USAGE,
+    "block set lan0 ha": USAGE, "block set lan0 ha yes": USAGE, "block set lan0 other on": USAGE, "check": USAGE,
     "check address": USAGE, "check address 10.0.0.1 mask": USAGE, "card list --bogus": USAGE, "--bogus": USAGE,
     # values that are not acceptable
     "card set lan0 static 10.9.0.256/24": NO, "card set lan0 static 127.0.0.1/8": NO,
