@@ -187,7 +187,12 @@ def test_card_set_dhcp_and_back(stopped_clients, tmp_path):
     with DhcpServer("lan0", "10.9.0", folder=tmp_path):
         kovanet("card", "set", "lan0", "dhcp")
         assert keys("lan0")["BOOTPROTO"] == "dhcp"
-        card = wait_for(lambda: (seen := data("card", "show", "lan0"))["configured_address"] and seen, what="the lease")
+
+        def leased():  # the lease is noted before its address is set
+            card = data("card", "show", "lan0")
+            return card["configured_address"] and card["address"] and card
+
+        card = wait_for(leased, 30, "the lease")
         assert card["source"] == "dhcp"
         assert re.fullmatch(r"10\.9\.0\.(1[0-9]|20)", card["address"])
         assert (card["configured_address"], card["prefix"]) == (card["address"], 24)
