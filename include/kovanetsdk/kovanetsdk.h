@@ -9,6 +9,7 @@
 #include <kovanetsdk/bridge.h>
 #include <kovanetsdk/core.h>
 #include <kovanetsdk/dhcp.h>
+#include <kovanetsdk/dns.h>
 #include <kovanetsdk/events.h>
 #include <kovanetsdk/hostname.h>
 #include <kovanetsdk/iface.h>

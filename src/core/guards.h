@@ -123,11 +123,15 @@ inline string_hash make_hash(int capacity = kContainerCapacity) {
 /** Words of the named locks: the name in the upper bits, shared (5) or exclusive (6) in the lowest byte. */
 inline constexpr uint32_t kConfigShared = 0x105;
 inline constexpr uint32_t kConfigExclusive = 0x106;
+/** The name alone, as it is given back. */
+inline constexpr uint32_t kConfigName = 0x100;
+/** Longest wait for a named lock. */
+inline constexpr int kLockWaitSeconds = 5;
 
 /** Holds a named lock while it lives, if it could be had. */
 class named_lock {
 public:
-    explicit named_lock(uint32_t word) : word_(word), result_(KLIBCFileLock(word, kWaitSeconds)) {}
+    explicit named_lock(uint32_t word) : word_(word), result_(KLIBCFileLock(word, kLockWaitSeconds)) {}
     named_lock(const named_lock &) = delete;
     named_lock &operator=(const named_lock &) = delete;
     ~named_lock() {
@@ -141,7 +145,6 @@ public:
     [[nodiscard]] int result() const { return result_; }
 
 private:
-    static constexpr int kWaitSeconds = 5;
     uint32_t word_;
     int result_;
 };

@@ -11,6 +11,7 @@ import pytest
 from conftest import DhcpServer, addresses, is_up, processes, routes, run, wait_for
 
 SOURCE = pathlib.Path("/etc/iproute2/config/resolv4.conf")
+RESOLV = pathlib.Path("/etc/resolv.conf")
 SCRIPT = "/usr/kova/lib/dhcp-client-script"
 SERVERS = "--dhcp-option=option:dns-server,192.168.50.53,192.168.50.54"
 LINKS = ("lan0", "kx12")
@@ -18,6 +19,7 @@ LINKS = ("lan0", "kx12")
 
 @pytest.fixture(autouse=True)
 def no_client_left(keep):
+    keep(RESOLV)
     keep("/etc/sysconfig/network")
     keep("/etc/iproute2/config/static-route4.conf")
     yield
@@ -65,7 +67,6 @@ def assert_nothing_left(link):
 
 
 def test_lease_sets_address_route_info_and_resolver_source(server):
-    resolver = pathlib.Path("/etc/resolv.conf").read_bytes()
     start("lan0")
     wait_for(SOURCE.exists, what="the resolver source")
 
@@ -87,8 +88,9 @@ def test_lease_sets_address_route_info_and_resolver_source(server):
     assert info_of("lan0").stat().st_mode & 0o777 == 0o644
     assert SOURCE.read_text() == "nameserver\t192.168.50.53\nnameserver\t192.168.50.54\n"
     wait_for(lambda: routes("default") == ["default via 192.168.50.1 dev lan0"], what="the default route")
-    assert address in pathlib.Path("/tmp/dhcpv4.leases.lan0").read_text()
-    assert pathlib.Path("/etc/resolv.conf").read_bytes() == resolver
+    leases = pathlib.Path("/tmp/dhcpv4.leases.lan0")  # which the client writes anew in place
+    wait_for(lambda: address in leases.read_text(), what="the lease in its file")
+    wait_for(lambda: RESOLV.read_text() == SOURCE.read_text(), 30, "the resolver file made of the source")
     run("ping", "-c", "1", "-W", "5", "192.168.50.1")
 
 

@@ -67,7 +67,8 @@ def keys(name):
 
 def everything():
     """The network's state, as far as a refused command could have changed it."""
-    files = {path.name: path.read_text() for path in SCRIPTS.iterdir() if path.is_file()}
+    files = {path.name: path.read_text() for folder in (SCRIPTS, pathlib.Path("/etc")) for path in folder.iterdir()
+             if path.is_file() and path.name.startswith(("ifcfg-", "resolv.conf", "kovainfo.conf"))}
     shown = [run("ip", *words).stdout for words in (["-o", "addr"], ["-o", "link"], ["route"])]
     return os.uname().nodename, shown, files
 
@@ -187,8 +188,12 @@ def test_card_set_dhcp_and_back(stopped_clients, tmp_path):
     with DhcpServer("lan0", "10.9.0", folder=tmp_path):
         kovanet("card", "set", "lan0", "dhcp")
         assert keys("lan0")["BOOTPROTO"] == "dhcp"
-        # the address comes last
-        card = wait_for(lambda: (seen := data("card", "show", "lan0"))["address"] and seen, what="the lease")
+
+        def leased():  # the lease is noted before its address is set
+            card = data("card", "show", "lan0")
+            return card["configured_address"] and card["address"] and card
+
+        card = wait_for(leased, 30, "the lease")
         assert card["source"] == "dhcp"
         assert re.fullmatch(r"10\.9\.0\.(1[0-9]|20)", card["address"])
         assert (card["configured_address"], card["prefix"]) == (card["address"], 24)
@@ -484,6 +489,8 @@ BAD = {
     "card set lan0 dhcp 10.9.0.9/24": USAGE, "link up": USAGE, "link rename lan0": USAGE, "addr add lan0": USAGE,
     "addr flush lan0": USAGE, "addr flush lan0 5": USAGE, "stats --count 2": USAGE, "stats --watch 0": USAGE,
     "stats --watch --count 0": USAGE, "stats --watch --count -1": USAGE, "stats --watch eth0": USAGE,
+    "dns": USAGE, "dns set": USAGE, "dns mode": USAGE, "dns mode Static": USAGE, "dns mode static auto": USAGE,
+    "dns show more": USAGE, "dns update now": USAGE,
     "block set lan0 ha": USAGE, "block set lan0 ha yes": USAGE, "block set lan0 other on": USAGE, "check": USAGE,
     "hostname": USAGE, "hostname set": USAGE, "hostname show more": USAGE, "hostname set a b": USAGE,
     "service": USAGE, "service notify": USAGE, "service notify other": USAGE, "service notify ip action": USAGE,
@@ -499,7 +506,8 @@ BAD = {
     "addr add lan0 10.9.0.9/33": NO, "addr add lan0 10.9.0.9/0": NO, "addr add lan0 300.1.1.1/24": NO,
     "addr add lan0 fe80::1": NO, "addr add lan0 fe80::1/129": NO, "addr add lan0 fe80:::1/64": NO,
     "addr del lan0 10.9.0.9": NO, "addr list a/b": NO, "stats a/b": NO, "block show a/b": NO,
-    "block set ../lan0 ha on": NO, "hostname set a/b": NO, "hostname set .a": NO,
+    "block set ../lan0 ha on": NO, "hostname set a/b": NO, "hostname set .a": NO, "dns set 1.2.3": NO,
+    "dns set 10.9.0.1 1.2.3": NO, "dns set 10.9.0.1 host": NO, "dns set fe80::1%lan0": NO,
     # what is not there
     "card show nope": NOT_FOUND, "card show lo": NOT_FOUND, "card set nope dhcp": NOT_FOUND,
     "card set nope static 10.9.0.9/24": NOT_FOUND, "card set lo dhcp": NOT_FOUND, "link show nope": NOT_FOUND,
@@ -537,7 +545,8 @@ def test_a_mistyped_word_gets_a_suggestion():
 @pytest.mark.parametrize("words", ["card set lan0 dhcp", "card set lan0 static 10.9.0.9/24", "link up lan0",
                                    "link down lan0", "link rename lan0 lan1", "addr add lan0 10.9.0.9/24",
                                    "addr del lan0 10.9.0.9/24", "addr flush lan0 4", "block set lan0 ha on",
-                                   "hostname set other", "service notify ip"])  # fmt: skip
+                                   "dns set 10.9.0.1", "dns mode auto", "dns update", "hostname set other",
+                                   "service notify ip"])  # fmt: skip
 def test_changes_need_root(words):
     before = everything()
     done = run("unshare", "--user", KOVANET, *words.split(), status=NO_PERMISSION)
@@ -547,14 +556,15 @@ def test_changes_need_root(words):
 
 def test_reading_needs_no_root(addressed):
     for words in (["card", "list", "--json"], ["link", "show", "--json"], ["addr", "list", "--json"],
-                  ["hostname", "show", "--json"]):
+                  ["dns", "show", "--json"], ["hostname", "show", "--json"]):
         assert run("unshare", "--user", KOVANET, *words).stdout == kovanet(*words).stdout
 
 
 @pytest.mark.parametrize("command,section", [
     ("card list", "kovanet card list"), ("card show lan0", "kovanet card list"), ("link show", "kovanet link show"),
     ("addr list", "kovanet addr list"), ("stats", "kovanet stats"), ("block show lan0", "kovanet block show"),
-    ("hostname show", "kovanet hostname show"), ("check hostname nas01", "kovanet check"),
+    ("dns show", "kovanet dns show"), ("hostname show", "kovanet hostname show"),
+    ("check hostname nas01", "kovanet check"),
 ])  # fmt: skip
 def test_json_has_exactly_the_documented_fields(addressed, command, section):
     printed = data(*command.split())
@@ -633,7 +643,8 @@ def test_the_name_of_an_interface_cannot_write_to_the_terminal():
 
 COMMANDS = ["", "card", "card list", "card show", "card set", "link", "link show", "link up", "link down", "link rename",
             "addr", "addr list", "addr add", "addr del", "addr flush", "stats", "block", "block show", "block set",
-            "hostname", "hostname show", "hostname set", "service", "service notify",
+            "dns", "dns show", "dns set", "dns mode", "dns update", "hostname", "hostname show", "hostname set",
+            "service", "service notify",
             "check", "check address", "check mask", "check prefix", "check ipv6", "check hostname", "check domain"]  # fmt: skip
 
 
@@ -648,7 +659,7 @@ def test_help_has_examples_and_exit_codes(words):
 
 def test_the_examples_of_the_help_are_understood():
     """Every example that only reads works as it stands."""
-    for name in ("card", "link", "addr", "hostname", "check"):
+    for name in ("card", "link", "addr", "dns", "hostname", "check"):
         examples = re.findall(r"^  kovanet (.+)$", kovanet(name, "--help").stdout, re.MULTILINE)
         assert examples
         for example in examples:

@@ -6,6 +6,7 @@
 
 #include <cstdio>
 #include <dlfcn.h>
+#include <sys/stat.h>
 #include <unistd.h>
 
 using kova_test::can_fail;
@@ -27,7 +28,8 @@ int failure(int error) {
     return -1;
 }
 
-const bool known[] = {can_fail("fsync"), can_fail("fclose"), can_fail("rename"), can_fail("sethostname")};
+const bool known[] = {can_fail("fsync"), can_fail("fclose"), can_fail("rename"), can_fail("chmod"),
+                      can_fail("sethostname")};
 
 } // namespace
 
@@ -45,6 +47,10 @@ extern "C" int fclose(FILE *stream) {
 
 extern "C" int rename(const char *from, const char *to) noexcept {
     return is_failing("rename") ? failure(EBUSY) : real<int(const char *, const char *)>("rename")(from, to);
+}
+
+extern "C" int chmod(const char *path, mode_t mode) noexcept {
+    return is_failing("chmod") ? failure(EPERM) : real<int(const char *, mode_t)>("chmod")(path, mode);
 }
 
 extern "C" int sethostname(const char *name, size_t size) noexcept {

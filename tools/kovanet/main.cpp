@@ -49,6 +49,11 @@ constexpr object kObjects[] = {
     {"block", "reasons that keep an interface from changes", add_block,
      "  kovanet block show eth0\n"
      "  kovanet block set eth0 ha on"},
+    {"dns", "name servers, and where they come from", add_dns,
+     "  kovanet dns show\n"
+     "  kovanet dns set 192.168.1.1 2001:db8::53\n"
+     "  kovanet dns mode auto\n"
+     "  kovanet dns update"},
     {"hostname", "the name of the appliance", add_hostname,
      "  kovanet hostname show\n"
      "  kovanet hostname set nas01"},

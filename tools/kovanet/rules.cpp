@@ -151,6 +151,13 @@ refusal refuse_domain(const std::string &name) {
     return "a domain name holds no blanks, control characters or any of \"(),:;<>[\\]@";
 }
 
+refusal refuse_server(const std::string &address) {
+    if (KOVANetGetAddrType(address.c_str()) != 0) {
+        return std::nullopt;
+    }
+    return "a name server is an IPv4 address, four numbers with dots between them, or an IPv6 address";
+}
+
 refusal refuse_interface_name(const std::string &name) {
     if (name.empty() || name.size() > 15) {
         return "an interface name has 1 to 15 characters";

@@ -24,6 +24,8 @@ refusal refuse_hostname(const std::string &name);
 /** What may be set as the host name, which also has longer names, and with a domain. */
 refusal refuse_new_hostname(const std::string &name);
 refusal refuse_domain(const std::string &name);
+/** A name server: an address of either family. */
+refusal refuse_server(const std::string &address);
 refusal refuse_interface_name(const std::string &name);
 
 /** Ends the program when there is a refusal. */
