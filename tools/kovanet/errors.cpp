@@ -23,7 +23,7 @@ constexpr known_code kKnownCodes[] = {
     {NET_ERR_UNKNOWN, "NET_ERR_UNKNOWN", kSeeLog},
     {NET_ERR_OUT_OF_MEMORY, "NET_ERR_OUT_OF_MEMORY", "free some memory and try again"},
     {NET_ERR_LOCK, "NET_ERR_LOCK", "another program is changing the network; try again"},
-    {NET_ERR_FILE_OPEN, "NET_ERR_FILE_OPEN", "check that the interface has its file and that it can be read"},
+    {NET_ERR_FILE_OPEN, "NET_ERR_FILE_OPEN", "check that the file is there and can be read"},
     {NET_ERR_FILE_READ, "NET_ERR_FILE_READ", kSeeLog},
     {NET_ERR_FILE_WRITE, "NET_ERR_FILE_WRITE", "check the free space and that the file system can be written"},
     {NET_ERR_BAD_PARAMETER, "NET_ERR_BAD_PARAMETER", "the library refuses a value; check the command"},
