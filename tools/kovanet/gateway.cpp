@@ -108,7 +108,8 @@ std::string interface_to(const std::string &gateway) {
     for (const IFINFO &info : all_interfaces()) {
         const bool is_usable = (info.nFlags & IFF_UP) != 0 && *info.szIP != '\0';
         if (is_usable && KOVANetIsSameSubnet(info.szIP, gateway.c_str(), info.szMask) == 1) {
-            require(what, refuse_address_and_mask(gateway, info.szMask));
+            require(what, gateway == info.szIP ? "it is the address of " + std::string(info.szIfname)
+                                               : refuse_address_and_mask(gateway, info.szMask));
             return info.szIfname;
         }
     }
