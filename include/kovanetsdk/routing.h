@@ -2,7 +2,7 @@
  * @file
  * IPv4 default gateway, as the kernel uses it and as it is configured, and the route of each interface's own subnet.
  *
- * Only NetRoutetableCheck takes a lock: whoever changes something holds 0x106 around it. A failure is logged and,
+ * Only NetRoutetableCheck works under a lock: whoever changes something holds 0x106 around it. A failure is logged and,
  * unless a call says otherwise, leaves in the register what the step that failed has left there.
  */
 #ifndef KOVANETSDK_ROUTING_H
@@ -49,7 +49,8 @@ int KOVANetDefaultGatewaySetConf(const char *szGateway);
  * Replaces the kernel's default route with /sbin/route: "delete default", whose result is not looked at, then "add
  * default gw". When the second fails the old route is gone. The configuration is not touched.
  * @param szGateway  address of a host on a subnet of this machine; NULL or "" only removes the default route
- * @return 0; -1 with 0x2A00 when the route cannot be added
+ * @return 0; -1 with 0xD00, nothing changed, for a text that begins with "-", or with 0x2A00 when the route cannot be
+ *         added
  */
 int KOVANetDefaultGatewaySet(const char *szGateway);
 
@@ -72,8 +73,9 @@ enum { NET_ROUTE_ADD = 0, NET_ROUTE_DELETE = 1 };
 int NetRoutetableEdit(int type, const char *szIP, const char *szNetmask, const char *szIfname);
 /**
  * NetRoutetableEdit with the configured address of an interface: keys IPADDR and NETMASK of its file, or with DHCP
- * (BlKOVALnxIsDHCP) of its lease /etc/dhclient/ipv4/dhcpcd-<name>.info. A member of the virtual switch's bonds named
- * "eth..." stands for its switch port "ovs_eth...".
+ * (BlKOVALnxIsDHCP, which holds 0x105 while it asks and repairs the file) of its lease
+ * /etc/dhclient/ipv4/dhcpcd-<name>.info. A member of the virtual switch's bonds named "eth..." stands for its switch
+ * port "ovs_eth...".
  *
  * Does nothing for an interface that is not of kind 2 (KLIBNetGetInterfaceInfo: up, no member of a bond or bridge ...),
  * for any other type, and adds nothing to an interface with DHCP, in a bridge or in a bond.

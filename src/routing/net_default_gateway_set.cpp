@@ -5,6 +5,10 @@
 
 extern "C" int KOVANetDefaultGatewaySet(const char *szGateway) {
     using namespace kova;
+    // the tool would take it for an option and succeed without a route
+    if (szGateway != nullptr && refuses(HERE, *szGateway != '-', "'-' != *szGateway")) {
+        return -1;
+    }
     (void)run("/sbin/route", "delete", "default"); // there may be none
     if (szGateway == nullptr || *szGateway == '\0') {
         return 0;

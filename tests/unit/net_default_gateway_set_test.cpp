@@ -49,7 +49,14 @@ TEST_F(net_default_gateway_set, KOVANetDefaultGatewaySet_routeThatCannotBeAdded_
 }
 
 TEST_F(net_default_gateway_set, KOVANetDefaultGatewaySet_oddText_isOneArgument) {
-    for (const std::string &text : texts{"a b", "; reboot", "$(reboot)", "-h", "10.0.0.1\n", long_text(4096)}) {
+    for (const std::string &text :
+         texts{"a b", "; reboot", "$(reboot)", "1-h", "10.0.0.1\n", long_text(63), long_text(64), long_text(4096)}) {
         EXPECT_OUTCOME(set(text.c_str()), {.commands = {kDelete, kAdd + text}});
+    }
+}
+
+TEST_F(net_default_gateway_set, KOVANetDefaultGatewaySet_option_isRefusedBeforeTheOldRouteIsGone) {
+    for (const char *szGateway : {"-", "-h", "--help", "-10.0.0.1"}) {
+        EXPECT_OUTCOME(set(szGateway), refusal("net_default_gateway_set", "'-' != *szGateway"));
     }
 }

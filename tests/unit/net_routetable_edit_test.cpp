@@ -53,6 +53,14 @@ TEST_F(net_routetable_edit, NetRoutetableEdit_nameThatIsNone_isTold) {
     }
 }
 
+TEST_F(net_routetable_edit, NetRoutetableEdit_longName_isLeftToTheTool) {
+    for (const size_t length : {15U, 63U, 64U, 235U}) {
+        const std::string name = long_text(length, 'e');
+        EXPECT_OUTCOME(edit(kDelete, "192.168.1.10", "255.255.255.0", name.c_str()),
+                       {.commands = {"/sbin/ip route del 192.168.1.0/24 dev " + name + " src 192.168.1.10"}});
+    }
+}
+
 TEST_F(net_routetable_edit, NetRoutetableEdit_anyOtherType_isTold) {
     for (const int type : {2, 3, -1, INT_MAX, INT_MIN}) {
         EXPECT_OUTCOME(edit(type), told("error type"));

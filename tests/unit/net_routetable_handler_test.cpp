@@ -51,7 +51,7 @@ TEST_F(net_routetable_handler, NetRoutetableHandler_nameThatIsNone_isRefused) {
 
 TEST_F(net_routetable_handler, NetRoutetableHandler_longestName_isNoInterface) {
     kernel.add("eth0");
-    for (const size_t length : {15U, 16U, 17U, 200U}) {
+    for (const size_t length : {15U, 16U, 17U, 63U, 64U, 235U}) {
         EXPECT_OUTCOME(handle(kDelete, long_text(length, 'e').c_str()),
                        {.result = 0, .code = 0xBC00, .unit = "net_is_dev_type_match"});
     }

@@ -105,11 +105,14 @@ void change(const std::string &interface, const std::string &gateway) {
 /** The interface that leads to a gateway. Ends the program when there is none. */
 std::string interface_to(const std::string &gateway) {
     const std::string what = "gateway \"" + gateway + "\"";
+    char own[IFNAMSIZ] = "";
+    if (KOVANetIP2If(gateway.c_str(), own, sizeof own) == 1) {
+        throw failure{kNo, what + " is not valid: it is the address of " + own};
+    }
     for (const IFINFO &info : all_interfaces()) {
         const bool is_usable = (info.nFlags & IFF_UP) != 0 && *info.szIP != '\0';
         if (is_usable && KOVANetIsSameSubnet(info.szIP, gateway.c_str(), info.szMask) == 1) {
-            require(what, gateway == info.szIP ? "it is the address of " + std::string(info.szIfname)
-                                               : refuse_address_and_mask(gateway, info.szMask));
+            require(what, refuse_address_and_mask(gateway, info.szMask));
             return info.szIfname;
         }
     }
