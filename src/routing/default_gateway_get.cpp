@@ -25,7 +25,9 @@ struct route {
 
 bool read_route(const line_text &line, route &found) {
     int(&rest)[6] = found.unused;
-    // NOLINTNEXTLINE(cert-err34-c): the device has room for a whole line, and numbers too large match no default route
+    // the device has room for a whole line, and numbers too large match no default route
+    // cppcheck-suppress invalidscanf
+    // NOLINTNEXTLINE(cert-err34-c)
     return sscanf(line, "%s%lx%lx%X%d%d%d%lx%d%d%d", found.device, &found.destination, &found.gateway, &found.flags,
                   &rest[0], &rest[1], &rest[2], &found.mask, &rest[3], &rest[4], &rest[5]) == 11;
 }
