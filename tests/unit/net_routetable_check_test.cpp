@@ -1,4 +1,5 @@
 #include "support/fake_kernel.h"
+#include "support/memory.h"
 
 #include <kovanetsdk/routing.h>
 #include <numeric>
@@ -79,6 +80,7 @@ TEST_F(net_routetable_check, NetRoutetableCheck_interfacesThatCannotBeListed_fai
 }
 
 TEST_F(net_routetable_check, NetRoutetableCheck_withoutMemory_fails) {
+    NEEDS_OWN_ALLOCATOR();
     add("eth0", "10.0.0", kUnlinked);
     add("eth1", "10.0.1", kUnlinked);
     rig.fail("calloc");
