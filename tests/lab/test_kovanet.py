@@ -17,6 +17,7 @@ from conftest import DhcpServer, on_other_side, processes, run, wait_for
 
 KOVANET = "/usr/bin/kovanet"
 SCRIPTS = pathlib.Path("/etc/sysconfig/network-scripts")
+NETWORK = pathlib.Path("/etc/sysconfig/network")
 DOCUMENT = pathlib.Path(__file__).resolve().parents[2] / "docs" / "kovanet-json.md"
 DONE, NO, USAGE, NOT_FOUND, CALL_FAILED, NO_PERMISSION = range(6)
 CONFIG_EXCLUSIVE, CONFIG_NAME = 0x106, 0x100
@@ -61,14 +62,19 @@ def interface_file(name):
     return SCRIPTS / f"ifcfg-{name}"
 
 
+def keys_of(path):
+    return dict(line.split("=", 1) for line in path.read_text().splitlines() if "=" in line)
+
+
 def keys(name):
-    return dict(line.split("=", 1) for line in interface_file(name).read_text().splitlines())
+    return keys_of(interface_file(name))
 
 
 def everything():
     """The network's state, as far as a refused command could have changed it."""
     files = {path.name: path.read_text() for folder in (SCRIPTS, pathlib.Path("/etc")) for path in folder.iterdir()
              if path.is_file() and path.name.startswith(("ifcfg-", "resolv.conf", "kovainfo.conf"))}
+    files["network"] = NETWORK.read_text() if NETWORK.exists() else ""
     shown = [run("ip", *words).stdout for words in (["-o", "addr"], ["-o", "link"], ["route"])]
     return os.uname().nodename, shown, files
 
@@ -298,7 +304,9 @@ def test_addr_flush_removes_one_family(addressed):
     assert "2001:db8:9::7/64" in kernel_addresses("lan0", "inet6")
 
 
-@pytest.mark.parametrize("words", [("addr", "add", "lan0", "10.9.0.9/24"), ("card", "set", "lan0", "dhcp")])
+@pytest.mark.parametrize("words", [("addr", "add", "lan0", "10.9.0.9/24"), ("card", "set", "lan0", "dhcp"),
+                                   ("gateway", "set", "10.9.0.1"), ("gateway", "clear"), ("route", "del", "lan0"),
+                                   ("route", "check")])  # fmt: skip
 def test_changes_wait_for_the_configuration_lock(words):
     before = everything()
     with held_configuration_lock():
@@ -397,6 +405,239 @@ def test_stats_watch_outlives_an_interface():
     assert new["rx_bytes_per_second"] is None
 
 
+# ---- gateway --------------------------------------------------------------------------------------------------------
+
+NO_GATEWAY = {"gateway": None, "interface": None, "configured_gateway": None}
+
+
+@pytest.fixture
+def routers(addressed, keep):
+    """Two subnets with a router each: 10.9.0.1 on lan0, 10.8.0.1 on eth0. No gateway yet."""
+    keep(NETWORK).write_text("# kept\n")
+    run("ip", "addr", "add", "10.8.0.7/24", "dev", "eth0")
+    return {"eth0": "10.8.0.1", "lan0": "10.9.0.1"}
+
+
+@pytest.fixture
+def gateway_events(tmp_path):
+    """gateway_events(): what a plug-in was told since it was asked last, an event as its phase, its arguments and the
+    default gateway at that moment."""
+    plugin = pathlib.Path("/usr/kova/plugins/net/gateway_config_change/50-note")
+    plugin.parent.mkdir(parents=True, exist_ok=True)
+    noted = tmp_path / "noted"
+    noted.touch()
+    plugin.write_text("#!/bin/sh\n"
+                      'echo "$PLUGIN_PHASE $TYPE $INTERFACE [$GATEWAY_OLD] [$GATEWAY_NEW]'
+                      f' $(ip route show default | cut -d" " -f3)" >>{noted}\n')
+    plugin.chmod(0o755)
+
+    def told():
+        lines = noted.read_text().splitlines()
+        noted.write_text("")
+        return lines
+
+    yield told
+    plugin.unlink()
+
+
+def default_gateway():
+    """Gateway and interface of the default route as iproute2 has them."""
+    found = ip("route", "show", "default")
+    return (found[0]["gateway"], found[0]["dev"]) if found else (None, None)
+
+
+def test_gateway_set_and_clear_change_kernel_and_file(routers, gateway_events):
+    assert data("gateway", "show") == NO_GATEWAY
+    before = ""
+    for name, router in routers.items():
+        kovanet("gateway", "set", router)
+        assert default_gateway() == (router, name)
+        assert NETWORK.read_text() == f"# kept\nGATEWAY={router}\n"
+        assert data("gateway", "show") == {"gateway": router, "interface": name, "configured_gateway": router}
+        assert gateway_events() == [f"PRE ipv4 {name} [{before}] [{router}] {before}",
+                                    f"POST ipv4 {name} [{before}] [{router}] {router}"]
+        before = router
+    kovanet("gateway", "clear")
+    assert default_gateway() == (None, None) and NETWORK.read_text() == "# kept\n"
+    assert data("gateway", "show") == NO_GATEWAY
+    assert gateway_events() == ["PRE ipv4 lan0 [10.9.0.1] [] 10.9.0.1", "POST ipv4 lan0 [10.9.0.1] [] "]
+    kovanet("gateway", "clear")
+
+
+def test_gateway_show_tells_both_gateways_where_they_differ(routers):
+    run("ip", "route", "add", "default", "via", routers["lan0"], "metric", "7")
+    NETWORK.write_text('GATEWAY="router"\n')
+    assert data("gateway", "show") == {"gateway": "10.9.0.1", "interface": "lan0", "configured_gateway": "router"}
+    assert kovanet("gateway", "show").stdout == "gateway:    10.9.0.1\ninterface:  lan0\nconfigured: router\n"
+
+
+def test_gateway_show_shows_no_control_characters_and_the_beginning_of_a_long_text(routers):
+    NETWORK.write_text("GATEWAY=\x1b[31m\n")
+    assert "configured: ?[31m\n" in kovanet("gateway", "show").stdout
+    NETWORK.write_text(f"GATEWAY={'x' * 4096}\n")
+    assert data("gateway", "show")["configured_gateway"] == "x" * 255
+    NETWORK.write_bytes(b"GATEWAY=\xff\n")
+    assert data("gateway", "show")["configured_gateway"] == "\ufffd"
+
+
+def test_gateway_takes_a_missing_file_as_an_empty_one(routers):
+    NETWORK.unlink()
+    assert data("gateway", "show") == NO_GATEWAY
+    kovanet("gateway", "clear")
+    assert not NETWORK.exists()
+    kovanet("gateway", "set", "10.8.0.1")
+    assert NETWORK.read_text() == "GATEWAY=10.8.0.1\n"
+
+
+def test_gateway_accepts_every_writing_of_an_address(routers):
+    for given, meant in (("10.010.0x0.1", "10.8.0.1"), ("012.9.0.1", "10.9.0.1")):
+        kovanet("gateway", "set", given)
+        assert default_gateway()[0] == keys_of(NETWORK)["GATEWAY"] == meant
+
+
+@pytest.mark.parametrize("address,reason", [
+    ("10.9.0.7", "it is the address of lan0"), ("10.8.0.7", "it is the address of eth0"),
+    ("10.9.0.255", "the address is the broadcast address of its network"),
+    ("10.7.0.1", "no interface that is up has an address in its subnet; see kovanet addr list"),
+])  # fmt: skip
+def test_gateway_that_can_be_no_router_is_refused_with_the_reason(routers, gateway_events, address, reason):
+    kovanet("gateway", "set", "10.9.0.1")
+    gateway_events()
+    assert complaint("gateway", "set", address, status=NO) == f'gateway "{address}" is not valid: {reason}'
+    assert default_gateway() == ("10.9.0.1", "lan0") and NETWORK.read_text() == "# kept\nGATEWAY=10.9.0.1\n"
+    assert gateway_events() == []
+
+
+def test_gateway_of_an_interface_that_is_down_is_refused(routers):
+    run("ip", "link", "set", "eth0", "down")
+    assert "no interface that is up" in complaint("gateway", "set", "10.8.0.1", status=NO)
+
+
+@pytest.mark.parametrize("words", ["gateway show", "gateway set 10.8.0.1", "gateway clear"])
+def test_gateway_file_that_cannot_be_read_is_a_failure_that_changes_nothing(routers, gateway_events, words):
+    run("ip", "route", "add", "default", "via", "10.9.0.1")
+    NETWORK.unlink()
+    NETWORK.mkdir()
+    try:
+        assert "NET_ERR_FILE_OPEN (0x900)" in complaint(*words.split(), status=CALL_FAILED)
+    finally:
+        NETWORK.rmdir()
+    assert default_gateway() == ("10.9.0.1", "lan0") and gateway_events() == []
+
+
+def test_gateway_that_the_kernel_refuses_leaves_the_old_one(routers, gateway_events):
+    kovanet("gateway", "set", "10.9.0.1")
+    gateway_events()
+    run("ip", "route", "del", "10.8.0.0/24", "dev", "eth0")
+    text = complaint("gateway", "set", "10.8.0.1", status=CALL_FAILED)
+    assert text.startswith("cannot set the default gateway to 10.8.0.1: NET_ERR_EXEC (0x2A00) in net_default_gateway_set; ")
+    assert default_gateway() == ("10.9.0.1", "lan0") and NETWORK.read_text() == "# kept\nGATEWAY=10.9.0.1\n"
+    assert gateway_events() == ["PRE ipv4 eth0 [10.9.0.1] [10.8.0.1] 10.9.0.1",
+                                "POST ipv4 eth0 [10.9.0.1] [10.9.0.1] 10.9.0.1"]
+
+
+@pytest.mark.parametrize("words", ["gateway set 10.8.0.1", "gateway clear"])
+@pytest.mark.parametrize("before", ["10.9.0.1", None])
+def test_gateway_file_that_cannot_be_written_leaves_the_old_one(routers, gateway_events, words, before):
+    if before:
+        kovanet("gateway", "set", before)
+    else:
+        NETWORK.write_text("GATEWAY=10.9.0.1\n")
+    gateway_events()
+    text = NETWORK.read_text()
+    run("mount", "--bind", NETWORK.parent, NETWORK.parent)
+    try:
+        run("mount", "-o", "remount,bind,ro", NETWORK.parent)
+        told = complaint(*words.split(), status=CALL_FAILED)
+    finally:
+        run("umount", NETWORK.parent)
+    assert "cannot store the default gateway in /etc/sysconfig/network: " in told
+    assert default_gateway()[0] == before and NETWORK.read_text() == text
+    assert [event.split(" ")[3:5] for event in gateway_events()] == [
+        ["[10.9.0.1]", "[10.8.0.1]" if "set" in words else "[]"], ["[10.9.0.1]", "[10.9.0.1]"]]
+
+
+def test_gateway_changes_whatever_a_plug_in_makes_of_it(routers, gateway_events):
+    plugin = pathlib.Path("/usr/kova/plugins/net/gateway_config_change/10-fails")
+    plugin.write_text("#!/bin/sh\nexit 1\n")
+    plugin.chmod(0o755)
+    try:
+        kovanet("gateway", "set", "10.9.0.1")
+    finally:
+        plugin.unlink()
+    assert default_gateway() == ("10.9.0.1", "lan0") and len(gateway_events()) == 2
+
+
+# ---- route ----------------------------------------------------------------------------------------------------------
+
+
+def route_devices(subnet):
+    """The interfaces that a subnet's routes lead over, the used one first."""
+    return [route["dev"] for route in ip("route", "show", subnet)]
+
+
+@pytest.fixture
+def one_subnet(addressed):
+    """eth0 in lan0's subnet."""
+    run("ip", "addr", "add", "10.9.0.8/24", "dev", "eth0")
+    interface_file("eth0").write_text("DEVICE=eth0\nBOOTPROTO=static\nIPADDR=10.9.0.8\nNETMASK=255.255.255.0\n")
+    assert route_devices("10.9.0.0/24") == ["lan0", "eth0"]
+
+
+def test_route_del_and_add(one_subnet):
+    kovanet("route", "del", "eth0")
+    assert route_devices("10.9.0.0/24") == ["lan0"]
+    kovanet("route", "add", "eth0")
+    assert route_devices("10.9.0.0/24") == ["eth0", "lan0"]
+    kovanet("route", "del", "lan0")
+    kovanet("route", "del", "lan0")
+    assert route_devices("10.9.0.0/24") == ["eth0"]
+
+
+def test_route_of_another_address(addressed):
+    run("ip", "addr", "add", "10.7.5.6/16", "dev", "lan0", "noprefixroute")
+    kovanet("route", "add", "lan0", "10.7.5.6/16")
+    [route] = ip("route", "show", "10.7.0.0/16")
+    assert (route["dev"], route["prefsrc"]) == ("lan0", "10.7.5.6")
+    kovanet("route", "del", "lan0", "10.7.05.0x6/16")
+    assert ip("route", "show", "10.7.0.0/16") == []
+    assert route_devices("10.9.0.0/24") == ["lan0"], "that of the configured address stays"
+
+
+def test_route_check_clears_the_interface_without_link(one_subnet):
+    on_other_side("ip", "link", "set", "lan0", "down")
+    try:
+        wait_for(lambda: link_of("lan0")["operstate"] == "DOWN", what="the loss of carrier")
+        kovanet("route", "check")
+        assert route_devices("10.9.0.0/24") == ["eth0"]
+    finally:
+        on_other_side("ip", "link", "set", "lan0", "up")
+
+
+def test_route_tells_why_there_is_none(addressed):
+    run("ip", "link", "set", "eth0", "down")
+    assert complaint("route", "add", "eth0", status=NO) == (
+        "eth0 is down and can have no route; first: kovanet link up eth0")
+    assert "eth0 is down" in complaint("route", "add", "eth0", "10.6.0.1/24", status=NO)
+    assert complaint("route", "add", "lo", status=NO).startswith("lo has no route of its own: ")
+    interface_file("lan0").write_text("BOOTPROTO=dhcp\n")
+    assert complaint("route", "add", "lan0", status=NO) == "lan0 uses DHCP: its client sets the route"
+    assert complaint("route", "del", "lan0", status=CALL_FAILED).startswith("cannot delete the route of lan0: ")
+    interface_file("lan0").write_text("BOOTPROTO=static\n")
+    for verb, text in (("add", "cannot add the route of lan0: "), ("del", "cannot delete the route of lan0: ")):
+        assert complaint("route", verb, "lan0", status=CALL_FAILED).startswith(text)
+    assert route_devices("10.9.0.0/24") == ["lan0"]
+    run("ip", "link", "set", "lan0", "down")
+    assert complaint("route", "check", status=CALL_FAILED).startswith("cannot delete the routes of the interfaces ")
+
+
+def test_route_shows_what_the_tools_refuse_with_verbose(one_subnet):
+    kovanet("route", "del", "eth0")
+    told = run(KOVANET, "route", "add", "eth0", "--verbose").stderr
+    assert re.search(r"kovanet\[\d+\]: net_routetable_edit:\d+ eth0 ip route add failed, might be the same subnet, "
+                     r"instead of route\n", told)
+
+
 # ---- block ----------------------------------------------------------------------------------------------------------
 
 
@@ -489,6 +730,9 @@ BAD = {
     "card set lan0 dhcp 10.9.0.9/24": USAGE, "link up": USAGE, "link rename lan0": USAGE, "addr add lan0": USAGE,
     "addr flush lan0": USAGE, "addr flush lan0 5": USAGE, "stats --count 2": USAGE, "stats --watch 0": USAGE,
     "stats --watch --count 0": USAGE, "stats --watch --count -1": USAGE, "stats --watch eth0": USAGE,
+    "gateway": USAGE, "gateway set": USAGE, "gateway set 10.9.0.1 lan0": USAGE, "gateway show lan0": USAGE,
+    "gateway clear 10.9.0.1": USAGE, "gateway del": USAGE, "route": USAGE, "route add": USAGE, "route del": USAGE,
+    "route check lan0": USAGE, "route add lan0 10.9.0.7/24 more": USAGE, "route add lan0 --dev": USAGE,
     "dns": USAGE, "dns set": USAGE, "dns mode": USAGE, "dns mode Static": USAGE, "dns mode static auto": USAGE,
     "dns show more": USAGE, "dns update now": USAGE,
     "block set lan0 ha": USAGE, "block set lan0 ha yes": USAGE, "block set lan0 other on": USAGE, "check": USAGE,
@@ -506,8 +750,14 @@ BAD = {
     "addr add lan0 10.9.0.9/33": NO, "addr add lan0 10.9.0.9/0": NO, "addr add lan0 300.1.1.1/24": NO,
     "addr add lan0 fe80::1": NO, "addr add lan0 fe80::1/129": NO, "addr add lan0 fe80:::1/64": NO,
     "addr del lan0 10.9.0.9": NO, "addr list a/b": NO, "stats a/b": NO, "block show a/b": NO,
-    "block set ../lan0 ha on": NO, "hostname set a/b": NO, "hostname set .a": NO, "dns set 1.2.3": NO,
+    "hostname set a/b": NO, "hostname set .a": NO, "dns set 1.2.3": NO,
     "dns set 10.9.0.1 1.2.3": NO, "dns set 10.9.0.1 host": NO, "dns set fe80::1%lan0": NO,
+    "block set ../lan0 ha on": NO, "gateway set router": NO, "gateway set 10.9.0.256": NO, "gateway set 10.9.0.1/24": NO,
+    "gateway set fe80::1": NO, "gateway set 127.0.0.1": NO, "gateway set 172.16.0.1": NO, "gateway set 0.0.0.0": NO,
+    "gateway set -- -h": NO, f"gateway set {'x' * 4096}": NO, "route add ../lan0": NO, "route del seventeen-letters": NO,
+    f"route add {'n' * 63}": NO, f"route del {'n' * 64}": NO, f"route add {'n' * 4096}": NO, "route add lo": NO,
+    "route add lan0 10.9.0.7": NO, "route add lan0 10.9.0.7/33": NO, "route del lan0 10.9.0.7/0": NO,
+    "route del lan0 fe80::1/64": NO, "route add lan0 10.9.0.300/24": NO,
     # what is not there
     "card show nope": NOT_FOUND, "card show lo": NOT_FOUND, "card set nope dhcp": NOT_FOUND,
     "card set nope static 10.9.0.9/24": NOT_FOUND, "card set lo dhcp": NOT_FOUND, "link show nope": NOT_FOUND,
@@ -515,11 +765,12 @@ BAD = {
     "addr list nope": NOT_FOUND, "addr add nope 10.9.0.9/24": NOT_FOUND, "addr del nope 10.9.0.9/24": NOT_FOUND,
     "addr del lan0 10.9.0.9/24": NOT_FOUND, "addr del lan0 2001:db8::9/64": NOT_FOUND,
     "addr flush nope 4": NOT_FOUND, "stats nope": NOT_FOUND, "stats eth0 nope --watch": NOT_FOUND,
+    "route add nope": NOT_FOUND, "route del nope": NOT_FOUND, "route del nope 10.9.0.7/24": NOT_FOUND,
     "block show nope": NOT_FOUND, "block set nope ha on": NOT_FOUND,
 }  # fmt: skip
 
 
-@pytest.mark.parametrize("words,status", BAD.items())
+@pytest.mark.parametrize("words,status", BAD.items(), ids=[words[:40] for words in BAD])
 def test_bad_input_has_its_exit_code_and_changes_nothing(words, status):
     before = everything()
     text = complaint(*words.split(), status=status)
@@ -545,8 +796,9 @@ def test_a_mistyped_word_gets_a_suggestion():
 @pytest.mark.parametrize("words", ["card set lan0 dhcp", "card set lan0 static 10.9.0.9/24", "link up lan0",
                                    "link down lan0", "link rename lan0 lan1", "addr add lan0 10.9.0.9/24",
                                    "addr del lan0 10.9.0.9/24", "addr flush lan0 4", "block set lan0 ha on",
-                                   "dns set 10.9.0.1", "dns mode auto", "dns update", "hostname set other",
-                                   "service notify ip"])  # fmt: skip
+                                   "gateway set 10.9.0.1", "gateway clear", "route check", "route add lan0",
+                                   "route del lan0", "dns set 10.9.0.1", "dns mode auto", "dns update",
+                                   "hostname set other", "service notify ip"])  # fmt: skip
 def test_changes_need_root(words):
     before = everything()
     done = run("unshare", "--user", KOVANET, *words.split(), status=NO_PERMISSION)
@@ -556,13 +808,14 @@ def test_changes_need_root(words):
 
 def test_reading_needs_no_root(addressed):
     for words in (["card", "list", "--json"], ["link", "show", "--json"], ["addr", "list", "--json"],
-                  ["dns", "show", "--json"], ["hostname", "show", "--json"]):
+                  ["gateway", "show", "--json"], ["dns", "show", "--json"], ["hostname", "show", "--json"]):
         assert run("unshare", "--user", KOVANET, *words).stdout == kovanet(*words).stdout
 
 
 @pytest.mark.parametrize("command,section", [
     ("card list", "kovanet card list"), ("card show lan0", "kovanet card list"), ("link show", "kovanet link show"),
     ("addr list", "kovanet addr list"), ("stats", "kovanet stats"), ("block show lan0", "kovanet block show"),
+    ("gateway show", "kovanet gateway show"),
     ("dns show", "kovanet dns show"), ("hostname show", "kovanet hostname show"),
     ("check hostname nas01", "kovanet check"),
 ])  # fmt: skip
@@ -643,6 +896,7 @@ def test_the_name_of_an_interface_cannot_write_to_the_terminal():
 
 COMMANDS = ["", "card", "card list", "card show", "card set", "link", "link show", "link up", "link down", "link rename",
             "addr", "addr list", "addr add", "addr del", "addr flush", "stats", "block", "block show", "block set",
+            "gateway", "gateway show", "gateway set", "gateway clear", "route", "route check", "route add", "route del",
             "dns", "dns show", "dns set", "dns mode", "dns update", "hostname", "hostname show", "hostname set",
             "service", "service notify",
             "check", "check address", "check mask", "check prefix", "check ipv6", "check hostname", "check domain"]  # fmt: skip
@@ -659,7 +913,7 @@ def test_help_has_examples_and_exit_codes(words):
 
 def test_the_examples_of_the_help_are_understood():
     """Every example that only reads works as it stands."""
-    for name in ("card", "link", "addr", "dns", "hostname", "check"):
+    for name in ("card", "link", "addr", "gateway", "dns", "hostname", "check"):
         examples = re.findall(r"^  kovanet (.+)$", kovanet(name, "--help").stdout, re.MULTILINE)
         assert examples
         for example in examples:

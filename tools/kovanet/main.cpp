@@ -42,6 +42,14 @@ constexpr object kObjects[] = {
      "  kovanet addr add eth0 2001:db8::10/64\n"
      "  kovanet addr del eth0 2001:db8::10/64\n"
      "  kovanet addr flush eth0 6"},
+    {"gateway", "the IPv4 default gateway", add_gateway,
+     "  kovanet gateway show\n"
+     "  kovanet gateway set 192.168.1.1\n"
+     "  kovanet gateway clear"},
+    {"route", "routes to the interfaces' own subnets", add_route,
+     "  kovanet route check\n"
+     "  kovanet route add eth0\n"
+     "  kovanet route del eth0 192.168.1.10/24"},
     {"stats", "traffic counters and rates", add_stats,
      "  kovanet stats\n"
      "  kovanet stats eth0 --watch 2\n"

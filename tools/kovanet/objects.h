@@ -17,6 +17,8 @@ struct global_options {
 void add_card(CLI::App &object, const global_options &options);
 void add_link(CLI::App &object, const global_options &options);
 void add_addr(CLI::App &object, const global_options &options);
+void add_gateway(CLI::App &object, const global_options &options);
+void add_route(CLI::App &object, const global_options &options);
 void add_stats(CLI::App &object, const global_options &options);
 void add_block(CLI::App &object, const global_options &options);
 void add_dns(CLI::App &object, const global_options &options);
