@@ -38,6 +38,30 @@ AT(NETSTAT, nRxPackets, 40);
 AT(NETSTAT, nTxPackets, 48);
 SIZE(NETSTAT, 56);
 
+AT(DHCP_TAG_CONF, enabled, 0);
+AT(DHCP_TAG_CONF, reserved, 4);
+AT(DHCP_TAG_CONF, lease_time, 8);
+AT(DHCP_TAG_CONF, start_ip, 12);
+AT(DHCP_TAG_CONF, end_ip, 58);
+AT(DHCP_TAG_CONF, ifname, 104);
+AT(DHCP_TAG_CONF, domain, 120);
+AT(DHCP_TAG_CONF, dns1, 4216);
+AT(DHCP_TAG_CONF, dns2, 4262);
+AT(DHCP_TAG_CONF, dns_more, 4308);
+AT(DHCP_TAG_CONF, netmask, 8404);
+AT(DHCP_TAG_CONF, router, 8450);
+AT(DHCP_TAG_CONF, reserved_text, 8496);
+AT(DHCP_TAG_CONF, tag, 12592);
+AT(DHCP_TAG_CONF, v6_mode, 12612);
+AT(DHCP_TAG_CONF, options, 12632);
+SIZE(DHCP_TAG_CONF, 12640);
+
+AT(DHCP_RANGE, start, 0);
+AT(DHCP_RANGE, end, 16);
+AT(DHCP_RANGE, netmask, 32);
+AT(DHCP_RANGE, next, 48);
+SIZE(DHCP_RANGE, 56);
+
 AT(KOVAV6IP, szIP, 0);
 AT(KOVAV6IP, nPrefixLength, 48);
 AT(KOVAV6IP, nScope, 52);

@@ -11,6 +11,7 @@
 #include <dirent.h>
 #include <dlfcn.h>
 #include <fcntl.h>
+#include <glob.h>
 #include <kova/core.h>
 #include <kova/plugin.h>
 #include <map>
@@ -82,6 +83,7 @@ FAILING(int, KLIBCSzHashSetValue, (KLIBSZHASH * hash, const char *key, const cha
 FAILING(int, KLIBCModuleIsLoad, (const char *module), (module), -1, 0x900)
 FAILING(int, KLIBCFileEnumDir, (const char *dir, KLIBSZLIST *list, const char *prefix, int flags),
         (dir, list, prefix, flags), -1, 0x900)
+FAILING(const char *, KLIBCSzListGet, (const KLIBSZLIST *list, int index), (list, index), nullptr, 0)
 FAILING(int, KLIBCFileReadLines, (const char *path, KLIBSZLIST *list), (path, list), -1, 0x900)
 
 // ---- containers
@@ -474,6 +476,11 @@ extern "C" FILE *fopen64(const char *path, const char *mode) {
 
 extern "C" int access(const char *path, int mode) noexcept {
     return real<int (*)(const char *, int)>("access")(meant(path).c_str(), mode);
+}
+
+extern "C" int glob(const char *pattern, int flags, int (*on_error)(const char *, int), glob_t *found) noexcept {
+    static const auto next = real<int (*)(const char *, int, int (*)(const char *, int), glob_t *)>("glob");
+    return is_failing("glob", 0) ? GLOB_NOSPACE : next(pattern, flags, on_error, found);
 }
 
 extern "C" DIR *opendir(const char *path) {

@@ -68,7 +68,8 @@ public:
 
     // ---- failures
 
-    /** Makes the nth next call of a platform operation, or of malloc, calloc, realloc, fopen, open, socket, fail. */
+    /** Makes the nth next call of a platform operation, or of malloc, calloc, realloc, fopen, open, glob, socket, fail.
+     */
     void fail(const std::string &operation, int nth = 1);
     /** The same, and every call after it. */
     void fail_from(const std::string &operation, int nth = 1);
