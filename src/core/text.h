@@ -46,4 +46,7 @@ template<size_t Size> void copy_text(char (&field)[Size], const char *text) {
 /** Cuts a text up at any of the delimiters and appends the words to a list. @return their number, -1 for no memory */
 [[nodiscard]] int split(char *text, const char *delimiters, KLIBSZLIST *words);
 
+/** Appends what stands between the separators to a list, empty fields too. @return their number, -1 for no memory */
+[[nodiscard]] int split_fields(const char *text, const char *separators, KLIBSZLIST *fields);
+
 } // namespace kova
