@@ -52,6 +52,46 @@ int DHCPOptionIsListValue(unsigned int number);
 /** Frees a list of options and the items in them; NULL is allowed. */
 void DHCPOptionFree(DHCP_OPTION *head);
 
+/**
+ * What the DHCP server answers to clients that boot from the network. The calls about it take no lock, set no code of
+ * their own and do not restart the server; /etc/dhcpd/dhcpd-pxe-setting keeps the settings, dhcpd-pxe.info the switch,
+ * dhcpd-pxe.conf is what the server reads.
+ */
+typedef struct DHCP_PXE_CONF {
+    int32_t enabled;                /**< 1 clients are answered */
+    int32_t is_remote_tftp;         /**< 1 they boot from another server */
+    char local_bootloader[4096];    /**< name of the boot file on this machine */
+    char remote_bootloader[4096];   /**< name of the boot file on the other server */
+    char remote_tftp_server_ip[20]; /**< address of the other server */
+} DHCP_PXE_CONF;
+
+/**
+ * Fills in "enabled" and nothing else.
+ * @return 0; "enabled" is 1 or 0, or below 0 when there are no settings or they cannot be read. -1 for NULL, logged
+ */
+int DHCPPXEConfGetEnable(DHCP_PXE_CONF *conf);
+
+/**
+ * Reads the settings; what is not set is left empty.
+ * @return 0, also without settings ("enabled" is below 0 then); -1, logged, for NULL or settings that cannot be read
+ */
+int DHCPPXEConfGet(DHCP_PXE_CONF *conf);
+
+/**
+ * Switches the answers on or off, in the settings and then for the server. Runs /bin/mkdir.
+ * @param enable  1 on, anything else off
+ * @return 0; -1 with the code of the rewrite that failed, or logged when the directory cannot be made
+ */
+int DHCPPXEConfSetEnable(int enable);
+
+/**
+ * Switches the answers on or off and, when on, stores the boot file and server of the chosen kind and writes the
+ * server's lines. The settings of the other kind, and all of them when off, stay as they are.
+ * @param conf  boot file and address are neither empty nor hold ",", double quotes or control characters
+ * @return 0; -1, logged: the switch is set already then, and keys before the one that failed
+ */
+int DHCPPXEConfSet(const DHCP_PXE_CONF *conf);
+
 #ifdef __cplusplus
 }
 #endif

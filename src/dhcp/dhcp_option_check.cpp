@@ -2,6 +2,7 @@
 
 #include "core/report.h"
 #include "core/text.h"
+#include "dhcp/dhcpd_files.h"
 
 #include <charconv>
 #include <cstring>
@@ -28,16 +29,6 @@ bool is_node_type(const char *text) {
     return strlen(text) == 1 && strchr("1248", *text) != nullptr;
 }
 
-/** A text that stays one field of one line of the fragment. */
-bool is_field(const char *text) {
-    for (const char *byte = text; *byte != '\0'; ++byte) {
-        if (static_cast<unsigned char>(*byte) < ' ' || *byte == ',' || *byte == '\x7f') {
-            return false;
-        }
-    }
-    return *text != '\0';
-}
-
 bool is_value(const option_kind &kind, const char *value) {
     switch (kind.rule) {
     case option_rule::number:
@@ -45,7 +36,7 @@ bool is_value(const option_kind &kind, const char *value) {
     case option_rule::node_type:
         return is_node_type(value);
     case option_rule::text:
-        return is_field(value);
+        return is_line_field(value);
     default:
         return BlKLIBIsIpAddr(value) != 0;
     }
