@@ -92,6 +92,51 @@ int DHCPPXEConfSetEnable(int enable);
  */
 int DHCPPXEConfSet(const DHCP_PXE_CONF *conf);
 
+/* Options for the clients of one vendor class. /etc/dhcpd/dhcpd-vendor.conf holds a line for each vendor and option, at
+ * most 1023 characters long. Vendor classes and values are not empty and hold no control character; a vendor class
+ * holds no ",", and a value with one cannot be read back. The calls take no lock and do not restart the server; every
+ * failure is logged, and has the code of the file operation that failed, if one did. */
+
+/** Whether a text is the number of an option: decimal digits, 1 to 254. @return 1; 0, also for NULL */
+int DHCPVendorCheckOptNum(const char *text);
+
+/**
+ * Adds the options of a vendor class to a map from number to value, both texts.
+ * @param options  handle of the map; NULL, or a NULL vendor, is logged and finds nothing to add to
+ * @return 0, also without the file; -1 for a file or line that cannot be read, or a map that cannot take more
+ */
+int DHCPVendorGetVendor(const char *vendor, KLIBSZHASH **options);
+
+/**
+ * Reads one option of a vendor class.
+ * @param number  1 to 254
+ * @param value   receives the value, cut to size (above 0)
+ * @return 1; 0 not there; -1 for a bad argument or a file or line that cannot be read
+ */
+int DHCPVendorGetVendorOpt(const char *vendor, int number, char *value, unsigned int size);
+
+/**
+ * Replaces all options of a vendor class. The old ones go first: a key that is no number of an option leaves the
+ * options before it. Runs /bin/mkdir.
+ * @param options  map from number to value
+ * @return 0; below 0, with nothing changed for a vendor class or value that cannot be stored
+ */
+int DHCPVendorSetVendor(const char *vendor, KLIBSZHASH *options);
+
+/**
+ * Replaces one option of a vendor class. A missing or empty text and a number out of range are logged and written all
+ * the same, NULL as "". Runs /bin/mkdir.
+ * @return 0; below 0, with nothing changed for a vendor class or value that cannot be stored
+ */
+int DHCPVendorSetVendorOpt(const char *vendor, int number, const char *value);
+
+/**
+ * Adds the vendor classes that have options to a list, each once, in the order of the file.
+ * @param vendors  handle of the list
+ * @return 0, also without the file; -1 for a bad argument, an unreadable file or no memory
+ */
+int DHCPVendorEnum(KLIBSZLIST **vendors);
+
 #ifdef __cplusplus
 }
 #endif

@@ -2,6 +2,7 @@
 
 #include "core/report.h"
 #include "core/text.h"
+#include "dhcp/dhcpd_files.h"
 
 #include <algorithm>
 #include <cstring>
@@ -13,7 +14,6 @@ namespace {
 
 constexpr char kTagged[] = "dhcp-option=tag:";
 constexpr char kNamed[] = "option:";
-constexpr int kLongestLine = 1024;
 
 /** Lines of a subnet that have fields of their own in its record. */
 constexpr const char *kOwnFields[] = {"router", "dns-server", "domain-search", "domain-name"};
@@ -83,21 +83,6 @@ outcome parse_line(const char *line, option_list &option) {
     return parsed;
 }
 
-/** The next line without its newline, cut to the buffer; what is beyond is passed over. */
-bool next_cut_line(const stream &file, char (&line)[kLongestLine]) {
-    if (fgets(line, sizeof line, file.get()) == nullptr) {
-        return false;
-    }
-    char *const newline = strchr(line, '\n');
-    if (newline != nullptr) {
-        *newline = '\0';
-        return true;
-    }
-    for (int byte = getc(file.get()); byte != EOF && byte != '\n'; byte = getc(file.get())) {
-    }
-    return true;
-}
-
 } // namespace
 
 int read_options(const char *path, option_list &options) {
@@ -106,7 +91,7 @@ int read_options(const char *path, option_list &options) {
         return fail_keeping_code(HERE, -1, "Failed to open DHCP config [%s] for reading", path);
     }
     DHCP_OPTION **end = options.out();
-    char line[kLongestLine];
+    char line[kLineRoom];
     while (next_cut_line(file, line)) {
         if (strncmp(line, kTagged, strlen(kTagged)) != 0) {
             continue;

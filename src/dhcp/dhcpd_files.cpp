@@ -24,4 +24,18 @@ bool is_line_field(const char *text) {
     return *text != '\0' && is_line_text(text) && strchr(text, ',') == nullptr;
 }
 
+bool next_cut_line(const stream &file, char (&line)[kLineRoom]) {
+    if (fgets(line, sizeof line, file.get()) == nullptr) {
+        return false;
+    }
+    char *const newline = strchr(line, '\n');
+    if (newline != nullptr) {
+        *newline = '\0';
+        return true;
+    }
+    for (int byte = getc(file.get()); byte != EOF && byte != '\n'; byte = getc(file.get())) {
+    }
+    return true;
+}
+
 } // namespace kova
