@@ -6,6 +6,19 @@
 
 namespace kova {
 
+bool is_line_text(const char *text) {
+    for (const char *byte = text; *byte != '\0'; ++byte) {
+        if (static_cast<unsigned char>(*byte) < ' ' || *byte == '\x7f') {
+            return false;
+        }
+    }
+    return true;
+}
+
+bool is_list_field(const char *text) {
+    return *text != '\0' && is_line_text(text) && strchr(text, ',') == nullptr;
+}
+
 void fragment::write_enable(bool is_on) {
     fprintf(file_.get(), kQuotedLine, kEnable, yes_or_no(is_on));
 }
@@ -27,8 +40,7 @@ void fragment::write_option(const char *tag, const char *name, const char *first
 }
 
 bool fragment::close() {
-    const bool is_whole = ferror(file_.get()) == 0;
-    return fclose(file_.give_up()) == 0 && is_whole;
+    return close_written(file_);
 }
 
 comma_fields::comma_fields(const char *text)
@@ -37,6 +49,20 @@ comma_fields::comma_fields(const char *text)
 const char *comma_fields::operator[](int index) const {
     const char *const field = KLIBCSzListGet(list_.get(), index);
     return field != nullptr ? field : "";
+}
+
+bool next_cut_line(const stream &file, char (&line)[kLineRoom]) {
+    if (fgets(line, sizeof line, file.get()) == nullptr) {
+        return false;
+    }
+    char *const newline = strchr(line, '\n');
+    if (newline != nullptr) {
+        *newline = '\0';
+        return true;
+    }
+    for (int byte = getc(file.get()); byte != EOF && byte != '\n'; byte = getc(file.get())) {
+    }
+    return true;
 }
 
 heap<char> line_holding(const path_text &path, const char *text) {

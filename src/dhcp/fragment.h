@@ -22,12 +22,13 @@ inline constexpr char kDomainSearch[] = "option:domain-search";
 inline constexpr char kDnsServer[] = "option:dns-server";
 } // namespace daemon_key
 
-/** Whether a text can be part of a line: one with CR or LF would add lines of its own. */
-[[nodiscard]] inline bool is_line_text(const char *text) {
-    return strpbrk(text, "\r\n") == nullptr;
-}
+/** Whether a text can be part of a line: no control character in it, the line's end above all. */
+[[nodiscard]] bool is_line_text(const char *text);
 
-/** The same for a record's field, which also has to end within itself. */
+/** Whether a text can be one of the fields that "," separates in a line: not empty either. */
+[[nodiscard]] bool is_list_field(const char *text);
+
+/** Whether a record's field is such a text, and ends within itself. */
 template<size_t Size> [[nodiscard]] bool is_line_field(const char (&field)[Size]) {
     return memchr(field, '\0', Size) != nullptr && is_line_text(field);
 }
@@ -73,6 +74,12 @@ private:
     string_list list_;
     int count_;
 };
+
+/** Room for a line of a fragment whose readers cut longer ones. */
+inline constexpr int kLineRoom = 1024;
+
+/** The next line without its newline, cut to the room; what is beyond is passed over. @return false at the end */
+[[nodiscard]] bool next_cut_line(const stream &file, char (&line)[kLineRoom]);
 
 /**
  * The first line of a file that holds a text anywhere, without its line end.

@@ -75,5 +75,19 @@ AT(KOVALINKAGGROPT, cSlaves, 24);
 AT(KOVALINKAGGROPT, aszSlaves, 28);
 SIZE(KOVALINKAGGROPT, 540);
 
+AT(DHCP_OPTION, number, 0);
+AT(DHCP_OPTION, name, 4);
+AT(DHCP_OPTION, value, 56);
+AT(DHCP_OPTION, items, 1080);
+AT(DHCP_OPTION, next, 1088);
+SIZE(DHCP_OPTION, 1096);
+
+AT(DHCP_PXE_CONF, enabled, 0);
+AT(DHCP_PXE_CONF, is_remote_tftp, 4);
+AT(DHCP_PXE_CONF, local_bootloader, 8);
+AT(DHCP_PXE_CONF, remote_bootloader, 4104);
+AT(DHCP_PXE_CONF, remote_tftp_server_ip, 8200);
+SIZE(DHCP_PXE_CONF, 8220);
+
 AT(KLIBSZLIST, nCapacity, 0);
 AT(KLIBSZLIST, nItem, 4);
