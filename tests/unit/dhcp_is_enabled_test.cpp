@@ -81,7 +81,7 @@ TEST_F(dhcp_is_enabled, DHCPInterfaceIsEnabled_families_haveTheirOwnFiles) {
 }
 
 TEST_F(dhcp_is_enabled, DHCPInterfaceIsEnabled_unusualNames_areFilesLikeOthers) {
-    for (const std::string name : {"eth0.10", "ovs_eth0", "a-b", "-", "%s%n", "eth0'\"", long_text(235)}) {
+    for (const std::string &name : texts{"eth0.10", "ovs_eth0", "a-b", "-", "%s%n", "eth0'\"", long_text(235)}) {
         EXPECT_OUTCOME(is_enabled(name.c_str(), kV4), {.result = 0});
         write_file("/etc/dhcpd/dhcpd-" + name + ".info", "enable=\"yes\"\n");
         EXPECT_OUTCOME(is_enabled(name.c_str(), kV4), {.result = 1});

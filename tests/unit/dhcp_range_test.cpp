@@ -88,7 +88,7 @@ TEST_F(dhcp_range, DHCPGetInterfaceRanges_leaseTagAndNetmask_areNotChecked) {
 }
 
 TEST_F(dhcp_range, DHCPGetInterfaceRanges_missingOrEmptyKey_fails) {
-    for (const std::string content :
+    for (const std::string &content :
          {std::string(), std::string("interface=eth0\n"), std::string("dhcp-range=\n"), std::string("#dhcp-range=a\n"),
           std::string("dhcp-range\n"), std::string("\0\xff\0dhcp-range=a\n", 16), long_text(4096)}) {
         write_file(subnet("eth0", 0), content);
@@ -163,7 +163,7 @@ TEST_F(dhcp_range, DHCPGetInterfaceRanges_badNames_areRefused) {
 }
 
 TEST_F(dhcp_range, DHCPGetInterfaceRanges_unusualNames_areReadLikeOthers) {
-    for (const std::string name : {"eth0.10", "a-b", "-", "%s%n", "ovs_bond0", long_text(235)}) {
+    for (const std::string &name : texts{"eth0.10", "a-b", "-", "%s%n", "ovs_bond0", long_text(235)}) {
         write_range(name, 0, "set:t,10.0.0.1,10.0.0.9,255.0.0.0,60");
         EXPECT_OUTCOME(ranges(name.c_str()), {.result = 1});
     }
