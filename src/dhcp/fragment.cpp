@@ -47,7 +47,7 @@ comma_fields::comma_fields(const char *text)
     : list_(make_list()), count_(list_.is_held() ? split_fields(text, ",", list_.get()) : -1) {}
 
 const char *comma_fields::operator[](int index) const {
-    const char *const field = KLIBCSzListGet(list_.get(), index);
+    const char *const field = is_held() ? KLIBCSzListGet(list_.get(), index) : nullptr;
     return field != nullptr ? field : "";
 }
 
