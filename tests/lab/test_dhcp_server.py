@@ -6,6 +6,7 @@ import os
 import pathlib
 import shutil
 import socket
+import subprocess
 import time
 
 import pytest
@@ -103,6 +104,13 @@ def test_start_and_both_restarts_run_one_server():
     [last] = processes(SERVER)
     assert last != first
     assert PID.read_text().split() == [str(last)]
+
+
+def test_restarts_at_the_same_time_run_one_server():
+    configure("eth0", "192.168.60")
+    restarts = [subprocess.Popen(["/etc/rc.network", "nat-restart-dhcp"]) for _ in range(3)]
+    assert [restart.wait(30) for restart in restarts] == [0, 0, 0]
+    assert PID.read_text().split() == [str(pid) for pid in processes(SERVER)]
 
 
 def test_lease_is_remembered_over_a_restart(tmp_path):
@@ -342,6 +350,10 @@ def test_script_of_a_stranger_is_not_run(network, tmp_path):
     assert not mark.exists()
     script.unlink()
     assert ask_network("eth0")[0] == 0
+
+
+def test_other_calls_reach_the_real_client():
+    assert run("/usr/sbin/dhclient", "--version").stderr.startswith("isc-dhclient")
 
 
 def test_link_in_place_of_the_leases_is_not_followed(network, tmp_path):
