@@ -72,6 +72,12 @@ struct stream_kind {
 };
 using stream = owner<stream_kind>;
 
+/** Closes a stream that was written. @return whether all of it reached the file */
+[[nodiscard]] inline bool close_written(stream &file) {
+    const bool is_whole = ferror(file.get()) == 0;
+    return fclose(file.give_up()) == 0 && is_whole;
+}
+
 /** A lock of KLIBCFileLockTimeByFile. */
 struct file_lock_kind {
     static int none() { return -1; }

@@ -33,11 +33,22 @@ private:
 /** Long enough for every path with an interface name that passed is_interface_name. */
 using path_text = built_text<512>;
 
+/** A record's field as a text, whole even when nothing ends it. */
+template<size_t Size> class field_text : public built_text<Size + 1> {
+public:
+    explicit field_text(const char (&field)[Size]) : built_text<Size + 1>("%.*s", static_cast<int>(Size), field) {}
+};
+
+/** Copies a text, cut to the room there is; the size is above 0. */
+inline void copy_cut(char *out, size_t size, const char *text) {
+    const size_t length = strnlen(text, size - 1);
+    memcpy(out, text, length);
+    out[length] = '\0';
+}
+
 /** Copies a text into a field, cut to it. */
 template<size_t Size> void copy_text(char (&field)[Size], const char *text) {
-    const size_t length = strnlen(text, Size - 1);
-    memcpy(field, text, length);
-    field[length] = '\0';
+    copy_cut(field, Size, text);
 }
 
 /** Copies a text whole, or leaves "" and answers false when it does not fit; the size is above 0. */
@@ -45,5 +56,8 @@ template<size_t Size> void copy_text(char (&field)[Size], const char *text) {
 
 /** Cuts a text up at any of the delimiters and appends the words to a list. @return their number, -1 for no memory */
 [[nodiscard]] int split(char *text, const char *delimiters, KLIBSZLIST *words);
+
+/** Appends what stands between the separators to a list, empty fields too. @return their number, -1 for no memory */
+[[nodiscard]] int split_fields(const char *text, const char *separators, KLIBSZLIST *fields);
 
 } // namespace kova

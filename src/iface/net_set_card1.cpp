@@ -4,6 +4,7 @@
 #include "core/guards.h"
 #include "core/ifcfg.h"
 #include "core/report.h"
+#include "core/text.h"
 
 #include <cstring>
 #include <kova/service.h>
@@ -14,12 +15,6 @@ using namespace kova;
 namespace {
 
 constexpr char kDhcpSwitch[] = "KOVAILnxSetDHCP";
-
-/** A record's field as a text, whole even when nothing ends it. */
-template<size_t Size> class field_text : public built_text<Size + 1> {
-public:
-    explicit field_text(const char (&field)[Size]) : built_text<Size + 1>("%.*s", static_cast<int>(Size), field) {}
-};
 
 template<size_t Size> bool is_same_field(const char (&one)[Size], const char (&other)[Size]) {
     return strncmp(one, other, Size) == 0;

@@ -38,6 +38,30 @@ AT(NETSTAT, nRxPackets, 40);
 AT(NETSTAT, nTxPackets, 48);
 SIZE(NETSTAT, 56);
 
+AT(DHCP_TAG_CONF, enabled, 0);
+AT(DHCP_TAG_CONF, reserved, 4);
+AT(DHCP_TAG_CONF, lease_time, 8);
+AT(DHCP_TAG_CONF, start_ip, 12);
+AT(DHCP_TAG_CONF, end_ip, 58);
+AT(DHCP_TAG_CONF, ifname, 104);
+AT(DHCP_TAG_CONF, domain, 120);
+AT(DHCP_TAG_CONF, dns1, 4216);
+AT(DHCP_TAG_CONF, dns2, 4262);
+AT(DHCP_TAG_CONF, dns_more, 4308);
+AT(DHCP_TAG_CONF, netmask, 8404);
+AT(DHCP_TAG_CONF, router, 8450);
+AT(DHCP_TAG_CONF, reserved_text, 8496);
+AT(DHCP_TAG_CONF, tag, 12592);
+AT(DHCP_TAG_CONF, v6_mode, 12612);
+AT(DHCP_TAG_CONF, options, 12632);
+SIZE(DHCP_TAG_CONF, 12640);
+
+AT(DHCP_RANGE, start, 0);
+AT(DHCP_RANGE, end, 16);
+AT(DHCP_RANGE, netmask, 32);
+AT(DHCP_RANGE, next, 48);
+SIZE(DHCP_RANGE, 56);
+
 AT(KOVAV6IP, szIP, 0);
 AT(KOVAV6IP, nPrefixLength, 48);
 AT(KOVAV6IP, nScope, 52);
@@ -50,6 +74,20 @@ AT(KOVALINKAGGROPT, blNoPartner, 20);
 AT(KOVALINKAGGROPT, cSlaves, 24);
 AT(KOVALINKAGGROPT, aszSlaves, 28);
 SIZE(KOVALINKAGGROPT, 540);
+
+AT(DHCP_OPTION, number, 0);
+AT(DHCP_OPTION, name, 4);
+AT(DHCP_OPTION, value, 56);
+AT(DHCP_OPTION, items, 1080);
+AT(DHCP_OPTION, next, 1088);
+SIZE(DHCP_OPTION, 1096);
+
+AT(DHCP_PXE_CONF, enabled, 0);
+AT(DHCP_PXE_CONF, is_remote_tftp, 4);
+AT(DHCP_PXE_CONF, local_bootloader, 8);
+AT(DHCP_PXE_CONF, remote_bootloader, 4104);
+AT(DHCP_PXE_CONF, remote_tftp_server_ip, 8200);
+SIZE(DHCP_PXE_CONF, 8220);
 
 AT(KLIBSZLIST, nCapacity, 0);
 AT(KLIBSZLIST, nItem, 4);

@@ -1,11 +1,12 @@
 /**
  * @file
- * Calls of the C library that a unit test can make fail: those that bring a file to its place, and the host name.
+ * More calls that a unit test can make fail: those that bring a file to its place, the host name, entries of lists.
  */
 #include "support/fault_points.h"
 
 #include <cstdio>
 #include <dlfcn.h>
+#include <kova/core.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
@@ -29,7 +30,7 @@ int failure(int error) {
 }
 
 const bool known[] = {can_fail("fsync"), can_fail("fclose"), can_fail("rename"), can_fail("chmod"),
-                      can_fail("sethostname")};
+                      can_fail("sethostname"), can_fail("KLIBCSzListGet")};
 
 } // namespace
 
@@ -51,6 +52,11 @@ extern "C" int rename(const char *from, const char *to) noexcept {
 
 extern "C" int chmod(const char *path, mode_t mode) noexcept {
     return is_failing("chmod") ? failure(EPERM) : real<int(const char *, mode_t)>("chmod")(path, mode);
+}
+
+extern "C" const char *KLIBCSzListGet(const KLIBSZLIST *list, int index) {
+    static const auto next = real<const char *(const KLIBSZLIST *, int)>("KLIBCSzListGet");
+    return is_failing("KLIBCSzListGet") ? nullptr : next(list, index);
 }
 
 extern "C" int sethostname(const char *name, size_t size) noexcept {
