@@ -83,6 +83,11 @@ FAILING(int, KLIBCSzHashSetValue, (KLIBSZHASH * hash, const char *key, const cha
 FAILING(int, KLIBCModuleIsLoad, (const char *module), (module), -1, 0x900)
 FAILING(int, KLIBCFileEnumDir, (const char *dir, KLIBSZLIST *list, const char *prefix, int flags),
         (dir, list, prefix, flags), -1, 0x900)
+FAILING(int, KLIBCFileGetLine, (const char *path, const char *prefix, char *line, int cb, int flags),
+        (path, prefix, line, cb, flags), -1, 0x900)
+FAILING(int, KLIBCFileAddLine, (const char *path, const char *marker, const char *line, int flags),
+        (path, marker, line, flags), -1, 0xB00)
+FAILING(int, KLIBCSzHashEnumKey, (const KLIBSZHASH *hash, KLIBSZLIST *list), (hash, list), -1, 0x200)
 FAILING(const char *, KLIBCSzListGet, (const KLIBSZLIST *list, int index), (list, index), nullptr, 0)
 FAILING(int, KLIBCFileReadLines, (const char *path, KLIBSZLIST *list), (path, list), -1, 0x900)
 

@@ -114,7 +114,7 @@ TEST_F(dhcp_range, DHCPGetInterfaceRanges_otherNumberOfFields_fails) {
 
 TEST_F(dhcp_range, DHCPGetInterfaceRanges_addresses_haveToBeAddresses) {
     const std::vector<std::pair<std::string, std::string>> pairs{
-        {"10.0.0", "10.0.0.9"}, {"10.0.0.1", "10.0.0.256"},   {"::1", "::2"},
+        {"10.0.0", "10.0.0.9"}, {"10.0.0.1", "10.0.0.256"},   {"::1", "::a"},
         {"a", "b"},             {" 10.0.0.1", "10.0.0.9"},    {"10.0.0.1", long_text(100, '1')},
         {"%s%n", "10.0.0.9"},   {"10.0.0.1", "10.0.0.9/24"}};
     for (const auto &[start, end] : pairs) {
@@ -212,7 +212,8 @@ TEST_F(dhcp_range, DHCPIsRangeConflict_otherInterfacesSubnets_areCompared) {
              {"10.0.0.1", "255.255.255.255", "10.0.0.2", "255.255.255.255", 0},
              {"1.2.3.4", "0.0.0.0", "200.1.1.1", "255.255.255.0", 1},
              {"0.0.0.0", "128.0.0.0", "200.1.1.1", "255.255.255.0", 0},
-             {"10.0.0.1", "255.0.255.0", "10.0.0.1", "255.255.0.0", 0}, // masks with a hole: neither holds the other
+             {"10.0.0.1", "255.0.255.0", "10.0.0.1", "255.255.0.0", 1}, // masks with a hole, by the same operations
+             {"10.0.5.1", "255.0.255.0", "10.0.0.1", "255.255.0.0", 0},
          }) {
         serve("eth1", each.served, each.served_mask);
         EXPECT_OUTCOME(conflict("eth0", each.start, each.mask), {.result = each.expected});
