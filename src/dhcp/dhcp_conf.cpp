@@ -55,8 +55,11 @@ bool restore_switch(const path_text &info) {
     return found == 0 || (found > 0 && write_switch(info, kEnable, value));
 }
 
-/** Changes the info files of an interface that are there, IPv4 first. @return whether all went well */
+/** Changes the info files of an interface that are there, IPv4 first. @return whether all went well; not for NULL */
 bool for_both_families(const char *ifname, bool (*change)(const path_text &info)) {
+    if (ifname == nullptr) {
+        return false;
+    }
     for (const int type : {kTypeV4, kTypeV6}) {
         const path_text info = dhcpd_info_path(type, ifname);
         if (KLIBCFileExist(info.c_str()) == 1 && !change(info)) {

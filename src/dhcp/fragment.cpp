@@ -66,7 +66,8 @@ comma_fields::comma_fields(const char *text)
       count_(list_.is_held() ? split_fields(text, ",", list_.get()) : -1) {}
 
 const char *comma_fields::operator[](int index) const {
-    return index < count_ ? KLIBCSzListGet(list_.get(), index) : "";
+    const char *const field = is_held() ? KLIBCSzListGet(list_.get(), index) : nullptr;
+    return field != nullptr ? field : "";
 }
 
 bool next_cut_line(const stream &file, char (&line)[kLineRoom]) {

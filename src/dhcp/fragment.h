@@ -89,7 +89,7 @@ public:
     /** Whether there was a text, and memory for the list. */
     [[nodiscard]] bool is_held() const { return count_ >= 0; }
     [[nodiscard]] int count() const { return count_; }
-    /** A field, "" past the last one. */
+    /** A field, "" past the last one and without memory for the list. */
     [[nodiscard]] const char *operator[](int index) const;
 
 private:

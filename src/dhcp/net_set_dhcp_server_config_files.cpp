@@ -128,7 +128,10 @@ extern "C" int KOVANetGetDhcpServerConf(const char *tag, const char *ifname, DHC
     char own_tag[sizeof conf_out->tag]; // the names may be the record's own
     copy_text(own_tag, tag);
     *conf_out = {};
-    copy_text(conf_out->tag, own_tag);
+    if (read_subnet(path, *conf_out) == 0) {
+        return 0;
+    }
     conf_out->enabled = says_enabled(info) ? 1 : 0;
-    return read_subnet(path, *conf_out);
+    copy_text(conf_out->tag, own_tag);
+    return 1;
 }

@@ -31,7 +31,12 @@ tag_text tag_of(const subnet_id &subnet) {
 /** Values joined by ",", in one line. */
 class joined_values {
 public:
+    /** NULL fits nowhere. */
     void append(const char *open, const char *value, const char *close) {
+        if (value == nullptr) {
+            fits_ = false;
+            return;
+        }
         const size_t used = strlen(text_);
         const int length = snprintf(text_ + used, sizeof text_ - used, "%s%s%s", open, value, close);
         fits_ = fits_ && length >= 0 && static_cast<size_t>(length) < sizeof text_ - used;

@@ -90,8 +90,7 @@ TEST_F(dhcp_is_enabled, DHCPInterfaceIsEnabled_unusualNames_areFilesLikeOthers) 
 
 TEST_F(dhcp_is_enabled, DHCPInterfaceIsEnabled_badArguments_areRefused) {
     for (const char *name : {static_cast<const char *>(nullptr), ""}) {
-        EXPECT_OUTCOME(is_enabled(name, kV4),
-                       {.result = -1, .log = {"ERR dhcp_is_enabled:N no interface is given"}});
+        EXPECT_OUTCOME(is_enabled(name, kV4), {.result = -1, .log = {"ERR dhcp_is_enabled:N no interface is given"}});
     }
     for (const int type : {-1, 2, 4, 6, INT32_MAX, INT32_MIN}) {
         EXPECT_OUTCOME(is_enabled("eth0", type), {.result = -1, .log = {"ERR dhcp_is_enabled:N Wrong DHCPD ip type"}});
@@ -139,19 +138,17 @@ TEST_F(dhcp_is_enabled, DHCPInterfaceSetEnabled_failedWrite_isLoggedAndStillZero
 TEST_F(dhcp_is_enabled, DHCPInterfaceSetEnabled_noDirectory_fails) {
     for (const int status : {1, 127, -1, 137}) {
         rig.answer("/bin/mkdir", status);
-        EXPECT_OUTCOME(set_enabled("eth0", kV4, 1),
-                       {.result = -1,
-                        .log = {"ERR dhcp_is_enabled:N Failed to mkdir [/etc/dhcpd]"},
-                        .commands = {kMkdir}});
+        EXPECT_OUTCOME(
+            set_enabled("eth0", kV4, 1),
+            {.result = -1, .log = {"ERR dhcp_is_enabled:N Failed to mkdir [/etc/dhcpd]"}, .commands = {kMkdir}});
     }
     EXPECT_EQ("<absent>", read_file("/etc/dhcpd/dhcpd-eth0.info"));
 }
 
 TEST_F(dhcp_is_enabled, DHCPInterfaceSetEnabled_fileInPlaceOfTheDirectory_staysAsItIs) {
     write_file("/etc/dhcpd", "not a directory");
-    EXPECT_OUTCOME(set_enabled("eth0", kV4, 1), {.result = -1,
-                                                 .log = {"ERR dhcp_is_enabled:N Failed to mkdir [/etc/dhcpd]"},
-                                                 .commands = {kMkdir}});
+    EXPECT_OUTCOME(set_enabled("eth0", kV4, 1),
+                   {.result = -1, .log = {"ERR dhcp_is_enabled:N Failed to mkdir [/etc/dhcpd]"}, .commands = {kMkdir}});
     EXPECT_EQ("not a directory", read_file("/etc/dhcpd"));
 }
 

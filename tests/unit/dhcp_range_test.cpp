@@ -113,16 +113,20 @@ TEST_F(dhcp_range, DHCPGetInterfaceRanges_otherNumberOfFields_fails) {
 }
 
 TEST_F(dhcp_range, DHCPGetInterfaceRanges_addresses_haveToBeAddresses) {
-    const std::vector<std::pair<std::string, std::string>> pairs{
-        {"10.0.0", "10.0.0.9"}, {"10.0.0.1", "10.0.0.256"},   {"::1", "::a"},
-        {"a", "b"},             {" 10.0.0.1", "10.0.0.9"},    {"10.0.0.1", long_text(100, '1')},
-        {"%s%n", "10.0.0.9"},   {"10.0.0.1", "10.0.0.9/24"}};
+    const std::vector<std::pair<std::string, std::string>> pairs{{"10.0.0", "10.0.0.9"},
+                                                                 {"10.0.0.1", "10.0.0.256"},
+                                                                 {"::1", "::a"},
+                                                                 {"a", "b"},
+                                                                 {" 10.0.0.1", "10.0.0.9"},
+                                                                 {"10.0.0.1", long_text(100, '1')},
+                                                                 {"%s%n", "10.0.0.9"},
+                                                                 {"10.0.0.1", "10.0.0.9/24"}};
     for (const auto &[start, end] : pairs) {
         write_range("eth0", 0, "set:t," + start + "," + end + ",255.0.0.0,60");
-        EXPECT_OUTCOME(ranges("eth0"),
-                       {.result = -1,
-                        .log = {"ERR dhcp_range:N Failed to convert IPs [" + start + ", " + end + "] to in_addr",
-                                wrong_key(0)}});
+        EXPECT_OUTCOME(
+            ranges("eth0"),
+            {.result = -1,
+             .log = {"ERR dhcp_range:N Failed to convert IPs [" + start + ", " + end + "] to in_addr", wrong_key(0)}});
     }
 }
 
@@ -189,9 +193,9 @@ TEST_F(dhcp_range, DHCPGetInterfaceRanges_noMemoryForARange_fails) {
 
 TEST_F(dhcp_range, DHCPRangeFree_nothing_isAllowed) {
     EXPECT_OUTCOME(rig.observe([] {
-                       DHCPRangeFree(nullptr);
-                       return 0;
-                   }),
+        DHCPRangeFree(nullptr);
+        return 0;
+    }),
                    {});
 }
 
@@ -253,7 +257,8 @@ TEST_F(dhcp_range, DHCPIsRangeConflict_nothingServed_isNoConflict) {
 TEST_F(dhcp_range, DHCPIsRangeConflict_nameOfTheOther_isCutOrLeftOut) {
     serve("bond0", "10.0.0.1", "255.0.0.0");
     const auto ask = [&](char *name, unsigned size) {
-        return rig.observe([&, name, size] { return DHCPIsRangeConflict("eth0", "10.0.0.1", "x", "255.0.0.0", name, size); });
+        return rig.observe(
+            [&, name, size] { return DHCPIsRangeConflict("eth0", "10.0.0.1", "x", "255.0.0.0", name, size); });
     };
     EXPECT_OUTCOME(ask(nullptr, 0), {.result = 1});
     EXPECT_OUTCOME(ask(nullptr, 16), {.result = 1});
@@ -298,10 +303,10 @@ TEST_F(dhcp_range, DHCPIsRangeConflict_badArguments_areRefused) {
 TEST_F(dhcp_range, DHCPIsRangeConflict_failedList_fails) {
     serve("eth1", "10.0.0.1", "255.0.0.0");
     rig.fail("glob");
-    EXPECT_OUTCOME(conflict("eth0", "10.0.0.1", "255.0.0.0"),
-                   {.result = -1,
-                    .log = {"ERR dhcp_interface_list_get:N glob() error",
-                            "ERR dhcp_range:N Failed to get interface list"}});
+    EXPECT_OUTCOME(
+        conflict("eth0", "10.0.0.1", "255.0.0.0"),
+        {.result = -1,
+         .log = {"ERR dhcp_interface_list_get:N glob() error", "ERR dhcp_range:N Failed to get interface list"}});
     EXPECT_STREQ("", other);
     rig.fail("KLIBCSzListGet");
     EXPECT_OUTCOME(conflict("eth0", "10.0.0.1", "255.0.0.0"),
