@@ -26,7 +26,7 @@ extern "C" {
 
 struct DHCP_OPTION;
 
-/** A served subnet. Texts are terminated; none that is written to a fragment holds CR or LF. */
+/** A served subnet. Texts are terminated; none that is written to a fragment holds a control character. */
 typedef struct DHCP_TAG_CONF {
     int32_t enabled;             /**< 1 when the subnet is served */
     int32_t reserved;            /**< not used */
@@ -102,8 +102,9 @@ int DHCPInterfaceListGet(KLIBSZLIST **list_inout, int type);
  * range, router, search domain (unless "") and name servers; makes the directory by /bin/mkdir -p.
  * @param conf    the subnet: ifname, tag, and when on start_ip, end_ip, netmask, lease_time, router, domain, dns1, dns2
  * @param enable  not 0: on; 0: off, .conf stays as it is
- * @return 1; 0 when nothing was written for a bad record (NULL, names as above, a text without its end or with CR or
- *         LF), or when directory or a file cannot be made: .info may be written already then
+ * @return 1; 0 when nothing was written for a bad record (NULL, names as above, a text without its end or with a
+ * control character, "," in a name or the range, a domain that makes its line longer than 1023 bytes), or when
+ * directory or a file cannot be made: .info may be written already then
  */
 int KOVANetSetDhcpServerConfigFiles(const DHCP_TAG_CONF *conf, int enable);
 /**
@@ -125,7 +126,8 @@ int KOVANetGetDhcpServerConf(const char *tag, const char *ifname, DHCP_TAG_CONF 
  * @param subnet  number of the subnet
  * @param type    family
  * @param conf    "enabled" and what DHCPTagConfSetConfig takes
- * @return 0; -1. Nothing is written for bad arguments; with an unknown mode or an option that is not valid the switch is
+ * @return 0; -1. Nothing is written for bad arguments; with an unknown mode or an option that is not valid the switch
+ * is
  */
 int DHCPTagConfSet(const char *ifname, unsigned int subnet, int type, const DHCP_TAG_CONF *conf);
 /**
@@ -142,7 +144,8 @@ int DHCPTagConfSetEnable(const char *ifname, unsigned int subnet, int type, int 
  * @param conf    IPv4: start_ip, end_ip, netmask, lease_time, router, domain, dns1, dns2, dns_more and options, whose
  *                masks are put in plain decimal. IPv6: v6_mode; with "off" nothing is written; else lease_time, dns1,
  *                dns2, dns_more (each in brackets) and, when "stateful", start_ip and end_ip. Addresses and names are
- *                written as they are, but no text makes its line longer than 1023 bytes, and none of the range holds ","
+ *                written as they are, but no text makes its line longer than 1023 bytes, and none of the range holds
+ * ","
  * @return 0; -1 when nothing was written for bad arguments or an unknown mode; -1 as well when directory or file cannot
  *         be made or written, or an option is not valid: the lines before it are written
  */
@@ -300,7 +303,8 @@ int DHCPPXEConfSetEnable(int enable);
 /**
  * Switches the answers on or off and, when on, stores the boot file and server of the chosen kind and writes the
  * server's lines. The settings of the other kind, and all of them when off, stay as they are.
- * @param conf  boot file and address are neither empty nor hold ",", double quotes or control characters
+ * @param conf  boot file and address are neither empty nor hold ",", double quotes or control characters, and make no
+ * line longer than 1023 bytes
  * @return 0; -1, logged: the switch is set already then, and keys before the one that failed
  */
 int DHCPPXEConfSet(const DHCP_PXE_CONF *conf);
