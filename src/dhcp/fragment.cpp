@@ -71,17 +71,16 @@ const char *comma_fields::operator[](int index) const {
 }
 
 bool next_cut_line(const stream &file, char (&line)[kLineRoom]) {
-    if (fgets(line, sizeof line, file.get()) == nullptr) {
-        return false;
+    int byte = getc(file.get());
+    const bool is_there = byte != EOF;
+    size_t length = 0;
+    for (; byte != EOF && byte != '\n'; byte = getc(file.get())) {
+        if (length < sizeof line - 1) {
+            line[length++] = static_cast<char>(byte);
+        }
     }
-    char *const newline = strchr(line, '\n');
-    if (newline != nullptr) {
-        *newline = '\0';
-        return true;
-    }
-    for (int byte = getc(file.get()); byte != EOF && byte != '\n'; byte = getc(file.get())) {
-    }
-    return true;
+    line[length] = '\0';
+    return is_there;
 }
 
 heap<char> line_holding(const path_text &path, const char *text) {
