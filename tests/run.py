@@ -3,13 +3,15 @@
 
 usage: ./test [--list] [NAME...]
 
-A NAME is a ring (unit, platform, sanitize, valgrind, lab, gates), a test file (test_jobs, test_abi) or a source
-unit (net_set_ip); without a name everything runs. The last line counts the test cases.
+A NAME is a ring (unit, platform, property, sanitize, valgrind, lab, gates), a test file (test_jobs, test_abi), a source
+unit (net_set_ip), or dhcp-fuzz, which tries 10000 random DHCP subnets with another seed each time; without a name
+everything runs. KOVA_SEED and KOVA_ROUNDS say what the random tests try. The last line counts the test cases.
 """
 import argparse
 import concurrent.futures
 import os
 import pathlib
+import random
 import shutil
 import subprocess
 import sys
@@ -27,6 +29,8 @@ SLOWEST = 900  # seconds for one step
 
 class Step:
     """One test program in one box (or on the host), whose results come as a JUnit file."""
+
+    note = ""  # what else names the run
 
     def __init__(self, ring, name, command, report, environment=None):
         self.ring, self.name, self.command, self.report = ring, name, command, report
@@ -84,6 +88,17 @@ def gtest_step(out, ring, kind, build, unit=None, wrapper=(), without=()):
     return Step(ring, f"{kind}{'/' + unit if unit else ''}", boxed(out, [], command), report)
 
 
+def property_step(out, name, seed, rounds, chosen="*"):
+    report = out / f"{name}.xml"
+    command = [str(BUILD / "tests/property/kovanet-property-tests"), f"--gtest_output=xml:{report}", "--gtest_brief=1",
+               f"--gtest_filter={chosen}"]
+    settings = {"KOVA_SEED": os.environ.get("KOVA_SEED", str(seed)),
+                "KOVA_ROUNDS": os.environ.get("KOVA_ROUNDS", str(rounds))}
+    step = Step("property", name, boxed(out, [], command), report, settings)
+    step.note = " ".join(f"{name}={value}" for name, value in settings.items())
+    return step
+
+
 def units_of(kind):
     folder = ROOT / "tests" / kind
     return sorted(path.name.removesuffix("_test.cpp") for path in folder.glob("*_test.cpp"))
@@ -113,6 +128,7 @@ def all_steps(out):
         yield gtest_step(out, "sanitize", kind, BUILD / "sanitize")
     for kind in UNIT_PROGRAMS:
         yield gtest_step(out, "valgrind", kind, BUILD, wrapper=VALGRIND, without=NOT_UNDER_VALGRIND)
+    yield property_step(out, "random", seed=1, rounds=500)
     for path in sorted((ROOT / "tests" / "lab").glob("test_*.py")):
         yield pytest_step(out, "lab", path, inside_box=path.name != "test_box.py")
 
@@ -137,6 +153,8 @@ def chosen_steps(out, names):
     chosen = []
     for name in names:
         found = [step for step in steps if step.ring == name] or [step for step in steps if step.name == name]
+        if name == "dhcp-fuzz":
+            found = [property_step(out, name, seed=random.randrange(2**32), rounds=10000, chosen="dhcp_*")]
         for kind in UNIT_PROGRAMS:
             if not found and name in units_of(kind):
                 found = [gtest_step(out, kind, kind, BUILD, unit=name)]
@@ -149,7 +167,7 @@ def chosen_steps(out, names):
 def show(step):
     counts = f"{step.passed} passed" + (f", {step.failed} failed" if step.failed else "") \
         + (f", {step.skipped} skipped" if step.skipped else "")
-    print(f"{'FAILED' if step.failed else 'ok':7}{step.ring}/{step.name}: {counts} ({step.seconds:.1f} s)", flush=True)
+    print(f"{'FAILED' if step.failed else 'ok':7}{step.ring}/{step.name}: {counts} ({step.seconds:.1f} s){step.note and ' '}{step.note}", flush=True)
     for reason in step.reasons:
         print(f"       skipped {reason}")
     if step.failed:
@@ -167,6 +185,7 @@ def main():
         steps = chosen_steps(out, asked.names)
         if asked.list:
             print("\n".join(f"{step.ring}/{step.name}" for step in steps))
+            print("dhcp-fuzz")
             print("units:", *units_of("unit"), *units_of("platform"))
             return 0
         with concurrent.futures.ThreadPoolExecutor(max_workers=os.cpu_count()) as pool:
