@@ -167,7 +167,8 @@ def chosen_steps(out, names):
 def show(step):
     counts = f"{step.passed} passed" + (f", {step.failed} failed" if step.failed else "") \
         + (f", {step.skipped} skipped" if step.skipped else "")
-    print(f"{'FAILED' if step.failed else 'ok':7}{step.ring}/{step.name}: {counts} ({step.seconds:.1f} s){step.note and ' '}{step.note}", flush=True)
+    line = f"{'FAILED' if step.failed else 'ok':7}{step.ring}/{step.name}: {counts} ({step.seconds:.1f} s) {step.note}"
+    print(line.rstrip(), flush=True)
     for reason in step.reasons:
         print(f"       skipped {reason}")
     if step.failed:

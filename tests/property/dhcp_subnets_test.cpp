@@ -243,12 +243,21 @@ bool has_open_quote(const option &tried) {
     return false;
 }
 
+/** The daemon takes SIP servers and routes with an "x" in the line for names, or for plain text. */
+bool is_no_address_to_daemon(const option &tried) {
+    return tried.number >= 120 && tried.line_value().find('x') != std::string::npos;
+}
+
 /** Whether a part of an address is in octal or hexadecimal. */
 bool has_other_digits(const option &tried) {
-    const kind *const of = std::find_if(std::begin(kKinds), std::end(kKinds),
+    const std::string value = tried.line_value();
+    if (is_no_address_to_daemon(tried)) {
+        return false;
+    }
+    const auto *const of = std::find_if(std::begin(kKinds), std::end(kKinds),
                                         [&](const kind &each) { return each.number == tried.number; });
     const bool takes_addresses = of != std::end(kKinds) && of->takes >= kind::address;
-    return takes_addresses && std::regex_search(tried.line_value(), std::regex{"(^|[.,])0[0-9x]"});
+    return takes_addresses && std::regex_search(value, std::regex{"(^|[.,])0[0-9x]"});
 }
 
 struct finding {
@@ -258,13 +267,29 @@ struct finding {
     bool (*holds)(const option &tried);
 };
 
-size_t route_size(const option &tried) {
-    size_t size = 0;
+/** Bytes that the items of a list take in an option. */
+size_t size_of_list(const option &tried) {
+    if (is_no_address_to_daemon(tried)) {
+        return tried.line_value().size() + (tried.number == 120 ? 2 : 0); // labels, or the text
+    }
+    size_t size = tried.number == 120 ? 1 : 0;
     for (const std::string &item : tried.items) {
         const size_t slash = item.find('/');
         size += slash == std::string::npos ? 4 : 1 + (strtoul(item.c_str() + slash + 1, nullptr, 10) + 7) / 8;
     }
     return size;
+}
+
+std::string trimmed(const std::string &text) {
+    const size_t first = text.find_first_not_of(' ');
+    return first == std::string::npos ? "" : text.substr(first, text.find_last_not_of(' ') + 1 - first);
+}
+
+/** Whether a text holds nothing but what addresses and networks are made of, and is no number. */
+bool looks_like_address(const std::string &text) {
+    return text.find_first_not_of("0123456789./ ") == std::string::npos &&
+           text.find_first_of("./ ") != std::string::npos && text.find_first_of("0123456789") != std::string::npos &&
+           text[0] != '/';
 }
 
 const finding kRefusedByTheDaemon[] = {
@@ -281,9 +306,7 @@ const finding kRefusedByTheDaemon[] = {
     {"list of more than 255 bytes",
      "an option's length is one byte",
      {.number = 42, .name = "ntp-server", .is_list = true, .items = texts(64, "10.0.0.1")},
-     [](const option &tried) {
-         return tried.is_list && (tried.number == 121 ? route_size(tried) > 255 : tried.items.size() > 63);
-     }},
+     [](const option &tried) { return tried.is_list && size_of_list(tried) > 255; }},
     {"address with a part in octal or hexadecimal",
      "the library reads these as well, the daemon does not",
      {.number = 16, .name = "swap-server", .value = "010.0.0.1"},
@@ -297,11 +320,7 @@ const finding kRefusedByTheDaemon[] = {
     {"scope of digits, dots and slashes that is no address",
      "the daemon tries it as an address",
      {.number = 47, .name = "netbios-scope", .value = "1.2.3"},
-     [](const option &tried) {
-         return tried.number == 47 && tried.value.find_first_not_of("0123456789./ ") == std::string::npos &&
-                tried.value.find_first_of("./ ") != std::string::npos && tried.value[0] != '/' &&
-                tried.value.find_first_of("0123456789") != std::string::npos;
-     }},
+     [](const option &tried) { return tried.number == 47 && looks_like_address(trimmed(tried.value)); }},
 };
 
 /** The finding that a value belongs to; NULL when the daemon should take it. */
