@@ -61,9 +61,11 @@ public:
         return std::to_string(number(1, 126)) + "." + std::to_string(number(0, 255)) + "." +
                std::to_string(number(0, 255)) + "." + std::to_string(number(1, 254));
     }
-    /** The same, seldom with a part that is not in plain decimal. */
-    std::string any_address() {
-        return one_in(60) ? one_of({"0", "00", "0x"}) + std::to_string(number(1, 7)) + ".1.2.3" : address();
+    /** The same, seldom with a part in octal or, for options below 120, in hexadecimal: with an "x" the others are
+       names and texts to the daemon. */
+    std::string any_address(int option) {
+        const texts prefixes = option < 120 ? texts{"0", "00", "0x"} : texts{"0", "00"};
+        return one_in(60) ? one_of(prefixes) + std::to_string(number(1, 7)) + ".1.2.3" : address();
     }
     std::string mask() {
         const uint32_t bits = 0xffffffffU << number(1, 31);
@@ -192,21 +194,21 @@ option random_option(generator &any) {
         made.value = random_text(any);
         break;
     case kind::address:
-        made.value = any.any_address();
+        made.value = any.any_address(of.number);
         break;
     case kind::addresses:
         for (size_t left = random_count(any); left > 0; --left) {
-            made.items.push_back(any.any_address());
+            made.items.push_back(any.any_address(of.number));
         }
         break;
     case kind::filters:
         for (size_t left = random_count(any); left > 0; --left) {
-            made.items.push_back(made.items.size() % 2 == 0 ? any.any_address() : any.mask());
+            made.items.push_back(made.items.size() % 2 == 0 ? any.any_address(of.number) : any.mask());
         }
         break;
     case kind::routes:
         for (size_t left = random_count(any); left > 0; --left) {
-            made.items.push_back(any.any_address() +
+            made.items.push_back(any.any_address(of.number) +
                                  (made.items.size() % 2 == 0 ? "/" + std::to_string(any.number(0, 32)) : ""));
         }
         break;
@@ -243,17 +245,9 @@ bool has_open_quote(const option &tried) {
     return false;
 }
 
-/** The daemon takes SIP servers and routes with an "x" in the line for names, or for plain text. */
-bool is_no_address_to_daemon(const option &tried) {
-    return tried.number >= 120 && tried.line_value().find('x') != std::string::npos;
-}
-
 /** Whether a part of an address is in octal or hexadecimal. */
 bool has_other_digits(const option &tried) {
     const std::string value = tried.line_value();
-    if (is_no_address_to_daemon(tried)) {
-        return false;
-    }
     const auto *const of = std::find_if(std::begin(kKinds), std::end(kKinds),
                                         [&](const kind &each) { return each.number == tried.number; });
     const bool takes_addresses = of != std::end(kKinds) && of->takes >= kind::address;
@@ -269,9 +263,6 @@ struct finding {
 
 /** Bytes that the items of a list take in an option. */
 size_t size_of_list(const option &tried) {
-    if (is_no_address_to_daemon(tried)) {
-        return tried.line_value().size() + (tried.number == 120 ? 2 : 0); // labels, or the text
-    }
     size_t size = tried.number == 120 ? 1 : 0;
     for (const std::string &item : tried.items) {
         const size_t slash = item.find('/');
@@ -285,9 +276,10 @@ std::string trimmed(const std::string &text) {
     return first == std::string::npos ? "" : text.substr(first, text.find_last_not_of(' ') + 1 - first);
 }
 
-/** Whether a text holds nothing but what addresses and networks are made of, and is no number. */
+/** Whether a text holds nothing but what addresses and networks are made of, and is neither one nor a number. */
 bool looks_like_address(const std::string &text) {
-    return text.find_first_not_of("0123456789./ ") == std::string::npos &&
+    return !std::regex_match(text, std::regex{"[0-9]+([.][0-9]+){3}(/[0-9]+)?"}) &&
+           text.find_first_not_of("0123456789./ ") == std::string::npos &&
            text.find_first_of("./ ") != std::string::npos && text.find_first_of("0123456789") != std::string::npos &&
            text[0] != '/';
 }
