@@ -48,7 +48,7 @@ bool is_range(const comma_fields &fields) {
 }
 
 /** Reads the range of one fragment into a new node. @return 0; -1, logged */
-int read_range(const char *ifname, unsigned subnet, const path_text &path, DHCP_RANGE **node) {
+int read_range(const char *ifname, unsigned subnet, const path_text &path, heap<DHCP_RANGE> &node) {
     char value[1024];
     if (KLIBCFileGetKeyValue(path.c_str(), daemon_key::kRange, value, sizeof value, 0) <= 0 || value[0] == '\0') {
         return fail_keeping_code(HERE, -1, "Failed to get dhcp ranges from subnet [%u] in interface [%s]", subnet,
@@ -61,14 +61,14 @@ int read_range(const char *ifname, unsigned subnet, const path_text &path, DHCP_
     if (!is_range(fields)) {
         return fail_keeping_code(HERE, -1, "Wrong dhcp-range key in subnet [%u] in interface [%s]", subnet, ifname);
     }
-    *node = static_cast<DHCP_RANGE *>(malloc(sizeof(DHCP_RANGE)));
-    if (*node == nullptr) {
+    node.reset(static_cast<DHCP_RANGE *>(malloc(sizeof(DHCP_RANGE))));
+    if (node == nullptr) {
         return fail_keeping_code(HERE, -1, "malloc() failed");
     }
-    **node = {};
-    copy_text((*node)->start, fields[1]);
-    copy_text((*node)->end, fields[2]);
-    copy_text((*node)->netmask, fields[3]);
+    *node = {};
+    copy_text(node->start, fields[1]);
+    copy_text(node->end, fields[2]);
+    copy_text(node->netmask, fields[3]);
     return 0;
 }
 
@@ -135,9 +135,11 @@ extern "C" int DHCPGetInterfaceRanges(const char *ifname, DHCP_RANGE **head) {
         if (KLIBCFileExist(path.c_str()) != 1) {
             break;
         }
-        if (read_range(ifname, subnet, path, end) < 0) {
+        heap<DHCP_RANGE> node;
+        if (read_range(ifname, subnet, path, node) < 0) {
             return -1;
         }
+        *end = node.release();
         end = &(*end)->next;
     }
     *head = ranges.give_up();

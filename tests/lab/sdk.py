@@ -7,6 +7,15 @@ class NetInfo(ctypes.Structure):
                 ("abMac", ctypes.c_ubyte * 6), ("szIP", ctypes.c_char * 20), ("szMask", ctypes.c_char * 20)]
 
 
+class DhcpTagConf(ctypes.Structure):
+    _fields_ = [("enabled", ctypes.c_int32), ("reserved", ctypes.c_int32), ("lease_time", ctypes.c_int32),
+                ("start_ip", ctypes.c_char * 46), ("end_ip", ctypes.c_char * 46), ("ifname", ctypes.c_char * 16),
+                ("domain", ctypes.c_char * 4096), ("dns1", ctypes.c_char * 46), ("dns2", ctypes.c_char * 46),
+                ("dns_more", ctypes.c_char * 4096), ("netmask", ctypes.c_char * 46), ("router", ctypes.c_char * 46),
+                ("reserved_text", ctypes.c_char * 4096), ("tag", ctypes.c_char * 20), ("v6_mode", ctypes.c_char * 20),
+                ("options", ctypes.c_void_p)]
+
+
 DHCP, STATIC = 0, 1
 library = ctypes.CDLL("libkovanetsdk.so.6")
 core = ctypes.CDLL("libkovacore.so.6")

@@ -255,7 +255,7 @@ def test_empty_master_is_no_bond_member():
     assert addresses("eth0") == ["192.168.77.5/24"]
 
 
-@pytest.mark.parametrize("words", [[], ["status"], ["nat-start-dhcp"], ["--help", "eth0"]])
+@pytest.mark.parametrize("words", [[], ["status"], ["nat-stop-dhcp"], ["--help", "eth0"]])
 def test_unknown_verb_is_bad_usage(words):
     assert network(*words, status=2).stderr.startswith("usage: rc.network ")
 

@@ -91,8 +91,7 @@ TEST_F(dhcp_interface_list_get, DHCPInterfaceListGet_badArguments_areRefused) {
     EXPECT_OUTCOME(rig.observe([] { return DHCPInterfaceListGet(nullptr, kV4); }),
                    {.result = -1, .log = {"ERR dhcp_interface_list_get:N Parameter error"}});
     for (const int type : {-1, 2, INT32_MAX}) {
-        EXPECT_OUTCOME(list(type, true),
-                       {.result = -1, .log = {"ERR dhcp_interface_list_get:N Wrong DHCPD ip type"}});
+        EXPECT_OUTCOME(list(type, true), {.result = -1, .log = {"ERR dhcp_interface_list_get:N Wrong DHCPD ip type"}});
         EXPECT_EQ(texts{"old"}, names);
     }
 }
