@@ -3,13 +3,16 @@
 
 usage: ./test [--list] [NAME...]
 
-A NAME is a ring (unit, platform, crash, sanitize, valgrind, coverage, lab, gates), a test file (test_jobs, test_abi) or
-a source unit (net_set_ip); without a name everything runs. The last line counts the test cases.
+A NAME is a ring (unit, platform, property, crash, sanitize, valgrind, coverage, lab, gates), a test file (test_jobs,
+test_abi), a source unit (net_set_ip), or dhcp-fuzz, which tries 10000 random DHCP subnets with another seed each time;
+without a name everything runs. KOVA_SEED and KOVA_ROUNDS say what the random tests try. The last line counts the test
+cases.
 """
 import argparse
 import concurrent.futures
 import os
 import pathlib
+import random
 import shutil
 import subprocess
 import sys
@@ -33,6 +36,8 @@ class Step:
     with the text "shown" are measurements, to be seen also when all is well. One that is "last" judges what the others
     have left.
     """
+
+    note = ""  # what else names the run
 
     def __init__(self, ring, name, command, report, environment=None, shown=None, last=False):
         self.ring, self.name, self.command, self.report, self.shown = ring, name, command, report, shown
@@ -91,6 +96,17 @@ def gtest_step(out, ring, kind, build, unit=None, wrapper=(), without=(), **more
     return Step(ring, f"{kind}{'/' + unit if unit else ''}", boxed(out, [], command), report, **more)
 
 
+def property_step(out, name, seed, rounds, chosen="*"):
+    report = out / f"{name}.xml"
+    command = [str(BUILD / "tests/property/kovanet-property-tests"), f"--gtest_output=xml:{report}", "--gtest_brief=1",
+               f"--gtest_filter={chosen}"]
+    settings = {"KOVA_SEED": os.environ.get("KOVA_SEED", str(seed)),
+                "KOVA_ROUNDS": os.environ.get("KOVA_ROUNDS", str(rounds))}
+    step = Step("property", name, boxed(out, [], command), report, settings)
+    step.note = " ".join(f"{name}={value}" for name, value in settings.items())
+    return step
+
+
 def units_of(kind):
     folder = ROOT / "tests" / kind
     return sorted(path.name.removesuffix("_test.cpp") for path in folder.glob("*_test.cpp"))
@@ -134,6 +150,7 @@ def all_steps(out):
     for kind in UNIT_PROGRAMS:
         yield gtest_step(out, "valgrind", kind, BUILD, wrapper=VALGRIND, without=NOT_UNDER_VALGRIND)
     yield from coverage_steps(out)
+    yield property_step(out, "random", seed=1, rounds=500)
     for path in sorted((ROOT / "tests" / "lab").glob("test_*.py")):
         yield pytest_step(out, "lab", path, inside_box=path.name != "test_box.py")
 
@@ -159,6 +176,8 @@ def chosen_steps(out, names):
     chosen = []
     for name in names:
         found = [step for step in steps if step.ring == name] or [step for step in steps if step.name == name]
+        if name == "dhcp-fuzz":
+            found = [property_step(out, name, seed=random.randrange(2**32), rounds=10000, chosen="dhcp_*")]
         for kind in UNIT_PROGRAMS:
             if not found and name in units_of(kind):
                 found = [gtest_step(out, kind, kind, BUILD, unit=name)]
@@ -171,7 +190,8 @@ def chosen_steps(out, names):
 def show(step):
     counts = f"{step.passed} passed" + (f", {step.failed} failed" if step.failed else "") \
         + (f", {step.skipped} skipped" if step.skipped else "")
-    print(f"{'FAILED' if step.failed else 'ok':7}{step.ring}/{step.name}: {counts} ({step.seconds:.1f} s)", flush=True)
+    line = f"{'FAILED' if step.failed else 'ok':7}{step.ring}/{step.name}: {counts} ({step.seconds:.1f} s) {step.note}"
+    print(line.rstrip(), flush=True)
     for reason in step.reasons:
         print(f"       skipped {reason}")
     if step.failed:
@@ -192,6 +212,7 @@ def main():
         steps = chosen_steps(out, asked.names)
         if asked.list:
             print("\n".join(f"{step.ring}/{step.name}" for step in steps))
+            print("dhcp-fuzz")
             print("units:", *units_of("unit"), *units_of("platform"))
             return 0
         for now in ([step for step in steps if not step.last], [step for step in steps if step.last]):

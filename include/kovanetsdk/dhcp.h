@@ -26,7 +26,7 @@ extern "C" {
 
 struct DHCP_OPTION;
 
-/** A served subnet. Texts are terminated; none that is written to a fragment holds CR or LF. */
+/** A served subnet. Texts are terminated; none that is written to a fragment holds a control character. */
 typedef struct DHCP_TAG_CONF {
     int32_t enabled;             /**< 1 when the subnet is served */
     int32_t reserved;            /**< not used */
@@ -102,8 +102,9 @@ int DHCPInterfaceListGet(KLIBSZLIST **list_inout, int type);
  * range, router, search domain (unless "") and name servers; makes the directory by /bin/mkdir -p.
  * @param conf    the subnet: ifname, tag, and when on start_ip, end_ip, netmask, lease_time, router, domain, dns1, dns2
  * @param enable  not 0: on; 0: off, .conf stays as it is
- * @return 1; 0 when nothing was written for a bad record (NULL, names as above, a text without its end or with CR or
- *         LF), or when directory or a file cannot be made: .info may be written already then
+ * @return 1; 0 when nothing was written for a bad record (NULL, names as above, a text without its end or with a
+ * control character, "," in a name or the range, a domain that makes its line longer than 1023 bytes), or when
+ * directory or a file cannot be made: .info may be written already then
  */
 int KOVANetSetDhcpServerConfigFiles(const DHCP_TAG_CONF *conf, int enable);
 /**
@@ -116,6 +117,68 @@ int KOVANetSetDhcpServerConfigFiles(const DHCP_TAG_CONF *conf, int enable);
  * @return 1; 0 for NULL (silent), bad names, no .conf, or one without range, name servers, router or interface
  */
 int KOVANetGetDhcpServerConf(const char *tag, const char *ifname, DHCP_TAG_CONF *conf_out);
+
+/* ---- numbered subnets ------------------------------------------------------------------------------------------ */
+
+/**
+ * Writes a subnet: its switch as DHCPTagConfSetEnable, then its fragment as DHCPTagConfSetConfig.
+ * @param ifname  interface
+ * @param subnet  number of the subnet
+ * @param type    family
+ * @param conf    "enabled" and what DHCPTagConfSetConfig takes
+ * @return 0; -1. Nothing is written for bad arguments; with an unknown mode or an option that is not valid the switch
+ * is
+ */
+int DHCPTagConfSet(const char *ifname, unsigned int subnet, int type, const DHCP_TAG_CONF *conf);
+/**
+ * Writes the switch of a subnet, /etc/dhcpd/dhcpd-<ifname>-subnet<N>.info or dhcpd6-<ifname>-subnet<N>.info, whole;
+ * makes the directory by /bin/mkdir -p.
+ * @param enable  1 on, anything else off
+ * @return 0; -1 for a bad name or type, or when directory or file cannot be made or written
+ */
+int DHCPTagConfSetEnable(const char *ifname, unsigned int subnet, int type, int enable);
+/**
+ * Writes the fragment of a subnet, the same path with ".conf", for the clients with the tag <ifname><N> or, of IPv6,
+ * <ifname>v6<N>; makes the directory by /bin/mkdir -p.
+ * @param ifname  interface, without ","
+ * @param conf    IPv4: start_ip, end_ip, netmask, lease_time, router, domain, dns1, dns2, dns_more and options, whose
+ *                masks are put in plain decimal. IPv6: v6_mode; with "off" nothing is written; else lease_time, dns1,
+ *                dns2, dns_more (each in brackets) and, when "stateful", start_ip and end_ip. Addresses and names are
+ *                written as they are, but no text makes its line longer than 1023 bytes, and none of the range holds
+ * ","
+ * @return 0; -1 when nothing was written for bad arguments or an unknown mode; -1 as well when directory or file cannot
+ *         be made or written, or an option is not valid: the lines before it are written
+ */
+int DHCPTagConfSetConfig(const char *ifname, unsigned int subnet, int type, const DHCP_TAG_CONF *conf);
+/**
+ * Reads the switch of a subnet.
+ * @param enabled  receives 1 or 0
+ * @return 1 when it has one; 0 when not; -1 for bad arguments
+ */
+int DHCPTagConfGetEnable(const char *ifname, unsigned int subnet, int type, int *enabled);
+/**
+ * Reads a subnet back. The name may be a field of the record itself.
+ * @param conf  is emptied, then receives enabled, lease_time, dns1, dns2 and
+ *              IPv4: ifname, start_ip, end_ip, netmask and router cut to 19 characters, domain (the last one of a list)
+ *              to 254, and options, to be freed by DHCPOptionFree: those that are no valid option are logged and left
+ *              out. IPv6: v6_mode, start_ip, end_ip; a lease time that is no number is 3600. What the record held in
+ *              "options" is not freed
+ * @return 1; 0 without a fragment; -1 for bad arguments, no memory, or a fragment without range, name servers or, of
+ *         IPv4, interface or router: the record is partly filled then, without options
+ */
+int DHCPTagConfGet(const char *ifname, unsigned int subnet, int type, DHCP_TAG_CONF *conf);
+
+/**
+ * Hands the switches of the interfaces on when a bond is made or taken apart, then restarts the server. In the info
+ * files that are there, of both families, the interfaces that lose their address keep `enable` as
+ * `bonding_backup_enable` and are switched off; those that get one take back what they kept, if anything.
+ * @param op      1: interfaces went into the bond; anything else: the bond is gone
+ * @param bond    the bond
+ * @param slaves  names of its interfaces
+ * @return 0, also when the server does not restart; -1 for bad arguments (0xD00 but for a NULL bond) with nothing
+ *         changed, or for a file without `enable`, or that cannot be changed: those before it stay changed
+ */
+int DHCPDLinkAggrSet(int op, const char *bond, const KLIBSZLIST *slaves);
 
 /* ---- IPv4 ranges ----------------------------------------------------------------------------------------------- */
 
@@ -240,7 +303,8 @@ int DHCPPXEConfSetEnable(int enable);
 /**
  * Switches the answers on or off and, when on, stores the boot file and server of the chosen kind and writes the
  * server's lines. The settings of the other kind, and all of them when off, stay as they are.
- * @param conf  boot file and address are neither empty nor hold ",", double quotes or control characters
+ * @param conf  boot file and address are neither empty nor hold ",", double quotes or control characters, and make no
+ * line longer than 1023 bytes
  * @return 0; -1, logged: the switch is set already then, and keys before the one that failed
  */
 int DHCPPXEConfSet(const DHCP_PXE_CONF *conf);

@@ -6,6 +6,7 @@
 #pragma once
 
 #include "core/guards.h"
+#include "core/report.h"
 
 #include <kovanetsdk/dhcp.h>
 
@@ -50,9 +51,9 @@ using option_list = owner<options_kind>;
 
 /**
  * Reads the options of a fragment in the order of its lines. A line that is none of a supported option is logged and
- * left out; the lines of router, DNS servers and domain are left out silently.
- * @return 0; -1, logged, when the file cannot be read or memory runs out
+ * left out, at the caller's place; the lines of router, DNS servers and domain are left out silently.
+ * @return 0; -1, logged there, when the file cannot be read or memory runs out
  */
-[[nodiscard]] int read_options(const char *path, option_list &options);
+[[nodiscard]] int read_options(const place &at, const char *path, option_list &options);
 
 } // namespace kova

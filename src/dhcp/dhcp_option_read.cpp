@@ -85,10 +85,10 @@ outcome parse_line(const char *line, option_list &option) {
 
 } // namespace
 
-int read_options(const char *path, option_list &options) {
+int read_options(const place &at, const char *path, option_list &options) {
     const stream file{fopen(path, "re")};
     if (!file.is_held()) {
-        return fail_keeping_code(HERE, -1, "Failed to open DHCP config [%s] for reading", path);
+        return fail_keeping_code(at, -1, "Failed to open DHCP config [%s] for reading", path);
     }
     DHCP_OPTION **end = options.out();
     char line[kLineRoom];
@@ -105,10 +105,10 @@ int read_options(const char *path, option_list &options) {
         case outcome::is_no_option:
             break;
         case outcome::is_malformed:
-            log_warning(HERE, "Wrong user-defined dhcp option format [%s]", line);
+            log_warning(at, "Wrong user-defined dhcp option format [%s]", line);
             break;
         case outcome::no_memory:
-            return fail_keeping_code(HERE, -1, "Failed to get dhcp options from [%s]", path);
+            return fail_keeping_code(at, -1, "Failed to get dhcp options from [%s]", path);
         }
     }
     return 0;

@@ -3,6 +3,7 @@
 #include "core/guards.h"
 #include "core/ifcfg.h"
 #include "core/report.h"
+#include "core/text.h"
 #include "dhcp/dhcpd_files.h"
 #include "dhcp/fragment.h"
 
@@ -69,6 +70,15 @@ template<size_t Size> bool is_boot_field(const char (&value)[Size]) {
     return memchr(value, '\0', Size) != nullptr && is_list_field(value) && strchr(value, '"') == nullptr;
 }
 
+/** The line of the boot file. */
+using boot_line = built_text<kLineRoom + 1>;
+
+boot_line line_of(const DHCP_PXE_CONF &conf) {
+    return conf.is_remote_tftp == 1 ? boot_line{"dhcp-boot=tag:%s,%s,bootserver,%s\n", kTag, conf.remote_bootloader,
+                                                conf.remote_tftp_server_ip}
+                                    : boot_line{"dhcp-boot=tag:%s,%s\n", kTag, conf.local_bootloader};
+}
+
 bool refuses_boot_settings(const DHCP_PXE_CONF &conf) {
     const bool is_remote = conf.is_remote_tftp == 1;
     if (is_remote && *conf.remote_bootloader == '\0') {
@@ -85,10 +95,11 @@ bool refuses_boot_settings(const DHCP_PXE_CONF &conf) {
     }
     const bool is_valid = is_remote ? is_boot_field(conf.remote_bootloader) && is_boot_field(conf.remote_tftp_server_ip)
                                     : is_boot_field(conf.local_bootloader);
-    if (!is_valid) {
-        log_err(HERE, "input error when set PXE config: comma, double quote, control character or no end");
+    if (!is_valid || !line_of(conf).fits()) {
+        log_err(HERE, "input error when set PXE config: comma, double quote, control character, no end or too long");
+        return true;
     }
-    return !is_valid;
+    return false;
 }
 
 /** Writes what the daemon reads. */
@@ -98,12 +109,7 @@ bool write_fragment(const DHCP_PXE_CONF &conf) {
         log_err(HERE, "Failed to open file [%s].", kFragment);
         return false;
     }
-    if (conf.is_remote_tftp == 1) {
-        fprintf(file.get(), "dhcp-boot=tag:%s,%s,bootserver,%s\n", kTag, conf.remote_bootloader,
-                conf.remote_tftp_server_ip);
-    } else {
-        fprintf(file.get(), "dhcp-boot=tag:%s,%s\n", kTag, conf.local_bootloader);
-    }
+    fputs(line_of(conf).c_str(), file.get());
     fputs("dhcp-vendorclass=set:pxe,PXEClient\n", file.get());
     if (!close_written(file)) {
         log_err(HERE, "Failed to write file [%s].", kFragment);

@@ -34,6 +34,12 @@ inline path_text subnet_conf_path(int type, const char *ifname, unsigned subnet)
                            : path_text{"/etc/dhcpd/dhcpd6-%s-subnet%u.conf", ifname, subnet};
 }
 
+/** The switch of a numbered subnet. */
+inline path_text subnet_info_path(int type, const char *ifname, unsigned subnet) {
+    return type == kTypeV4 ? path_text{"/etc/dhcpd/dhcpd-%s-subnet%u.info", ifname, subnet}
+                           : path_text{"/etc/dhcpd/dhcpd6-%s-subnet%u.info", ifname, subnet};
+}
+
 /** The key of the info files. */
 inline constexpr char kEnable[] = "enable";
 inline const char *yes_or_no(bool is_on) {

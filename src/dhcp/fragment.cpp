@@ -6,6 +6,12 @@
 
 namespace kova {
 
+namespace {
+
+constexpr char kOptionLine[] = "dhcp-option=tag:%s,%s,%s\n";
+
+} // namespace
+
 bool is_line_text(const char *text) {
     for (const char *byte = text; *byte != '\0'; ++byte) {
         if (static_cast<unsigned char>(*byte) < ' ' || *byte == '\x7f') {
@@ -17,6 +23,10 @@ bool is_line_text(const char *text) {
 
 bool is_list_field(const char *text) {
     return *text != '\0' && is_line_text(text) && strchr(text, ',') == nullptr;
+}
+
+bool is_one_line(const char *tag, const char *name, const char *value) {
+    return built_text<kLineRoom + 1>{kOptionLine, tag, name, value}.fits();
 }
 
 void fragment::write_enable(bool is_on) {
@@ -31,12 +41,20 @@ void fragment::write_range(const char *tag, const char *start, const char *end, 
     fprintf(file_.get(), "dhcp-range=set:%s,%s,%s,%s,%d\n", tag, start, end, mask, lease_time);
 }
 
+void fragment::write_advertised_range(const char *tag, const char *ifname, const char *mode, int lease_time) {
+    fprintf(file_.get(), "dhcp-range=set:%s,::,constructor:%s,%s,64,%d\n", tag, ifname, mode, lease_time);
+}
+
 void fragment::write_option(const char *tag, const char *name, const char *value) {
-    fprintf(file_.get(), "dhcp-option=tag:%s,%s,%s\n", tag, name, value);
+    fprintf(file_.get(), kOptionLine, tag, name, value);
 }
 
 void fragment::write_option(const char *tag, const char *name, const char *first, const char *second) {
     fprintf(file_.get(), "dhcp-option=tag:%s,%s,%s,%s\n", tag, name, first, second);
+}
+
+void fragment::write_enable_ra() {
+    fputs("enable-ra\n", file_.get());
 }
 
 bool fragment::close() {
@@ -44,7 +62,8 @@ bool fragment::close() {
 }
 
 comma_fields::comma_fields(const char *text)
-    : list_(make_list()), count_(list_.is_held() ? split_fields(text, ",", list_.get()) : -1) {}
+    : list_(text != nullptr ? make_list() : string_list{}),
+      count_(list_.is_held() ? split_fields(text, ",", list_.get()) : -1) {}
 
 const char *comma_fields::operator[](int index) const {
     const char *const field = is_held() ? KLIBCSzListGet(list_.get(), index) : nullptr;
@@ -52,17 +71,16 @@ const char *comma_fields::operator[](int index) const {
 }
 
 bool next_cut_line(const stream &file, char (&line)[kLineRoom]) {
-    if (fgets(line, sizeof line, file.get()) == nullptr) {
-        return false;
+    int byte = getc(file.get());
+    const bool is_there = byte != EOF;
+    size_t length = 0;
+    for (; byte != EOF && byte != '\n'; byte = getc(file.get())) {
+        if (length < sizeof line - 1) {
+            line[length++] = static_cast<char>(byte);
+        }
     }
-    char *const newline = strchr(line, '\n');
-    if (newline != nullptr) {
-        *newline = '\0';
-        return true;
-    }
-    for (int byte = getc(file.get()); byte != EOF && byte != '\n'; byte = getc(file.get())) {
-    }
-    return true;
+    line[length] = '\0';
+    return is_there;
 }
 
 heap<char> line_holding(const path_text &path, const char *text) {
@@ -75,6 +93,25 @@ heap<char> line_holding(const path_text &path, const char *text) {
         line.get()[strcspn(line.get(), "\r")] = '\0'; // written elsewhere, perhaps
     }
     return line;
+}
+
+comma_fields fields_of_line(const path_text &path, const char *text) {
+    return comma_fields{line_holding(path, text).get()};
+}
+
+comma_fields fields_of_range(const path_text &path) {
+    char value[kLineRoom];
+    const bool is_there = KLIBCFileGetKeyValue(path.c_str(), daemon_key::kRange, value, sizeof value, 0) > 0;
+    return comma_fields{is_there ? value : nullptr};
+}
+
+bool read_v4_range(const path_text &path, DHCP_TAG_CONF &conf) {
+    const comma_fields fields = fields_of_range(path);
+    copy_cut(conf.start_ip, kAddressRoom, fields[1]);
+    copy_cut(conf.end_ip, kAddressRoom, fields[2]);
+    copy_cut(conf.netmask, kAddressRoom, fields[3]);
+    leading_number(fields[4], conf.lease_time);
+    return fields.is_held();
 }
 
 bool read_option(const path_text &path, const char *name, char *out, size_t size) {

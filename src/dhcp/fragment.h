@@ -9,6 +9,7 @@
 #include "core/text.h"
 
 #include <cstring>
+#include <kovanetsdk/dhcp.h>
 
 namespace kova {
 
@@ -19,8 +20,13 @@ inline constexpr char kRange[] = "dhcp-range";
 inline constexpr char kOption[] = "dhcp-option";
 inline constexpr char kRouter[] = "option:router";
 inline constexpr char kDomainSearch[] = "option:domain-search";
+inline constexpr char kDomainName[] = "option:domain-name";
 inline constexpr char kDnsServer[] = "option:dns-server";
+inline constexpr char kDnsServerV6[] = "option6:dns-server";
 } // namespace daemon_key
+
+/** Room for a line of a fragment: what is longer is not written, and cut by who reads it. */
+inline constexpr int kLineRoom = 1024;
 
 /** Whether a text can be part of a line: no control character in it, the line's end above all. */
 [[nodiscard]] bool is_line_text(const char *text);
@@ -32,6 +38,17 @@ inline constexpr char kDnsServer[] = "option:dns-server";
 template<size_t Size> [[nodiscard]] bool is_line_field(const char (&field)[Size]) {
     return memchr(field, '\0', Size) != nullptr && is_line_text(field);
 }
+
+/** The same for what stands between two ",", perhaps empty. */
+template<size_t Size> [[nodiscard]] bool is_range_field(const char (&field)[Size]) {
+    return is_line_field(field) && strchr(field, ',') == nullptr;
+}
+
+/**
+ * Whether an option for the clients with a tag is one line for the daemon and for the readers here. What is beyond
+ * their room the daemon takes for the next line, which a long value could so forge.
+ */
+[[nodiscard]] bool is_one_line(const char *tag, const char *name, const char *value);
 
 /**
  * A fragment, or an info file, that is written whole: emptied when opened, then filled line by line. All texts have
@@ -49,9 +66,13 @@ public:
     void write_interface(const char *ifname);
     /** A range from address to address; `mask` is the prefix length for IPv6. */
     void write_range(const char *tag, const char *start, const char *end, const char *mask, int lease_time);
+    /** A range of IPv6 that is built on the addresses of an interface. */
+    void write_advertised_range(const char *tag, const char *ifname, const char *mode, int lease_time);
     /** An option for the clients with a tag; `name` with its "option:". */
     void write_option(const char *tag, const char *name, const char *value);
     void write_option(const char *tag, const char *name, const char *first, const char *second);
+    /** The flag that turns router advertisements on. */
+    void write_enable_ra();
 
     /** @return whether everything was written */
     [[nodiscard]] bool close();
@@ -63,8 +84,9 @@ private:
 /** The fields of a text between ",", empty ones included. */
 class comma_fields {
 public:
+    /** NULL is no text. */
     explicit comma_fields(const char *text);
-    /** Whether there was memory for the list. */
+    /** Whether there was a text, and memory for the list. */
     [[nodiscard]] bool is_held() const { return count_ >= 0; }
     [[nodiscard]] int count() const { return count_; }
     /** A field, "" past the last one and without memory for the list. */
@@ -75,9 +97,6 @@ private:
     int count_;
 };
 
-/** Room for a line of a fragment whose readers cut longer ones. */
-inline constexpr int kLineRoom = 1024;
-
 /** The next line without its newline, cut to the room; what is beyond is passed over. @return false at the end */
 [[nodiscard]] bool next_cut_line(const stream &file, char (&line)[kLineRoom]);
 
@@ -86,6 +105,19 @@ inline constexpr int kLineRoom = 1024;
  * @return the line; NULL when there is none, the file cannot be read or memory runs out
  */
 [[nodiscard]] heap<char> line_holding(const path_text &path, const char *text);
+
+/** The fields of that line, tag first; not held when there is none. */
+[[nodiscard]] comma_fields fields_of_line(const path_text &path, const char *text);
+
+/** The fields of a file's range, tag first; not held when there is none. */
+[[nodiscard]] comma_fields fields_of_range(const path_text &path);
+
+/** Room for addresses of IPv4 subnets, however long their fields are: readers cut to it. */
+inline constexpr size_t kAddressRoom = 20;
+
+/** Reads addresses, mask and lease time of an IPv4 range, each "" or 0 when missing. @return whether there is a range
+ */
+[[nodiscard]] bool read_v4_range(const path_text &path, DHCP_TAG_CONF &conf);
 
 /**
  * Reads an option: the last field of the first line that holds its name.

@@ -1,6 +1,5 @@
 #include <kovanetsdk/dhcp.h>
 
-#include "core/kernel_files.h"
 #include "core/report.h"
 #include "core/text.h"
 #include "dhcp/dhcpd_files.h"
@@ -21,14 +20,14 @@ path_text info_path(const char *ifname, const char *tag) {
 }
 
 bool has_usable_names(const DHCP_TAG_CONF &conf) {
-    return is_line_field(conf.ifname) && is_interface_name(conf.ifname) && is_line_field(conf.tag) &&
+    return is_range_field(conf.ifname) && is_interface_name(conf.ifname) && is_range_field(conf.tag) &&
            is_interface_name(conf.tag);
 }
 
 bool has_usable_values(const DHCP_TAG_CONF &conf) {
-    return is_line_field(conf.start_ip) && is_line_field(conf.end_ip) && is_line_field(conf.netmask) &&
+    return is_range_field(conf.start_ip) && is_range_field(conf.end_ip) && is_range_field(conf.netmask) &&
            is_line_field(conf.router) && is_line_field(conf.domain) && is_line_field(conf.dns1) &&
-           is_line_field(conf.dns2);
+           is_line_field(conf.dns2) && is_one_line(conf.tag, daemon_key::kDomainSearch, conf.domain);
 }
 
 /** Opens one of the files empty. @return whether it is open; logged when not */
@@ -58,32 +57,13 @@ int fail_to_set(const char *ifname) {
     return fail_keeping_code(HERE, 0, "Failed to set config file of dhcp server [%s].", ifname);
 }
 
-// ---- reading; every value is cut to kValueSize, however long its field is
-
-constexpr size_t kValueSize = 20;
-
-bool read_range(const path_text &path, DHCP_TAG_CONF &conf) {
-    char value[1024];
-    if (KLIBCFileGetKeyValue(path.c_str(), daemon_key::kRange, value, sizeof value, 0) <= 0) {
-        return false;
-    }
-    const comma_fields fields{value};
-    copy_cut(conf.start_ip, kValueSize, fields[1]);
-    copy_cut(conf.end_ip, kValueSize, fields[2]);
-    copy_cut(conf.netmask, kValueSize, fields[3]);
-    leading_number(fields[4], conf.lease_time);
-    return fields.is_held();
-}
+// ---- reading; every value is cut to kAddressRoom, however long its field is
 
 bool read_dns(const path_text &path, DHCP_TAG_CONF &conf) {
-    const heap<char> line = line_holding(path, daemon_key::kDnsServer);
-    if (line == nullptr) {
-        return false;
-    }
-    const comma_fields fields{line.get()};
+    const comma_fields fields = fields_of_line(path, daemon_key::kDnsServer);
     if (fields.count() == 3 || fields.count() == 4) {
-        copy_cut(conf.dns1, kValueSize, fields[2]);
-        copy_cut(conf.dns2, kValueSize, fields[3]);
+        copy_cut(conf.dns1, kAddressRoom, fields[2]);
+        copy_cut(conf.dns2, kAddressRoom, fields[3]);
     }
     return fields.is_held();
 }
@@ -91,19 +71,19 @@ bool read_dns(const path_text &path, DHCP_TAG_CONF &conf) {
 /** @return 1; 0, logged, when a line is missing that has to be there */
 int read_subnet(const path_text &path, DHCP_TAG_CONF &conf) {
     constexpr char kMissing[] = "Failed to get key %s";
-    if (!read_range(path, conf)) {
+    if (!read_v4_range(path, conf)) {
         return fail_keeping_code(HERE, 0, kMissing, daemon_key::kRange);
     }
     if (!read_dns(path, conf)) {
         return fail_keeping_code(HERE, 0, kMissing, daemon_key::kOption);
     }
-    if (!read_option(path, daemon_key::kRouter, conf.router, kValueSize)) {
+    if (!read_option(path, daemon_key::kRouter, conf.router, kAddressRoom)) {
         return fail_keeping_code(HERE, 0, kMissing, daemon_key::kRouter);
     }
     if (KLIBCFileGetKeyValue(path.c_str(), daemon_key::kInterface, conf.ifname, sizeof conf.ifname, 0) <= 0) {
         return fail_keeping_code(HERE, 0, "Failed to get key %s in %s", daemon_key::kInterface, path.c_str());
     }
-    (void)read_option(path, daemon_key::kDomainSearch, conf.domain, kValueSize); // a subnet may do without
+    (void)read_option(path, daemon_key::kDomainSearch, conf.domain, kAddressRoom); // a subnet may do without
     return 1;
 }
 

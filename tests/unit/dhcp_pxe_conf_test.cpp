@@ -225,14 +225,18 @@ TEST_F(dhcp_pxe_conf, DHCPPXEConfSet_emptyField_isRefusedForTheChosenModeOnly) {
 TEST_F(dhcp_pxe_conf, DHCPPXEConfSet_fieldThatWouldChangeTheLine_isRefused) {
     const outcome refused{
         .result = -1,
-        .log = {"ERR dhcp_pxe_conf:N input error when set PXE config: comma, double quote, control character or no end",
-                kNotSet},
+        .log =
+            {"ERR dhcp_pxe_conf:N input error when set PXE config: comma, double quote, control character, no end or too long",
+             kNotSet},
         .commands = kMkdir};
     for (const std::string &loader : texts{"a,b", "a\ninterface=eth9", "\"", "a\rb", "a\tb", "a\x7f"}) {
         strcpy(conf.local_bootloader, loader.c_str());
         EXPECT_OUTCOME(set(), refused);
     }
     memset(conf.local_bootloader, 'a', sizeof conf.local_bootloader);
+    EXPECT_OUTCOME(set(), refused);
+    // what is beyond 1023 bytes would be a line of its own to the daemon
+    strcpy(conf.local_bootloader, long_text(1023 - strlen("dhcp-boot=tag:pxe,") + 1).c_str());
     EXPECT_OUTCOME(set(), refused);
     conf.is_remote_tftp = 1;
     memset(conf.remote_tftp_server_ip, '1', sizeof conf.remote_tftp_server_ip);
@@ -242,7 +246,7 @@ TEST_F(dhcp_pxe_conf, DHCPPXEConfSet_fieldThatWouldChangeTheLine_isRefused) {
 }
 
 TEST_F(dhcp_pxe_conf, DHCPPXEConfSet_longestLoader_isReadBack) {
-    const std::string loader = long_text(sizeof conf.local_bootloader - 1, 'b');
+    const std::string loader = long_text(1023 - strlen("dhcp-boot=tag:pxe,"), 'b');
     strcpy(conf.local_bootloader, loader.c_str());
     EXPECT_OUTCOME(set(), {.result = 0, .commands = kMkdirTwice});
     EXPECT_OUTCOME(get(), {.result = 0});

@@ -110,16 +110,17 @@ TEST_F(net_set_dhcp_server_config_files, KOVANetSetDhcpServerConfigFiles_emptyFi
 }
 
 TEST_F(net_set_dhcp_server_config_files, KOVANetSetDhcpServerConfigFiles_longestFields_areWrittenWhole) {
-    set_field(conf.domain, long_text(4095, 'd'));
+    const std::string tag = long_text(19, 't');
+    const size_t room = 1023 - ("dhcp-option=tag:" + tag + ",option:domain-search,").size();
+    set_field(conf.domain, long_text(room, 'd'));
     set_field(conf.start_ip, long_text(45, 's'));
     set_field(conf.ifname, long_text(15, 'i'));
-    set_field(conf.tag, long_text(19, 't'));
+    set_field(conf.tag, tag);
     EXPECT_OUTCOME(set(), {.result = 1, .commands = {kMkdir}});
-    const std::string tag = long_text(19, 't');
     EXPECT_EQ("interface=" + long_text(15, 'i') + "\ndhcp-range=set:" + tag + "," + long_text(45, 's') +
                   ",192.168.50.20,255.255.255.0,3600\ndhcp-option=tag:" + tag +
                   ",option:router,192.168.50.1\ndhcp-option=tag:" + tag + ",option:domain-search," +
-                  long_text(4095, 'd') + "\ndhcp-option=tag:" + tag +
+                  long_text(room, 'd') + "\ndhcp-option=tag:" + tag +
                   ",option:dns-server,192.168.50.53,192.168.50.54\n",
               read_file("/etc/dhcpd/dhcpd-" + long_text(15, 'i') + "-" + tag + ".conf"));
 }
@@ -144,7 +145,16 @@ TEST_F(net_set_dhcp_server_config_files, KOVANetSetDhcpServerConfigFiles_badReco
     refuses(conf.domain);
     refuses(conf.dns1);
     refuses(conf.dns2);
-    for (const std::string &name : texts{"", ".", "..", "a/b", "../x", "a b"}) {
+    // what is beyond 1023 bytes would be a line of its own to the daemon
+    set_field(conf.domain, long_text(1023 - strlen("dhcp-option=tag:lan,option:domain-search,") + 1));
+    EXPECT_OUTCOME(set(), refused);
+    conf = good;
+    for (char *const field : {conf.start_ip, conf.end_ip, conf.netmask}) {
+        strcpy(field, "1.1.1.1,2.2.2.2");
+        EXPECT_OUTCOME(set(), refused);
+        conf = good;
+    }
+    for (const std::string &name : texts{"", ".", "..", "a/b", "../x", "a b", "a,b"}) {
         set_field(conf.ifname, name);
         EXPECT_OUTCOME(set(0), refused);
         conf = good;
