@@ -1,9 +1,9 @@
 #!/usr/bin/env python3
 """Runs the rings of the proof and adds up their results.
 
-usage: ./test [--list] [NAME...]
+usage: ./test [--list] [--refresh] [NAME...]
 
-A NAME is a ring (unit, platform, sanitize, valgrind, lab, gates), a test file (test_jobs, test_abi) or a source
+A NAME is a ring (unit, platform, fault, sanitize, valgrind, lab, gates), a test file (test_jobs, test_abi) or a source
 unit (net_set_ip); without a name everything runs. The last line counts the test cases.
 """
 import argparse
@@ -22,6 +22,7 @@ BUILD = ROOT / "build"
 BOX = BUILD / "lab" / "kova-box"
 PYTHON = "/usr/bin/python3"
 UNIT_PROGRAMS = {"unit": "tests/kovanet-unit-tests", "platform": "tests/platform/kova-platform-tests"}
+FAULT_PROGRAM = "tests/kovanet-fault-tests"
 SLOWEST = 900  # seconds for one step
 
 
@@ -84,6 +85,19 @@ def gtest_step(out, ring, kind, build, unit=None, wrapper=(), without=()):
     return Step(ring, f"{kind}{'/' + unit if unit else ''}", boxed(out, [], command), report)
 
 
+def fault_step(out):
+    report = out / "fault.xml"
+    command = [str(BUILD / FAULT_PROGRAM), f"--gtest_output=xml:{report}", "--gtest_brief=1"]
+    return Step("fault", "fault", boxed(out, [], command), report)
+
+
+def record_fault_points():
+    """What ./test fault --refresh does."""
+    command = [str(BOX), "--", str(BUILD / FAULT_PROGRAM), "--points"]
+    lines = subprocess.run(command, cwd=ROOT, stdin=subprocess.DEVNULL, stdout=subprocess.PIPE, text=True, check=True)
+    (ROOT / "tests" / "fault" / "points.txt").write_text(lines.stdout)
+
+
 def units_of(kind):
     folder = ROOT / "tests" / kind
     return sorted(path.name.removesuffix("_test.cpp") for path in folder.glob("*_test.cpp"))
@@ -109,6 +123,7 @@ def all_steps(out):
         yield pytest_step(out, "gates", path, inside_box=False)
     for kind in UNIT_PROGRAMS:
         yield gtest_step(out, kind, kind, BUILD)
+    yield fault_step(out)
     for kind in UNIT_PROGRAMS:
         yield gtest_step(out, "sanitize", kind, BUILD / "sanitize")
     for kind in UNIT_PROGRAMS:
@@ -152,7 +167,7 @@ def show(step):
     print(f"{'FAILED' if step.failed else 'ok':7}{step.ring}/{step.name}: {counts} ({step.seconds:.1f} s)", flush=True)
     for reason in step.reasons:
         print(f"       skipped {reason}")
-    if step.failed:
+    if step.failed or step.ring == "fault":
         print(step.output, flush=True)
 
 
@@ -161,7 +176,10 @@ def main():
                                      epilog=__doc__.split("\n\n")[2])
     parser.add_argument("names", nargs="*", metavar="NAME")
     parser.add_argument("--list", action="store_true", help="print the names")
+    parser.add_argument("--refresh", action="store_true", help="with fault: record the points that are met now")
     asked = parser.parse_args()
+    if asked.refresh:
+        record_fault_points()
     out = pathlib.Path(tempfile.mkdtemp(prefix="kova-test-"))
     try:
         steps = chosen_steps(out, asked.names)
