@@ -1,12 +1,12 @@
 #!/usr/bin/env python3
 """Runs the rings of the proof and adds up their results.
 
-usage: ./test [--list] [NAME...]
+usage: ./test [--list] [--refresh] [NAME...]
 
-A NAME is a ring (unit, platform, property, crash, sanitize, valgrind, coverage, lab, gates), a test file (test_jobs,
-test_abi), a source unit (net_set_ip), or dhcp-fuzz, which tries 10000 random DHCP subnets with another seed each time;
-without a name everything runs. KOVA_SEED and KOVA_ROUNDS say what the random tests try. The last line counts the test
-cases.
+A NAME is a ring (unit, platform, property, fault, crash, sanitize, valgrind, coverage, lab, gates), a test file
+(test_jobs, test_abi), a source unit (net_set_ip), or dhcp-fuzz, which tries 10000 random DHCP subnets with another seed
+each time; without a name everything runs. KOVA_SEED and KOVA_ROUNDS say what the random tests try. The last line counts
+the test cases.
 """
 import argparse
 import concurrent.futures
@@ -25,7 +25,7 @@ BUILD = ROOT / "build"
 BOX = BUILD / "lab" / "kova-box"
 PYTHON = "/usr/bin/python3"
 UNIT_PROGRAMS = {"unit": "tests/kovanet-unit-tests", "platform": "tests/platform/kova-platform-tests"}
-PROGRAMS = {**UNIT_PROGRAMS, "crash": "tests/crash/kova-crash-tests"}
+PROGRAMS = {**UNIT_PROGRAMS, "fault": "tests/kovanet-fault-tests", "crash": "tests/crash/kova-crash-tests"}
 COUNTED = [kind for kind in PROGRAMS if kind != "crash"]  # whose lines count as tested; the killed count nothing
 SLOWEST = 1800  # seconds for one step, on a machine that has much else to do
 
@@ -107,6 +107,13 @@ def property_step(out, name, seed, rounds, chosen="*"):
     return step
 
 
+def record_fault_points():
+    """What ./test fault --refresh does."""
+    command = [str(BOX), "--", str(BUILD / PROGRAMS["fault"]), "--points"]
+    lines = subprocess.run(command, cwd=ROOT, stdin=subprocess.DEVNULL, stdout=subprocess.PIPE, text=True, check=True)
+    (ROOT / "tests" / "fault" / "points.txt").write_text(lines.stdout)
+
+
 def units_of(kind):
     folder = ROOT / "tests" / kind
     return sorted(path.name.removesuffix("_test.cpp") for path in folder.glob("*_test.cpp"))
@@ -144,6 +151,7 @@ def all_steps(out):
         yield pytest_step(out, "gates", path, inside_box=False)
     for kind in UNIT_PROGRAMS:
         yield gtest_step(out, kind, kind, BUILD)
+    yield gtest_step(out, "fault", "fault", BUILD, shown="fault points of ")
     yield gtest_step(out, "crash", "crash", BUILD, shown="kill points of ")
     for kind in UNIT_PROGRAMS:
         yield gtest_step(out, "sanitize", kind, BUILD / "sanitize")
@@ -206,7 +214,10 @@ def main():
                                      epilog=__doc__.split("\n\n")[2])
     parser.add_argument("names", nargs="*", metavar="NAME")
     parser.add_argument("--list", action="store_true", help="print the names")
+    parser.add_argument("--refresh", action="store_true", help="with fault: record the points that are met now")
     asked = parser.parse_args()
+    if asked.refresh:
+        record_fault_points()
     out = pathlib.Path(tempfile.mkdtemp(prefix="kova-test-"))
     try:
         steps = chosen_steps(out, asked.names)

@@ -97,7 +97,8 @@ bool is_kept_by_variable(const void *block) {
 std::string path_of(int fd) {
     char target[PATH_MAX];
     const ssize_t length = readlink(("/proc/self/fd/" + std::to_string(fd)).c_str(), target, sizeof target);
-    const std::string path = length < 0 ? "nothing" : std::string(target, static_cast<size_t>(length));
+    std::string path = length < 0 ? "nothing" : std::string(target, static_cast<size_t>(length));
+    path.resize(std::min(path.size(), path.find(":["))); // the number of a socket or pipe is another in each run
     return current_rig != nullptr ? current_rig->asked_for(path) : path;
 }
 
@@ -132,6 +133,8 @@ namespace {
 struct watched_stream {
     FILE *stream;
     std::string path;
+    std::string mode;
+    char buffer[BUFSIZ]; ///< ready, so that the first read has nothing to allocate
 };
 
 /** By the stream that the code under test has. */
@@ -174,8 +177,9 @@ FILE *watched(FILE *stream, const char *mode, const std::string &path) {
         return stream;
     }
     const rig_at_work guard;
-    auto *const one = new watched_stream{stream, path};
+    auto *const one = new watched_stream{stream, path, mode, ""};
     FILE *const shown = fopencookie(one, mode, {read_watched, write_watched, nullptr, close_watched});
+    setvbuf(shown, one->buffer, _IOFBF, sizeof one->buffer);
     streams[shown] = one;
     current_rig->held["streams"] += 1;
     return shown;
@@ -184,6 +188,14 @@ FILE *watched(FILE *stream, const char *mode, const std::string &path) {
 FILE *behind(FILE *shown) {
     const auto found = streams.find(shown);
     return found != streams.end() ? found->second->stream : shown;
+}
+
+std::string stream_text(FILE *shown) {
+    const auto found = streams.find(shown);
+    if (found == streams.end()) {
+        return path_of(fileno(shown));
+    }
+    return (found->second->mode[0] == 'r' ? "read " : "written ") + found->second->path;
 }
 
 void forget(FILE *shown) {

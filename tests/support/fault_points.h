@@ -70,6 +70,8 @@ std::string path_of(int fd);
 FILE *watched(FILE *stream, const char *mode, const std::string &path);
 /** The stream behind a watched one. */
 FILE *behind(FILE *shown);
+/** Its direction and path, "read /proc/net/dev". */
+std::string stream_text(FILE *shown);
 /** A watched stream is about to be closed. */
 void forget(FILE *shown);
 

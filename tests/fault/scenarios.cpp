@@ -1,0 +1,375 @@
+#include "fault/sweep.h"
+
+#include <cstring>
+#include <kova/plugin.h>
+
+namespace fault {
+
+using kova_test::ifcfg;
+using kova_test::write_file;
+
+// ---- the appliance that every call starts from: cards eth0 (static) and eth1 (DHCP), both members of bond0
+
+world::world() : list(KLIBCSzListAlloc(4)) {
+    KLIBCSzListPush(&list, "10.0.0.1");
+    KLIBCSzListPush(&list, "10.0.0.2");
+    kernel.add("eth0", {.ip = "192.168.1.10", .mask = "255.255.255.0", .supported = 0x20});
+    kernel.add("eth1", {.ip = "192.168.2.10", .mask = "255.255.255.0", .last_mac_byte = 2});
+    write_file(ifcfg("eth0"),
+               "DEVICE=eth0\nONBOOT=yes\nBOOTPROTO=static\nIPADDR=192.168.1.10\nNETMASK=255.255.255.0\n"
+               "IPV6INIT=auto\nLOCAL_LAN=yes\nMASTER=bond0\nSLAVE=yes\n"
+               "BLOCK_CNT=\"1\"\nBLOCK_HA=\"no\"\nBLOCK_AHA=\"yes\"\nBLOCK_VIRTUAL=\"no\"\nBLOCK_ORLENA=\"no\"\n");
+    write_file(ifcfg("eth1"), "DEVICE=eth1\nBOOTPROTO=dhcp\nONBOOT=yes\n");
+    write_file("/etc/dhclient/ipv4/dhcpcd-eth1.info", "IPADDR=192.168.2.10\nNETMASK=255.255.255.0\n");
+    write_file("/etc.defaults/kovainfo.conf", "maxlanport=\"2\"\nlocal_lan=\"eth0 eth1\"\n");
+    write_file("/run/ddns/externalIP.result", "externalIP=198.51.100.7\n");
+    write_file("/etc/kova/platform.conf", "ha_running=no\n");
+    rig.replace_file("/proc/net/if_inet6", "fe80000000000000000000000000000a 02 40 20 80     eth0\n");
+    rig.replace_file("/proc/sys/net/ipv6/conf/eth0/disable_ipv6", "0\n");
+    rig.replace_file("/proc/sys/kernel/kova_internal_netif_num", "2\n");
+    rig.replace_file("/sys/class/net/eth0/flags", "0x1003\n");
+    rig.replace_file("/sys/class/net/bond0/bonding/slaves", "eth0 eth1\n");
+    rig.replace_file("/sys/class/net/bond0/bonding/mode", "802.3ad 4\n");
+    rig.replace_file("/proc/net/bonding//bond0", "\tPartner Mac Address: 00:11:22:33:44:55\n");
+    rig.answer("/bin/ipcalc -n", 0, "NETWORK=192.168.1.0\n");
+    rig.answer("/bin/ipcalc -b", 0, "BROADCAST=192.168.1.255\n");
+}
+
+world::~world() {
+    release();
+}
+
+void world::release() {
+    KLIBCSzListFree(list);
+    list = nullptr;
+    if (event != 0) {
+        KLIBPluginExit(event);
+        event = 0;
+    }
+}
+
+const tolerances &tolerated_everywhere() {
+    static const tolerances all{
+        {"access ", "a look whether something is there has no third answer", kAnyResult},
+        {"KLIBCFileExist ", "a look whether something is there has no third answer", kAnyResult},
+        {"KOVAHA", "a machine that cannot tell is no node of a cluster", kAnyResult},
+        {"KLIBCModuleIsLoad 8021q > ", "one of several places that tell; a kernel that tells nowhere has no VLANs",
+         kAnyResult},
+        {"fopen /sys/class/net/kova_ovs_bonds", "logged; without the list there is no switch", kAnyResult},
+        {"fread /sys/class/net/kova_ovs_bonds", "without the list there is no switch", kAnyResult},
+        {"close ", "what it was for is done"},
+        {"fclose read ", "what it was for is done"},
+        {"fclose written /proc/sys/", "the flush before it told"},
+        {"setvbuf ", "only the speed depends on it"},
+        {"KLIBCFileUnlock", "what the lock was for is done; the platform lets go of it all the same"},
+        {"KLIBPluginExit", "the event is over"},
+        {"mkdir /run/lock", "another process may have made it; whether it is there shows at the open"},
+        {"chmod /run/lock", "the directory may be another's; whether the lock can be had shows at the open"},
+        {"fchmod /run/lock", "the lock is held all the same"},
+        {"fcntl 37 ", "a lock that is not to be had is asked for again"},
+    };
+    return all;
+}
+
+namespace {
+
+// ---- what is special about some calls
+
+/** This machine is a running node of a cluster. */
+void cluster(world &) {
+    write_file("/etc/kova/platform.conf",
+               "ha_running=yes\nha_active=yes\nha_heartbeat_if=eth9\n"
+               "ha_ip_eth0=10.9.0.1\nha_mask_eth0=255.255.0.0\n"
+               "ha_ip_eth1=10.9.0.2\nha_mask_eth1=255.255.0.0\nha_mac_0=02:00:00:00:00:77\n");
+}
+
+/** A switch with a port over eth0 and a bond over both. */
+void virtual_switch(world &it) {
+    it.rig.replace_file("/sys/devices/virtual/net/ovs_bond0", "");
+    it.rig.replace_file("/sys/devices/virtual/net/ovs_eth0", "");
+    it.rig.replace_file("/sys/class/net/kova_ovs_bonds", "ovs_bond0 eth0 eth1\n");
+    write_file(ifcfg("ovs_bond0"), "SLAVE_LIST=\"eth0 eth1\"\nBOND_MODE=balance-slb\n");
+}
+
+void without_link(world &it) {
+    it.kernel.add("eth0", {.flags = IFF_UP, .ip = "192.168.1.10", .mask = "255.255.255.0"});
+}
+
+void bridge_port(world &it) {
+    it.rig.replace_file("/sys/class/net/eth0/brport", "");
+}
+
+void bond_member(world &it) {
+    it.kernel.add("eth0", {.flags = IFF_UP | IFF_SLAVE});
+}
+
+void down(world &it) {
+    it.kernel.add("eth0", {.flags = IFF_BROADCAST});
+    it.rig.replace_file("/sys/class/net/eth0/flags", "0x1002\n");
+}
+
+void duplicate(world &it) {
+    it.rig.replace_file("/proc/net/if_inet6", "fe80000000000000000000000000000a 02 40 20 88     eth0\n");
+}
+
+void many_duplicates(world &it) {
+    std::string lines;
+    for (int i = 0; i < 17; ++i) {
+        lines += "fe8000000000000000000000000000" + std::to_string(10 + i) + " 02 40 20 88     eth0\n";
+    }
+    it.rig.replace_file("/proc/net/if_inet6", lines);
+}
+
+void no_protocol(world &) {
+    write_file(ifcfg("eth0"), "DEVICE=eth0\n");
+}
+
+void two_vlans(world &it) {
+    it.kernel.load_vlan_module();
+    it.kernel.add("eth0.10", {.ip = "192.168.10.10", .mask = "255.255.255.0", .row_device = "eth0"});
+}
+
+void open_event(world &it) {
+    KLIBPluginSDKInit("net", "net/test", &it.event);
+}
+
+void member_to_add(world &it) {
+    it.bond = {};
+}
+
+void card_to_set(world &it) {
+    it.card = {.nIPSource = 1, .szIfname = "eth0", .szIP = "192.168.1.20", .szMask = "255.255.255.0"};
+    write_file("/etc/ppp/old_gateway.bak", "192.168.1.1\n");
+    write_file("/etc/resolv.conf.bak", "nameserver 192.168.1.1\n");
+    write_file("/usr/kova/service/ddns", "#!/bin/sh\n");
+}
+
+void dhcp_card_to_set(world &it) {
+    card_to_set(it);
+    it.card.nIPSource = 0;
+}
+
+// ---- what functions get over by design
+
+const tolerances cards{
+    {"ioctl ", "an interface that the kernel does not describe is left out", kAnyResult},
+    {"KOVAHAGetHeartbeatIF", "without a heartbeat there is none to leave out", kAnyResult},
+    {"KLIBCFileGetKeyValue /etc/sysconfig/network-scripts/ifcfg-eth0 LOCAL_LAN", "an absent key says no", kAnyResult},
+    {"KLIBCFileGetKeyValue /etc/sysconfig/network-scripts/ifcfg-eth1 LOCAL_LAN", "an absent key says no", kAnyResult},
+    {"socket", "the address is not looked up", kAnyResult},
+};
+const tolerances protocol{
+    {"KLIBCFileGetKeyValue /etc/sysconfig/network-scripts/ifcfg-", "a protocol that cannot be read is set to static",
+     kAnyResult, "ifcfg-eth1"},
+    {"KLIBCFileLock 0x105", "the inner question for the protocol answers no", kAnyResult},
+};
+const tolerances switch_ports{
+    {"ioctl ", "a port that the kernel does not describe has no link"},
+    {"socket", "a port that the kernel does not describe has no link"},
+};
+const tolerances announced{
+    {"KLIBPlugin", "the change is made whether it is announced or not"},
+    {"ioctl 0x8913 ", "the event tells no link then"},
+    {"socket", "the event tells no link then"},
+    {"fread /proc/net/if_inet6", "the event lists what could be read"},
+};
+const tolerances backed_up{
+    {"KLIBCExec /bin/cp", "logged; the change is made without a backup", std::nullopt, ".tmp1700000000"},
+    {"stat /etc/sysconfig/network-scripts/ifcfg-", "the copy keeps what the tool gave it"},
+    {"chown /etc/sysconfig/network-scripts/ifcfg-", "the copy keeps what the tool gave it"},
+    {"chmod /etc/sysconfig/network-scripts/ifcfg-", "the copy keeps what the tool gave it"},
+    {"unlink /etc/sysconfig/network-scripts/ifcfg-", "logged; the copy stays", std::nullopt, ".tmp1700000000"},
+    {"rename /etc/sysconfig/network-scripts/.ifcfg-", "neither can the copy be renamed; it stays", -1,
+     ".tmp1700000000"},
+    {"KLIBCExecl /sbin/stop dhcp-client", "logged; none may be running"},
+};
+const tolerances housekeeping{
+    {"KLIBServiceReload ddns", "the card is set; the service asks again by itself"},
+    {"unlink /etc/ppp/old_gateway.bak", "the card is set; a kept file may stay"},
+    {"unlink /etc/resolv.conf.bak", "the card is set; a kept file may stay"},
+};
+const tolerances off_and_on{
+    {"ioctl ", "another interface is left out of the list"},
+    {"fopen /proc/net/if_inet6", "no address to remove was found"},
+    {"fread /proc/net/if_inet6", "the end of the list"},
+    {"", "what fails between off and on leaves IPv6 off, and says so", -1, "/disable_ipv6"},
+};
+const tolerances address_list{
+    {"fread /proc/net/if_inet6", "a list of the kernel ends where it cannot be read on", kAnyResult},
+    {"fopen /proc/net/if_inet6", "no address to remove was found", kAnyResult},
+};
+const tolerances calculator{
+    {"KLIBCPclose", "a tool that gave no answer leaves the output as it was"},
+    {"fread from /bin/ipcalc", "a tool that gave no answer leaves the output as it was"},
+};
+const tolerances route_update{
+    {"KLIBCExecl /sbin/ip -4 route del", "the route may not be there"},
+    {"KLIBCExecl /usr/kova/sbin/kovanetdtool", "the address is set; its rules follow with the next change"},
+};
+const tolerances port_count{
+    {"fread /proc/sys/kernel/kova_internal_netif_num", "the shipped number stands in"},
+    {"malloc", "the shipped number stands in"},
+};
+const tolerances kernel_bond{
+    {"fopen /sys/class/net/bond0/bonding/slaves", "a bond whose members cannot be read is none"},
+    {"fread /sys/class/net/bond0/bonding/slaves", "a bond whose members cannot be read is none"},
+    {"KLIBCSzListPush", "a bond whose members cannot be read is none"},
+    {"malloc", "a bond whose members cannot be read is none"},
+    {"fopen /proc/net/bonding//bond0", "a partner that cannot be read is none"},
+    {"fread /proc/net/bonding//bond0", "a partner that cannot be read is none"},
+};
+const tolerances block_steps{
+    {"KLIBCFile", "reason and number are two keys; each is written whole", -1, "ifcfg-eth0"},
+};
+const tolerances interface_state{
+    {"fopen /sys/class/net/eth0/flags", "the kernel itself refuses to rename what is up"},
+    {"fread /sys/class/net/eth0/flags", "the kernel itself refuses to rename what is up"},
+};
+
+const char *const kOld[] = {"eth0"};
+const char *const kNew[] = {"bond0"};
+const uint32_t kMask[] = {255, 255, 0, 0};
+
+} // namespace
+
+/** Names the call's expression; "it" is the world it runs in. */
+#define CALL(expression)                                                                                               \
+    [](world &it) -> long {                                                                                            \
+        (void)it;                                                                                                      \
+        return (expression);                                                                                           \
+    }
+
+const std::vector<scenario> &scenarios() {
+    static const std::vector<scenario> all{
+        {"BlKLIBIsAtom", CALL(BlKLIBIsAtom("a")), pure},
+        {"BlKLIBIsDomain", CALL(BlKLIBIsDomain("a.b")), pure},
+        {"BlKLIBIsHostname", CALL(BlKLIBIsHostname("a")), pure},
+        {"BlKLIBIsIpAddr", CALL(BlKLIBIsIpAddr("192.168.1.10")), pure},
+        {"BlKLIBIsIpMask", CALL(BlKLIBIsIpMask(strcpy(it.text, "255.255.0.0"))), pure},
+        {"BlKLIBIsValidIpMask", CALL(BlKLIBIsValidIpMask("192.168.1.10", "255.255.0.0")), pure},
+        {"BlKLIBIsv6IpAddrValid", CALL(BlKLIBIsv6IpAddrValid("fe80::1/64")), pure},
+        {"BlKOVALnxIsDHCP", CALL(BlKOVALnxIsDHCP("eth1")), failure::zero, protocol},
+        {"BlKOVALnxIsDHCP/repair", CALL(BlKOVALnxIsDHCP("eth0")), no_protocol, failure::zero, protocol},
+        {"ErrKLIBIpMaskToSubnet", CALL(ErrKLIBIpMaskToSubnet(strcpy(it.text, "10.0.0.1/255.0.0.0"), it.names[0])),
+         pure},
+        {"ErrKLIBSubnetToIpMask", CALL(ErrKLIBSubnetToIpMask(strcpy(it.text, "10.0.0.1/8"), nullptr)), pure},
+        {"KLIBIsIpInRange", CALL(KLIBIsIpInRange("10.0.0.2", "10.0.0.1", "10.0.0.3", 2)), pure},
+        {"KLIBNetBridgeIfIsSlave", CALL(KLIBNetBridgeIfIsSlave("eth0")), bridge_port, failure::zero},
+        {"KLIBNetGetIfCfg", CALL(KLIBNetGetIfCfg("eth0", "IPADDR", it.text, sizeof it.text))},
+        {"KLIBNetGetInterfaceInfo", CALL(KLIBNetGetInterfaceInfo(it.records, 32, 2)), two_vlans, cards},
+        {"KLIBNetGetInterfaceInfo/cluster", CALL(KLIBNetGetInterfaceInfo(it.records, 32, 5)), cluster, cards},
+        {"KLIBNetGetLocalLanConfig", CALL(KLIBNetGetLocalLanConfig(it.names, &it.number))},
+        {"KLIBNetGetMacAddr", CALL(KLIBNetGetMacAddr(1, it.text, sizeof it.text)), cards},
+        {"KLIBNetGetMacAddr/cluster", CALL(KLIBNetGetMacAddr(0, it.text, sizeof it.text)), cluster, cards},
+        {"KLIBNetGetMacAddrByInterface", CALL(KLIBNetGetMacAddrByInterface("eth0", it.text, sizeof it.text))},
+        {"KLIBNetIFChgPluginSetArgs", CALL(KLIBNetIFChgPluginSetArgs(it.event, kOld, 1, kNew, 1, 0)), open_event},
+        {"KLIBNetIFIsLocalLan", CALL(KLIBNetIFIsLocalLan("eth0")), failure::zero},
+        {"KLIBNetISetIfFlags", CALL(KLIBNetISetIfFlags("eth0", IFF_PROMISC, 1))},
+        {"KLIBNetIfDown", CALL(KLIBNetIfDown("eth0"))},
+        {"KLIBNetIfLinkDownEvent", CALL(KLIBNetIfLinkDownEvent("eth0"))},
+        {"KLIBNetIfLinkUpEvent", CALL(KLIBNetIfLinkUpEvent("eth0"))},
+        {"KLIBNetIfUp", CALL(KLIBNetIfUp("eth0"))},
+        {"KLIBNetInterfaceEnum", CALL(KLIBNetInterfaceEnum(it.records, 32, 0)), cards},
+        {"KLIBNetInterfaceEnum/cluster", CALL(KLIBNetInterfaceEnum(it.records, 32, 6)), cluster, cards},
+        {"KLIBNetOVSGetOriginalIf", CALL(KLIBNetOVSGetOriginalIf("ovs_eth0", it.text, sizeof it.text)), pure},
+        {"KLIBNetOVSIfIsMaster", CALL(KLIBNetOVSIfIsMaster("ovs_bond0")), virtual_switch, failure::zero},
+        {"KLIBNetOVSIfIsSlave", CALL(KLIBNetOVSIfIsSlave("eth1")), virtual_switch, failure::zero},
+        {"KLIBNetReInitIf", CALL(KLIBNetReInitIf("eth0"))},
+        {"KLIBNetSetIfCfg", CALL(KLIBNetSetIfCfg("eth0", "IPADDR", "192.168.1.11"))},
+        {"KLIBNetStatFree", CALL((KLIBNetStatFree(nullptr), 0)), pure},
+        {"KLIBNetStatGetAll", CALL(KLIBNetStatGetAll(it.statistics, 32))},
+        {"KLIBNetStatGetSingle", CALL(KLIBNetStatGetSingle("eth0", it.statistics))},
+        {"KLIBNetStatInit",
+         [](world &) -> long {
+             NETSTAT *records = KLIBNetStatInit(2);
+             KLIBNetStatFree(records);
+             return records != nullptr;
+         },
+         failure::zero},
+        {"KOVAExternalIPGet", CALL(KOVAExternalIPGet(it.text, sizeof it.text))},
+        {"KOVAGetMTU", CALL(KOVAGetMTU("eth0")), failure::below_one},
+        {"KOVAGetMTUSetting", CALL(KOVAGetMTUSetting("eth0")), failure::below_one},
+        {"KOVAGetMTUSetting/switch bond", CALL(KOVAGetMTUSetting("ovs_bond0")), virtual_switch, failure::below_one,
+         switch_ports},
+        {"KOVAGetMTUSetting/switch port", CALL(KOVAGetMTUSetting("ovs_eth0")), virtual_switch, failure::below_one},
+        {"KOVAILnxGetIP", CALL(KOVAILnxGetIP("eth0", it.text, sizeof it.text))},
+        {"KOVAILnxGetIPFromCfg", CALL(KOVAILnxGetIPFromCfg("eth0", it.text, sizeof it.text))},
+        {"KOVAILnxSetIPNetmask", CALL(KOVAILnxSetIPNetmask("eth0", "192.168.1.20", "255.255.255.0")), backed_up,
+         announced},
+        {"KOVALnxIPv6FlushAddr", CALL(KOVALnxIPv6FlushAddr("eth0")), off_and_on},
+        {"KOVALnxIPv6ProcAction/enable", CALL(KOVALnxIPv6ProcAction("eth0", 0)), off_and_on},
+        {"KOVALnxIPv6ProcAction/disable", CALL(KOVALnxIPv6ProcAction("eth0", 1)), off_and_on},
+        {"KOVALnxV6IPGet", CALL(KOVALnxV6IPGet("eth0", it.addresses, 16)), address_list},
+        {"KOVANetCalBroadcast", CALL(KOVANetCalBroadcast("192.168.1.10/24", it.text, sizeof it.text)), calculator},
+        {"KOVANetCalNetwork", CALL(KOVANetCalNetwork("192.168.1.10/24", it.text, sizeof it.text)), calculator},
+        {"KOVANetDNSChangeHook", CALL(KOVANetDNSChangeHook(KLIB_PLUGIN_POST, it.list))},
+        {"KOVANetDnsConfigChangeHook", CALL(KOVANetDnsConfigChangeHook(KLIB_PLUGIN_POST, "eth0", it.list))},
+        {"KOVANetEnumCard", CALL(KOVANetEnumCard(2)), cards},
+        {"KOVANetFlushIP/ipv4", CALL(KOVANetFlushIP("-4", "eth0"))},
+        {"KOVANetFlushIP/ipv6", CALL(KOVANetFlushIP("-6", "eth0")), off_and_on},
+        {"KOVANetGatewayConfigChangeHook",
+         CALL(KOVANetGatewayConfigChangeHook(KLIB_PLUGIN_POST, "ipv4", "eth0", "10.0.0.1", "10.0.0.2"))},
+        {"KOVANetGetAddrType", CALL(KOVANetGetAddrType("fe80::1")), pure},
+        {"KOVANetGetCard1", CALL(KOVANetGetCard1(0, nullptr, &it.card)), failure::below_one, cards, protocol},
+        {"KOVANetGetCard1/address", CALL(KOVANetGetCard1(0, "192.168.2.10", &it.card)), failure::below_one, cards,
+         protocol},
+        {"KOVANetGetCard1Ex/cluster", CALL(KOVANetGetCard1Ex(0, "10.9.0.2", 6, &it.card)), cluster, failure::below_one,
+         cards, protocol},
+        {"KOVANetGetEthInfo", CALL(KOVANetGetEthInfo(&it.ethernet, "eth0"))},
+        {"KOVANetGetEthInfo/switch bond", CALL(KOVANetGetEthInfo(&it.ethernet, "ovs_bond0")), virtual_switch,
+         switch_ports},
+        {"KOVANetGetEthInfo/switch port", CALL(KOVANetGetEthInfo(&it.ethernet, "ovs_eth0")), virtual_switch},
+        {"KOVANetGetIfBlock", CALL(KOVANetGetIfBlock("eth0", &it.number))},
+        {"KOVANetHostnameChangeHook", CALL(KOVANetHostnameChangeHook("kova"))},
+        {"KOVANetIFGetIPConfig", CALL(KOVANetIFGetIPConfig("eth0", &it.card)), protocol},
+        {"KOVANetIFGetIPConfig/dhcp", CALL(KOVANetIFGetIPConfig("eth1", &it.card)), protocol},
+        {"KOVANetIFGetInfo", CALL(KOVANetIFGetInfo("eth0", it.records, &it.card)), protocol},
+        {"KOVANetIFGetInfoEx/cluster", CALL(KOVANetIFGetInfoEx("eth0", 6, it.records, &it.card)), cluster, protocol},
+        {"KOVANetIP2If", CALL(KOVANetIP2If("192.168.2.10", it.text, sizeof it.text)), failure::below_one, cards},
+        {"KOVANetIPChangePreHook", CALL(KOVANetIPChangePreHook(1, "eth0", "fe80::1", "fe80::2", 64))},
+        {"KOVANetIPv6IPAction", CALL(KOVANetIPv6IPAction(0, "eth0", "fe80::2", 64, nullptr)), announced},
+        {"KOVANetIPv6IPAction/gateway", CALL(KOVANetIPv6IPAction(0, "eth0", "fe80::2", 64, "fe80::1")),
+         failure::not_zero},
+        {"KOVANetIPv6IsSameSubnet", CALL(KOVANetIPv6IsSameSubnet("fe80::1", "fe80::2", 64)), pure},
+        {"KOVANetIPv6RemoveDADFailedIP", CALL(KOVANetIPv6RemoveDADFailedIP("eth0", it.addresses, 16)), duplicate,
+         address_list},
+        {"KOVANetIPv6RemoveDADFailedIP/many", CALL(KOVANetIPv6RemoveDADFailedIP("eth0", it.addresses, 16)),
+         many_duplicates, address_list},
+        {"KOVANetIfIsBondingPassive", CALL(KOVANetIfIsBondingPassive("eth0")), bond_member, failure::zero},
+        {"KOVANetIfIsBondingPassive/switch", CALL(KOVANetIfIsBondingPassive("eth1")), virtual_switch, failure::zero,
+         switch_ports},
+        {"KOVANetIfIsLink", CALL(KOVANetIfIsLink("eth0"))},
+        {"KOVANetIfIsLink/switch bond", CALL(KOVANetIfIsLink("ovs_bond0")), virtual_switch, switch_ports},
+        {"KOVANetIfIsLink/switch port", CALL(KOVANetIfIsLink("ovs_eth0")), virtual_switch},
+        {"KOVANetIfIsStaticIP", CALL(KOVANetIfIsStaticIP("eth0")), failure::zero},
+        {"KOVANetInternalLanNumGet", CALL(KOVANetInternalLanNumGet()), port_count},
+        {"KOVANetIsDevTypeMatch", CALL(KOVANetIsDevTypeMatch("eth0", 2)), failure::zero, cards},
+        {"KOVANetIsIFUp", CALL(KOVANetIsIFUp("eth0")), failure::zero},
+        {"KOVANetIsPrivateIP", CALL(KOVANetIsPrivateIP("10.0.0.1")), pure},
+        {"KOVANetIsSameSubnet", CALL(KOVANetIsSameSubnet("10.0.0.1", "10.0.0.2", "255.0.0.0")), pure},
+        {"KOVANetLinkAggrGet", CALL(KOVANetLinkAggrGet("bond0", &it.bond)), kernel_bond},
+        {"KOVANetLinkAggrGet/switch", CALL(KOVANetLinkAggrGet("ovs_bond0", &it.bond)), virtual_switch,
+         failure::not_zero, switch_ports},
+        {"KOVANetLinkAggrOptSlsaveAdd", CALL(KOVANetLinkAggrOptSlsaveAdd(&it.bond, "eth0")), member_to_add, pure},
+        {"KOVANetLinkAggrPhyGet", CALL(KOVANetLinkAggrPhyGet("bond0", it.list))},
+        {"KOVANetLinkAggrStringToMode", CALL(KOVANetLinkAggrStringToMode("balance-rr")), pure},
+        {"KOVANetMTUChangeHook", CALL(KOVANetMTUChangeHook("eth0", "9000"))},
+        {"KOVANetNetmaskToPrefix", CALL(KOVANetNetmaskToPrefix("255.0.0.0")), pure},
+        {"KOVANetNtoa", CALL(KOVANetNtoa(1) != nullptr), pure},
+        {"KOVANetRenameEth", CALL(KOVANetRenameEth("eth0", "lan0")), down, interface_state},
+        {"KOVANetSetCard1/static", CALL(KOVANetSetCard1(&it.card, nullptr)), card_to_set, backed_up, announced,
+         housekeeping},
+        {"KOVANetSetCard1/dhcp", CALL(KOVANetSetCard1(&it.card, nullptr)), dhcp_card_to_set, backed_up, housekeeping},
+        {"KOVANetSetIP/ipv4", CALL(KOVANetSetIP("-4", "eth0", "192.168.1.20", 24, "add")), announced},
+        {"KOVANetSetIP/ipv4 without link", CALL(KOVANetSetIP("-4", "eth0", "192.168.1.10", 24, "add")), without_link,
+         announced, calculator, route_update},
+        {"KOVANetSetIP/ipv4 del", CALL(KOVANetSetIP("-4", "eth0", "192.168.1.10", 24, "del"))},
+        {"KOVANetSetIP/ipv6", CALL(KOVANetSetIP("-6", "eth0", "2001:db8::1", 64, "add")), announced},
+        {"KOVANetSetIfBlock", CALL(KOVANetSetIfBlock("eth0", 1, 1)), block_steps},
+        {"cKLIBICalMask", CALL(cKLIBICalMask(kMask)), pure},
+        {"cKLIBISepIP", CALL(cKLIBISepIP("10.0.0.1", reinterpret_cast<uint32_t *>(it.text))), pure},
+    };
+    return all;
+}
+
+} // namespace fault
