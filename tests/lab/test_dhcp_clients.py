@@ -62,7 +62,7 @@ OPTIONS = [
 # all others by their bytes
 BUSYBOX_NAMES = {9: "lprsrv", 13: "bootsize", 16: "swapsrv", 17: "rootpath", 23: "ipttl", 26: "mtu", 40: "nisdomain",
                  41: "nissrv", 42: "ntpsrv", 44: "wins", 120: "sipsrv", 121: "staticroutes"}  # fmt: skip
-ROUTES = ["10.21.0.0/16", "192.168.60.2", "172.16.0.0/12", "192.168.60.3", "0.0.0.0/0", "192.168.60.1"]
+ROUTES = ["10.21.0.0/16", "192.168.60.2", "172.16.0.0/12", "192.168.60.3"]
 USUAL = {
     **{number: str(1000 + number) for number in (13, 22, 26, 35, 38, 58, 59)},
     **{number: str(number) for number in (23, 37)},
@@ -73,19 +73,20 @@ USUAL = {
 }  # fmt: skip
 HIGHEST = {
     **{number: "65535" for number in (13, 22, 26)},
-    **{number: "4294967295" for number in (35, 38, 58, 59)},
+    **{number: "4294967295" for number in (35, 38)},
+    58: "3598", 59: "3599",  # of a lease of 3600 seconds
     **{number: "255" for number in (23, 37)},
     **{number: "1" for number in (19, 20, 27, 31, 34, 36)},
-    16: "255.255.255.255", 32: "255.255.255.255", 46: "8", 21: ["255.255.255.255", "255.255.255.255"],
-    121: ["255.255.255.255/32", "255.255.255.255"],
+    16: "223.255.255.254", 32: "223.255.255.254", 46: "8", 21: ["223.255.255.252", "255.255.255.252"],
+    121: ["223.255.255.254/32", "223.255.255.254"],
     # what the server would take for an address, a number, bytes, or a remark
-    17: "192.168.60.9", 18: "1234", 40: "fe80::1", 47: "0a:0b:0c", 64: " # \"two words\" \\t'x' 1i",
+    17: "192.168.60.9", 18: "fe80::1", 40: "1234", 47: "0a:0b:0c", 64: " # \"two words\" \\t'x' 1i",
 }  # fmt: skip
 LOWEST = {
-    13: "0", 22: "576", 26: "68", 35: "0", 38: "0", 58: "0", 59: "0", 23: "1", 37: "1",
+    13: "0", 22: "576", 26: "68", 35: "0", 38: "0", 58: "3", 59: "4", 23: "1", 37: "1",
     **{number: "0" for number in (19, 20, 27, 31, 34, 36)},
     **{number: "x" for number in (17, 18, 40, 47, 64)},
-    16: "0.0.0.1", 32: "0.0.0.1", 46: "1", 21: ["10.0.0.0", "255.0.0.0"], 121: ["10.0.0.0/8", "192.168.60.1"],
+    16: "1.0.0.1", 32: "1.0.0.1", 46: "1", 21: ["10.0.0.0", "255.0.0.0"], 121: ["10.0.0.0/8", "192.168.60.1"],
 }  # fmt: skip
 
 
@@ -195,7 +196,7 @@ def test_subnet_without_router_sends_clients_to_none(tmp_path):
 
 
 def test_values_that_fit_into_no_option_are_left_out_and_logged(tmp_path, system_log):
-    unfit = {13: "65536", 22: "65536", 26: "65536", 35: "4294967296", 38: "18446744073709551615", 17: "x" * 256,
+    unfit = {13: "65536", 22: "65536", 26: "65536", 35: "4294967296", 38: "18446744073709551615", 58: "2", 59: "3600", 17: "x" * 256,
              7: ["10.0.0.1"] * 64}  # fmt: skip
     names = {number: name for number, name, *_ in OPTIONS}
     serve("eth0", "192.168.60", options=[*[(number, names[number], value) for number, value in unfit.items()],
@@ -203,9 +204,20 @@ def test_values_that_fit_into_no_option_are_left_out_and_logged(tmp_path, system
     assert library.DHCPServerStart() == 0
     told = udhcpc("eth0", tmp_path, requests=[*unfit, 18, 23])
     assert (told["ipttl"], told["opt18"], told["router"]) == ("64", b"x".hex() * 255, "192.168.60.1")
+    assert (told["opt58"], told["opt59"]) == (f"{3600 // 2:08x}", f"{3600 * 7 // 8:08x}")
     assert not {"bootsize", "opt22", "mtu", "opt35", "opt38", "rootpath", "opt7"} & set(told)
     for number in unfit:
         wait_for(lambda name=names[number]: system_log.holds(f'left out "dhcp-option=tag:eth00,option:{name},'))
+
+
+def options_in(shown):
+    """The options inside the option of a vendor class, by their numbers."""
+    rest, found = bytes.fromhex(shown), {}
+    while rest and rest[0] != 255:
+        number, length = rest[0], rest[1]
+        assert number not in found
+        found[number], rest = rest[2 : 2 + length], rest[2 + length :]
+    return found
 
 
 def test_options_of_a_vendor_class_go_to_its_clients_only(tmp_path):
@@ -214,12 +226,13 @@ def test_options_of_a_vendor_class_go_to_its_clients_only(tmp_path):
     assert library.DHCPVendorSetVendorOpt(b"other", 7, b"10.7.7.7") == 0
     assert library.DHCPServerStart() == 0
     vendor = udhcpc("eth0", tmp_path, "-V", "MSFT 5.0", requests=[43])
-    assert bytes.fromhex(vendor["opt43"]) == b"\1\4\0\0\0\2" + b"\3\5hello"
-    assert bytes.fromhex(udhcpc("eth0", tmp_path, "-V", "other", requests=[43])["opt43"]) == b"\7\4\12\7\7\7"
+    assert options_in(vendor["opt43"]) == {1: b"\0\0\0\2", 3: b"hello"}
+    assert options_in(udhcpc("eth0", tmp_path, "-V", "other", requests=[43])["opt43"]) == {7: packed("10.7.7.7")}
     plain = udhcpc("eth0", tmp_path, requests=[43])
     assert plain["ip"] == vendor["ip"] and "opt43" not in plain
     told = dhclient("eth0", tmp_path, 'send vendor-class-identifier "MSFT 98"', request=["vendor-encapsulated-options"])
-    assert told["vendor_encapsulated_options"] == "1:4:0:0:0:2:3:5:68:65:6c:6c:6f"
+    shown = "".join(f"{int(byte, 16):02x}" for byte in told["vendor_encapsulated_options"].split(":"))
+    assert options_in(shown) == {1: b"\0\0\0\2", 3: b"hello"}
 
 
 PXE_CLIENT = "PXEClient:Arch:00000:UNDI:002001"
