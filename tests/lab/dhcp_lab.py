@@ -29,7 +29,9 @@ def clean_server(*links):
     LEASES.unlink(missing_ok=True)
     for link in links:
         for side in ([], ["-n", "net"]):
-            run("ip", *side, "addr", "flush", "dev", link)
+            # an interface goes on needing its own address of IPv6
+            run("ip", *side, "-4", "addr", "flush", "dev", link)
+            run("ip", *side, "-6", "addr", "flush", "dev", link, "scope", "global")
 
 
 def switch(name, on=True):
@@ -89,10 +91,11 @@ def dhclient(link, folder, *statements, request=(), family="-4", flags=()):
     return dict(line.removeprefix("new_").split("=", 1) for line in lines if line.startswith("new_"))
 
 
-def busybox_script(folder):
+def busybox_script(folder, takes_address=False):
     script = folder / "udhcpc-script"
+    take = 'ip addr replace "$ip/$mask" dev "$interface"\n' if takes_address else ""
     script.write_text(
-        '#!/bin/sh\n[ "$1" != deconfig ] || exit 0\nip addr replace "$ip/$mask" dev "$interface"\n'
+        f'#!/bin/sh\n[ "$1" != deconfig ] || exit 0\n{take}'
         'env >"$TOLD.new" && mv "$TOLD.new" "$TOLD.$1"\n'
     )
     script.chmod(0o755)
@@ -120,7 +123,7 @@ class KeptLease(Daemon):
     def __init__(self, link, folder):
         self.told = folder / f"udhcpc-kept-{link}"
         command = [*OTHER_SIDE, "env", f"TOLD={self.told}", "busybox", "udhcpc", "-f", "-t", "20", "-T", "1", "-i", link,
-                   "-s", busybox_script(folder)]  # fmt: skip
+                   "-s", busybox_script(folder, takes_address=True)]  # fmt: skip
         super().__init__(command, self.told.with_suffix(".bound").exists, limit=30)
 
     def renew(self):
