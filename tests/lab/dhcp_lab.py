@@ -120,10 +120,10 @@ def udhcpc(link, folder, *flags, requests=(), who=None, tries=20):
 class KeptLease(Daemon):
     """A busybox client on the other side that keeps its lease, and renews it when told to."""
 
-    def __init__(self, link, folder):
+    def __init__(self, link, folder, *flags):
         self.told = folder / f"udhcpc-kept-{link}"
         command = [*OTHER_SIDE, "env", f"TOLD={self.told}", "busybox", "udhcpc", "-f", "-t", "20", "-T", "1", "-i", link,
-                   "-s", busybox_script(folder, takes_address=True)]  # fmt: skip
+                   "-s", busybox_script(folder, takes_address=True), *flags]  # fmt: skip
         super().__init__(command, self.told.with_suffix(".bound").exists, limit=30)
 
     def renew(self):

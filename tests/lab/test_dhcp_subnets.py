@@ -103,15 +103,20 @@ def renamed(old, new):
 def test_client_renews_when_the_interface_has_changed_its_name(tmp_path):
     serve("eth0", "192.168.60", options=[(42, "ntp-server", ["192.168.60.5"])])
     write("eth0", dhcp_subnet(enabled=1, v6_mode="ra-only", lease_time=600), family=V6)  # stays under the old name
+    mac = on_other_side("cat", "/sys/class/net/eth0/address").stdout.strip()
+    (FILES / "dhcpd-eth0-static.conf").write_text(f"dhcp-host={mac},192.168.60.99\n")
+    (FILES / "wpad-eth0.conf").write_text("dhcp-option=tag:eth00,252,http://192.168.60.1/wpad.dat\n")
+    switch("wpad-eth0")
     restart()
-    with KeptLease("eth0", tmp_path) as client:
+    with KeptLease("eth0", tmp_path, "-O", "wpad") as client:
         before = client.renew()
+        assert (before["ip"], before["wpad"]) == ("192.168.60.99", "http://192.168.60.1/wpad.dat")
         with renamed("eth0", "ovs_eth0"):
             assert library.DHCPDConfChangeInterface(b"eth0", b"ovs_eth0") == 0
             restart()
             assert "interface=ovs_eth0" in served_lines()
             after = client.renew()
-        names = ("ip", "router", "dns", "domain", "lease", "ntpsrv", "serverid")
+        names = ("ip", "router", "dns", "domain", "lease", "ntpsrv", "serverid", "wpad")
         assert {name: after.get(name) for name in names} == {name: before.get(name) for name in names}
     assert library.DHCPDConfChangeInterface(b"ovs_eth0", b"eth0") == 0
     restart()
