@@ -1,19 +1,14 @@
 # box: --link eth0 --link kx12
 """What IPv4 clients of two makes are given is what the library was told to hand out."""
 
-import concurrent.futures
 import ctypes
 import ipaddress
-import pathlib
 import struct
 
 import pytest
-from conftest import on_other_side, processes, run, wait_for
-from dhcp_lab import (
-    FILES, SERVER, V4, KeptLease, bring_up, clean_server, dhclient, serve, served_lines, switch, udhcpc, v4_subnet,
-    write,
-)  # fmt: skip
-from sdk import DhcpPxeConf, library, string_list, string_map
+from conftest import wait_for
+from dhcp_lab import clean_server, dhclient, serve, udhcpc
+from sdk import DhcpPxeConf, library, string_map
 
 # number, name, kind, dhclient's name
 OPTIONS = [

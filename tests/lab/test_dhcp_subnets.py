@@ -3,12 +3,11 @@
 
 import concurrent.futures
 import contextlib
-import ctypes
 
 import pytest
 from conftest import on_other_side, run, wait_for
 from dhcp_lab import (
-    FILES, V4, V6, KeptLease, bring_up, clean_server, dhclient, serve, served_lines, switch, udhcpc, v4_subnet, write,
+    FILES, V4, V6, KeptLease, bring_up, clean_server, fix_lease, serve, served_lines, switch, udhcpc, v4_subnet, write,
 )  # fmt: skip
 from sdk import dhcp_subnet, library, string_list
 
@@ -26,7 +25,7 @@ def restart():
 def told_at_once(folder, **calls):
     """What several clients are told that ask side by side: link="served" or, for a few tries, link="silent"."""
     with concurrent.futures.ThreadPoolExecutor() as pool:
-        asked = {link: pool.submit(udhcpc, link, folder, tries=20 if expected == "served" else 8)
+        asked = {link: pool.submit(udhcpc, link, folder, tries=20 if expected == "served" else 3)
                  for link, expected in calls.items()}  # fmt: skip
         told = {link: "served" if future.result() else "silent" for link, future in asked.items()}
     assert told == calls
@@ -76,8 +75,9 @@ def test_subnet_that_is_switched_off_gives_no_address(tmp_path):
 
 
 def test_interface_that_is_switched_off_is_not_served(tmp_path):
-    serve("eth0", "192.168.60")
-    serve("kx12", "192.168.61")
+    for link, network in {"eth0": "192.168.60", "kx12": "192.168.61"}.items():
+        serve(link, network)
+        fix_lease(link, link, f"{network}.99")
     assert library.DHCPInterfaceSetEnabled(b"kx12", V4, 0) == 0
     restart()
     told_at_once(tmp_path, eth0="served", kx12="silent")
@@ -103,8 +103,7 @@ def renamed(old, new):
 def test_client_renews_when_the_interface_has_changed_its_name(tmp_path):
     serve("eth0", "192.168.60", options=[(42, "ntp-server", ["192.168.60.5"])])
     write("eth0", dhcp_subnet(enabled=1, v6_mode="ra-only", lease_time=600), family=V6)  # stays under the old name
-    mac = on_other_side("cat", "/sys/class/net/eth0/address").stdout.strip()
-    (FILES / "dhcpd-eth0-static.conf").write_text(f"dhcp-host={mac},192.168.60.99\n")
+    fix_lease("eth0", "eth0", "192.168.60.99")
     (FILES / "wpad-eth0.conf").write_text("dhcp-option=tag:eth00,252,http://192.168.60.1/wpad.dat\n")
     switch("wpad-eth0")
     restart()
@@ -134,8 +133,10 @@ def bridge_named(name, member):
 
 
 def test_interface_hands_its_service_to_the_bond_and_gets_it_back(tmp_path):
-    serve("eth0", "192.168.60", first=10, last=10)
-    write("bond0", v4_subnet("192.168.63", first=30, last=30))
+    serve("eth0", "192.168.60", first=10, last=20)
+    write("bond0", v4_subnet("192.168.63", first=30, last=40))
+    fix_lease("eth0", "eth0", "192.168.60.10")
+    fix_lease("bond0", "eth0", "192.168.63.30")
     (FILES / "dhcpd-bond0.info").write_text('enable="no"\nbonding_backup_enable="yes"\n')
     restart()
     assert udhcpc("eth0", tmp_path)["ip"] == "192.168.60.10"
