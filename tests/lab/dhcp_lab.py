@@ -82,9 +82,9 @@ def dhclient(link, folder, *statements, request=(), family="-4", flags=()):
     """What a dhclient on the other side is told, by the names its script sees; nothing when no server answers."""
     told, script, conf = folder / "told", folder / "dhclient-script", folder / "dhclient.conf"
     told.unlink(missing_ok=True)
-    # with -S there is no lease, and the client goes of its own accord
+    # RENEW6 is what the answer to -S is called
     script.write_text(
-        '#!/bin/sh\ncase "$reason" in\nBOUND | BOUND6) ;;\nRENEW6) ;;\n*) exit 0 ;;\nesac\n'
+        '#!/bin/sh\ncase "$reason" in BOUND | BOUND6 | RENEW6) ;; *) exit 0 ;; esac\n'
         'env >"$TOLD.new" && mv "$TOLD.new" "$TOLD" && kill $PPID\n'
     )
     script.chmod(0o755)
@@ -128,8 +128,8 @@ class KeptLease(Daemon):
 
     def __init__(self, link, folder, *flags):
         self.told = folder / f"udhcpc-kept-{link}"
-        command = [*OTHER_SIDE, "env", f"TOLD={self.told}", "busybox", "udhcpc", "-f", "-t", "20", "-T", "1", "-i", link,
-                   "-s", busybox_script(folder, takes_address=True), *flags]  # fmt: skip
+        command = [*OTHER_SIDE, "env", f"TOLD={self.told}", "busybox", "udhcpc", "-f", "-t", "20", "-T", "1",
+                   "-i", link, "-s", busybox_script(folder, takes_address=True), *flags]  # fmt: skip
         super().__init__(command, self.told.with_suffix(".bound").exists, limit=30)
 
     def renew(self):

@@ -7,7 +7,7 @@ import struct
 
 import pytest
 from conftest import wait_for
-from dhcp_lab import clean_server, dhclient, serve, udhcpc
+from dhcp_lab import clean_server, dhclient, fix_lease, serve, udhcpc
 from sdk import DhcpPxeConf, library, string_map
 
 # number, name, kind, dhclient's name
@@ -53,8 +53,8 @@ OPTIONS = [
     (120, "sip-server", "addresses", "sip"),
     (121, "classless-static-route", "routes", "routes-more"),
 ]
-# those that busybox's client shows by a name of its own, as the fragment says them but for blanks between items; it shows
-# all others by their bytes
+# those that busybox's client shows by a name of its own, as the fragment says them but for blanks between items; it
+# shows all others by their bytes
 BUSYBOX_NAMES = {9: "lprsrv", 13: "bootsize", 16: "swapsrv", 17: "rootpath", 23: "ipttl", 26: "mtu", 40: "nisdomain",
                  41: "nissrv", 42: "ntpsrv", 44: "wins", 120: "sipsrv", 121: "staticroutes"}  # fmt: skip
 ROUTES = ["10.21.0.0/16", "192.168.60.2", "172.16.0.0/12", "192.168.60.3"]
@@ -191,8 +191,8 @@ def test_subnet_without_router_sends_clients_to_none(tmp_path):
 
 
 def test_values_that_fit_into_no_option_are_left_out_and_logged(tmp_path, system_log):
-    unfit = {13: "65536", 22: "65536", 26: "65536", 35: "4294967296", 38: "18446744073709551615", 58: "2", 59: "3600", 17: "x" * 256,
-             7: ["10.0.0.1"] * 64}  # fmt: skip
+    unfit = {13: "65536", 22: "65536", 26: "65536", 35: "4294967296", 38: "18446744073709551615", 58: "2", 59: "3600",
+             17: "x" * 256, 7: ["10.0.0.1"] * 64}  # fmt: skip
     names = {number: name for number, name, *_ in OPTIONS}
     serve("eth0", "192.168.60", options=[*[(number, names[number], value) for number, value in unfit.items()],
                                          (18, names[18], "x" * 255), (23, names[23], "64")])  # fmt: skip
@@ -249,6 +249,15 @@ def test_clients_that_boot_from_the_network_are_told_the_local_file(tmp_path):
     assert "boot_file" not in udhcpc("eth0", tmp_path)
     set_pxe(enabled=0)
     assert "boot_file" not in udhcpc("eth0", tmp_path, "-V", PXE_CLIENT)
+
+
+@pytest.mark.parametrize("name", ["boot files #1/ pxe.0", "\\x64\\new\\tools.com"], ids=["remark", "backslashes"])
+def test_name_of_the_boot_file_is_given_as_it_is(tmp_path, name):
+    serve("eth0", "192.168.60")
+    fix_lease("eth0", "eth0", "192.168.60.99")
+    set_pxe(enabled=1, is_remote_tftp=1, remote_bootloader=name.encode(), remote_tftp_server_ip=b"192.168.60.99")
+    told = udhcpc("eth0", tmp_path, "-V", PXE_CLIENT)
+    assert (told["boot_file"], told["siaddr"]) == (name, "192.168.60.99")
 
 
 def test_clients_that_boot_from_the_network_are_told_the_other_server(tmp_path):

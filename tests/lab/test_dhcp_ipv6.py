@@ -1,6 +1,6 @@
 # box: --link eth0
-"""What IPv6 hosts learn from the server in each of its modes: by the kernel, by a raw look at the advertisements, and by
-a DHCP client."""
+"""What IPv6 hosts learn from the server in each of its modes: by the kernel, by a raw look at the advertisements, and
+by a DHCP client."""
 
 import ipaddress
 import re

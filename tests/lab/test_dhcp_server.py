@@ -6,7 +6,6 @@ import os
 import pathlib
 import socket
 import subprocess
-import time
 
 import pytest
 from conftest import DhcpServer, addresses, is_up, processes, run, wait_for
@@ -113,7 +112,7 @@ def test_only_what_is_switched_on_is_served():
         "dhcpd-eth0-static": "dhcp-host=02:00:00:00:00:01,192.168.60.30",
         "dhcpd-kx12-static": "dhcp-host=02:00:00:00:00:02,192.168.61.30",
         "dhcpd-vendor": "dhcp-option=vendor:MSFT,2,1i",
-        "dhcpd-pxe": "dhcp-boot=tag:pxe,pxelinux.0",
+        "dhcpd-pxe": "dhcp-vendorclass=set:pxe,PXEClient",
         "wpad-eth0": "dhcp-option=tag:lan,252,http://192.168.60.1/wpad.dat",
         "wpad-kx12": "dhcp-option=tag:lan,252,http://192.168.61.1/wpad.dat",
         "dhcpd-eth0-subnet0": "interface=eth0\ndhcp-range=set:eth00,192.168.62.10,192.168.62.20,255.255.255.0,600",

@@ -5,7 +5,7 @@ import concurrent.futures
 import contextlib
 
 import pytest
-from conftest import on_other_side, run, wait_for
+from conftest import run, wait_for
 from dhcp_lab import (
     FILES, V4, V6, KeptLease, bring_up, clean_server, fix_lease, serve, served_lines, switch, udhcpc, v4_subnet, write,
 )  # fmt: skip
