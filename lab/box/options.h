@@ -17,6 +17,7 @@ struct box_options {
     std::optional<std::string> ovs_bonds;  // text of /sys/class/net/kova_ovs_bonds
     std::optional<int> internal_lan_ports; // number in /proc/sys/kernel/kova_internal_netif_num
     bool network = true;                   // false: loopback only, no other side
+    bool guest = false;                    // on a kernel of its own
     std::vector<std::string> command;
 };
 
