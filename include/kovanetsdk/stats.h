@@ -39,8 +39,8 @@ void KLIBNetStatFree(NETSTAT *pStat);
  * does not hold is 0, one beyond 64 signed bits the nearest that fits.
  * @param pStat  receives the records; those behind the returned number are left as they were
  * @param nItem  room in pStat, above 0
- * @return number of records filled; -1 with NET_ERR_BAD_PARAMETER (logged), NET_ERR_FILE_OPEN or NET_ERR_PARSE (the
- * file cannot be read; pStat may hold records)
+ * @return number of records filled; -1 with NET_ERR_BAD_PARAMETER (logged), NET_ERR_FILE_OPEN, NET_ERR_PARSE (the file
+ *         cannot be read) or NET_ERR_OUT_OF_MEMORY; pStat may hold records with the last two
  */
 int KLIBNetStatGetAll(NETSTAT *pStat, int nItem);
 

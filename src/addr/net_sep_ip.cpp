@@ -9,8 +9,32 @@ using namespace kova;
 
 namespace {
 
+bool is_digit(char c) {
+    return '0' <= c && c <= '9';
+}
+
+/** Reads a decimal part of few digits, as nearly all are. @return false, and nothing read, for any other text */
+bool read_plain_part(char **text, uint32_t &part) {
+    constexpr int kAlwaysFit = 9;
+    char *c = *text;
+    for (part = 0; is_digit(*c); ++c) {
+        part = part * 10 + static_cast<uint32_t>(*c - '0');
+    }
+    const auto digits = c - *text;
+    const bool may_be_octal_or_hexadecimal = **text == '0' && (digits > 1 || *c == 'x' || *c == 'X');
+    if (digits == 0 || digits > kAlwaysFit || may_be_octal_or_hexadecimal) {
+        return false;
+    }
+    *text = c;
+    return true;
+}
+
 /** Reads one part. What does not fit becomes the largest value, so that no later check takes it for a small one. */
 uint32_t read_part(char **text) {
+    uint32_t part = 0;
+    if (read_plain_part(text, part)) {
+        return part;
+    }
     const long value = strtol(*text, text, 0);
     return value < 0 || value > UINT32_MAX ? UINT32_MAX : static_cast<uint32_t>(value);
 }

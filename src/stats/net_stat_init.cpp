@@ -18,31 +18,65 @@ bool is_digit(char c) {
     return c >= '0' && c <= '9';
 }
 
-/** The number that begins a rest of a name, of at most 15 digits. */
-uint64_t read_number(const char *digits) {
+bool is_blank(char c) {
+    return c == ' ' || ('\t' <= c && c <= '\r');
+}
+
+void skip_blanks(char **text) {
+    while (is_blank(**text)) {
+        ++*text;
+    }
+}
+
+/** Reads the digits that begin a text; correct up to 19 of them. */
+uint64_t read_number(char **text) {
     uint64_t number = 0;
-    for (; is_digit(*digits); ++digits) {
-        number = number * 10 + static_cast<uint64_t>(*digits - '0');
+    for (; is_digit(**text); ++*text) {
+        number = number * 10 + static_cast<uint64_t>(**text - '0');
     }
     return number;
 }
 
+/** A record and what natural order looks at first: what is before the first digit of its name, and the number there. */
+struct sortable {
+    char beginning[sizeof NETSTAT::szIfname]; ///< with one '0' for the number
+    uint64_t number;
+    NETSTAT record;
+};
+
+sortable make_sortable(NETSTAT &record) {
+    sortable made = {"", 0, record};
+    char *c = record.szIfname;
+    for (char *to = made.beginning; *c != '\0' && !is_digit(*c);) {
+        *to++ = *c++;
+    }
+    if (is_digit(*c)) {
+        made.beginning[c - record.szIfname] = '0';
+        made.number = read_number(&c);
+    }
+    return made;
+}
+
 /** Natural order: eth2 before eth10. */
-bool is_before(const NETSTAT &left, const NETSTAT &right) {
-    const char *a = left.szIfname;
-    const char *b = right.szIfname;
-    while (*a == *b && *a != '\0' && !is_digit(*a)) {
-        ++a;
-        ++b;
+bool is_before(const sortable &left, const sortable &right) {
+    const int order = memcmp(left.beginning, right.beginning, sizeof left.beginning);
+    if (order != 0) {
+        return order < 0;
     }
-    if (is_digit(*a) && is_digit(*b)) {
-        const uint64_t number_a = read_number(a);
-        const uint64_t number_b = read_number(b);
-        if (number_a != number_b) {
-            return number_a < number_b;
-        }
+    return left.number != right.number ? left.number < right.number
+                                       : strcmp(left.record.szIfname, right.record.szIfname) < 0;
+}
+
+/** @return whether there was memory for it */
+bool sort_naturally(NETSTAT *pStat, int count) {
+    const heap<sortable> sorted{static_cast<sortable *>(calloc(static_cast<size_t>(count) + 1, sizeof(sortable)))};
+    if (sorted == nullptr) {
+        return false;
     }
-    return strcmp(left.szIfname, right.szIfname) < 0;
+    sortable *const end = std::transform(pStat, pStat + count, sorted.get(), make_sortable);
+    std::sort(sorted.get(), end, is_before);
+    std::transform(sorted.get(), end, pStat, [](const sortable &one) { return one.record; });
+    return true;
 }
 
 bool begins_with(const char *text, const char *beginning) {
@@ -57,16 +91,22 @@ bool is_hidden(const char *szIfname) {
 
 /** Reads the next number of a line; false, and 0, at what is none. One beyond 64 bits becomes the nearest that fits. */
 bool read_counter(char **rest, int64_t &counter) {
+    constexpr int kAlwaysFit = 18;
+    skip_blanks(rest);
     char *const begin = *rest;
-    counter = strtoll(begin, rest, 10);
+    counter = static_cast<int64_t>(read_number(rest));
+    if (*rest == begin || *rest - begin > kAlwaysFit) { // a sign, or too many digits
+        counter = strtoll(begin, rest, 10);
+    }
     return *rest != begin;
 }
 
 void skip_fields(char **rest, int fields) {
-    constexpr char kBlanks[] = " \t\n\v\f\r";
     for (int i = 0; i < fields; ++i) {
-        *rest += strspn(*rest, kBlanks);
-        *rest += strcspn(*rest, kBlanks);
+        skip_blanks(rest);
+        while (**rest != '\0' && !is_blank(**rest)) {
+            ++*rest;
+        }
     }
 }
 
@@ -92,7 +132,10 @@ int read_records(FILE *file, NETSTAT *pStat, int nItem, bool &is_whole) {
             break;
         }
         *colon = '\0';
-        const char *const szIfname = line + strspn(line, " \t");
+        const char *szIfname = line;
+        while (*szIfname == ' ' || *szIfname == '\t') {
+            ++szIfname;
+        }
         if (is_hidden(szIfname)) {
             continue;
         }
@@ -149,8 +192,8 @@ extern "C" int KLIBNetStatGetAll(NETSTAT *pStat, int nItem) {
     if (ferror(file.get()) != 0) {
         return fail_quietly(HERE, NET_ERR_PARSE, -1);
     }
-    if (is_whole) {
-        std::sort(pStat, pStat + filled, is_before);
+    if (is_whole && !sort_naturally(pStat, filled)) {
+        return fail_quietly(HERE, NET_ERR_OUT_OF_MEMORY, -1);
     }
     return filled;
 }

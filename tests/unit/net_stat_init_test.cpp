@@ -171,6 +171,16 @@ TEST_F(net_stat_init, KLIBNetStatGetAll_numbersOfAnyLength_areCompared) {
     EXPECT_EQ((texts{"100000000000000", "999999999999999", "a9", "a99999999999999"}), names);
 }
 
+TEST_F(net_stat_init, KLIBNetStatGetAll_numberBehindManyLetters_isCompared) {
+    EXPECT_OUTCOME(read_lines(line("abcdefghijklm10") + line("abcdefghijklm9") + line("abcdefghijklmno") +
+                              line("abcdefghijklm") + line("abcdefghijklmn1") + line("abcdefghijklm-1") +
+                              line("\xC3\xA9th0") + line("eth0")),
+                   {.result = 8});
+    EXPECT_EQ((texts{"abcdefghijklm", "abcdefghijklm-1", "abcdefghijklm9", "abcdefghijklm10", "abcdefghijklmn1",
+                     "abcdefghijklmno", "eth0", "\xC3\xA9th0"}),
+              names);
+}
+
 TEST_F(net_stat_init, KLIBNetStatGetAll_lessRoomThanInterfaces_takesTheFirstAndSortsThem) {
     const std::string lines = line("eth9") + line("docker0") + line("eth1") + line("eth5") + line("lo") + line("eth0");
     EXPECT_OUTCOME(read_lines(lines, 2), {.result = 2});
@@ -282,6 +292,15 @@ TEST_F(net_stat_init, KLIBNetStatGetAll_noDescriptor_fails) {
 TEST_F(net_stat_init, KLIBNetStatGetAll_readError_fails) {
     rig.redirect(kPath, "/tmp"); // a directory opens, but does not read
     EXPECT_OUTCOME(read_all(), {.result = -1, .code = 0x4000, .unit = "net_stat_init"});
+}
+
+TEST_F(net_stat_init, KLIBNetStatGetAll_noMemoryToSort_fails) {
+    NEEDS_OWN_ALLOCATOR();
+    rig.replace_file(kPath, kHeader + line("eth1") + line("eth0"));
+    records.resize(64);
+    rig.fail("calloc");
+    EXPECT_OUTCOME(rig.observe([&] { return KLIBNetStatGetAll(records.data(), 64); }),
+                   {.result = -1, .code = 0x200, .unit = "net_stat_init"});
 }
 
 TEST_F(net_stat_init, KLIBNetStatGetAll_badArgument_isRefused) {
