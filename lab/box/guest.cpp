@@ -40,11 +40,18 @@ namespace fs = std::filesystem;
 
 namespace {
 
-constexpr const char *kKernel = "/usr/bin/linux.uml";
 constexpr std::uint64_t kMiB = 1ULL << 20;
 constexpr std::uint64_t kMemoryOfPrograms = 512 * kMiB; // beside what may be written
 constexpr std::uint64_t kLargestSize = 4096 * kMiB;
 constexpr int kBrokenOutput = 128 + SIGPIPE;
+
+// What a guest is given.
+struct guest_means {
+    std::string kernel;      // program
+    std::uint64_t megabytes; // of memory
+    unsigned boot_limit;     // seconds until it is ready
+    unsigned limit;          // seconds for the command, 0 for any time
+};
 
 // ---- the job
 
@@ -122,11 +129,11 @@ const char *folder_for_memory(std::uint64_t megabytes) {
     return fits ? "/dev/shm" : "/tmp";
 }
 
-std::vector<std::string> kernel_command(std::uint64_t megabytes, const unique_fd &line) {
+std::vector<std::string> kernel_command(const guest_means &means, const unique_fd &line) {
     const std::string end = "fd:" + std::to_string(line.get());
     return {
-        kKernel,
-        "mem=" + std::to_string(megabytes) + "M",
+        means.kernel,
+        "mem=" + std::to_string(means.megabytes) + "M",
         "rootfstype=hostfs",
         "rootflags=/",
         "ro",
@@ -156,7 +163,7 @@ void stay_on_this_processor() {
     sched_setaffinity(0, sizeof one, &one); // where that is refused it is only slower
 }
 
-[[noreturn]] void become_kernel(std::uint64_t megabytes, const unique_fd &line, const unique_fd &log) {
+[[noreturn]] void become_kernel(const guest_means &means, const unique_fd &line, const unique_fd &log) {
     setsid(); // the kernel's processes are known by their group
     prctl(PR_SET_PDEATHSIG, SIGKILL);
     stay_on_this_processor();
@@ -166,12 +173,12 @@ void stay_on_this_processor() {
     sigprocmask(SIG_SETMASK, &none, nullptr);
     signal(SIGPIPE, SIG_DFL);
     signal(SIGTTOU, SIG_DFL);
-    setenv("TMPDIR", folder_for_memory(megabytes), 1);
+    setenv("TMPDIR", folder_for_memory(means.megabytes), 1);
     fcntl(line.get(), F_SETFD, 0);
     dup2(open_file("/dev/null", O_RDONLY).get(), STDIN_FILENO);
     dup2(log.get(), STDOUT_FILENO);
     dup2(log.get(), STDERR_FILENO);
-    execv(kKernel, argument_vector(kernel_command(megabytes, line)).data());
+    execv(means.kernel.c_str(), argument_vector(kernel_command(means, line)).data());
     _exit(errno == ENOENT ? kNotFound : kCannotExecute);
 }
 
@@ -202,27 +209,32 @@ private:
 
 class keeper {
 public:
-    keeper(guest_job job, std::uint64_t megabytes) : job_(std::move(job)), megabytes_(megabytes) {}
+    keeper(guest_job job, guest_means means) : job_(std::move(job)), means_(std::move(means)) {}
 
     // Starts the kernel and waits until the command ends, the kernel dies, or kova-box is gone or tells it to stop.
     int run(const unique_fd &channel);
 
 private:
     void start_kernel();
+    void start_guard();
     void end_kernel();
     bool wait_for_end(const unique_fd &told, const unique_fd &channel);
     void talk();
     void pass_input();
     void send_size();
+    std::string what_failed() const;
     int explain_failure() const;
 
     guest_job job_;
-    std::uint64_t megabytes_;
+    guest_means means_;
     pid_t kernel_ = -1;
+    pid_t guard_ = -1;
     int kernel_status_ = 0;
-    unique_fd line_, log_;
+    unique_fd line_, log_, guard_line_;
     unique_fd done_{eventfd(0, EFD_CLOEXEC)};
     std::atomic<int> status_ = -1;
+    std::atomic<bool> ready_ = false;
+    bool late_ = false;
 };
 
 void keeper::start_kernel() {
@@ -236,12 +248,40 @@ void keeper::start_kernel() {
     kernel_ = fork();
     require(kernel_ >= 0, "cannot make a process");
     if (kernel_ == 0) {
-        become_kernel(megabytes_, inside, log_);
+        become_kernel(means_, inside, log_);
+    }
+    start_guard();
+}
+
+// Should this process be killed, the kernel goes with it, but not its helpers. The guard notes it by the end of a pipe,
+// away from any signal to the process group.
+void keeper::start_guard() {
+    int ends[2];
+    require(pipe2(ends, O_CLOEXEC) == 0, "cannot make a pipe");
+    const unique_fd watched{ends[0]};
+    guard_line_ = unique_fd{ends[1]};
+    guard_ = fork();
+    require(guard_ >= 0, "cannot make a process");
+    if (guard_ == 0) {
+        setsid();
+        guard_line_ = unique_fd{};
+        const int null = open("/dev/null", O_RDWR | O_CLOEXEC);
+        for (int stream = STDIN_FILENO; stream <= STDERR_FILENO; ++stream) {
+            dup2(null, stream); // a reader of the command's output is not to wait for the guard
+        }
+        char none = 0;
+        while (read(watched.get(), &none, 1) < 0 && errno == EINTR) {
+        }
+        kill(-kernel_, SIGKILL);
+        _exit(0);
     }
 }
 
 // The kernel keeps the memory of each of its programs in a process, all in its process group.
 void keeper::end_kernel() {
+    if (guard_ > 0) {
+        kill(guard_, SIGKILL);
+    }
     kill(kernel_, SIGKILL);
     kill(-kernel_, SIGKILL);
     int status = 0;
@@ -266,6 +306,8 @@ void keeper::talk() {
     try {
         while (const std::optional<frame> received = receive_frame(line_.get())) {
             if (received->kind == kReady) {
+                ready_ = true;
+                alarm(means_.limit);
                 send_frame(line_.get(), kJob, pack(job_));
                 send_size();
                 std::thread(&keeper::pass_input, this).detach();
@@ -289,21 +331,27 @@ void keeper::send_size() {
     }
 }
 
-// Says what the kernel said last, and returns the exit status of a box that could not be made.
+std::string keeper::what_failed() const {
+    if (late_) {
+        return ready_ ? ": the command was still running after " + std::to_string(means_.limit) + " s"
+                      : " was not ready after " + std::to_string(means_.boot_limit) + " s";
+    }
+    const bool absent = WIFEXITED(kernel_status_) && WEXITSTATUS(kernel_status_) == kNotFound;
+    return absent ? " cannot be started: it is in Debian's package user-mode-linux" : " ended before the command did";
+}
+
+// Says what the kernel said last, and returns the exit status of a box that could not be made, or took too long.
 int keeper::explain_failure() const {
-    const std::string start = WIFEXITED(kernel_status_) && WEXITSTATUS(kernel_status_) == kNotFound
-                                  ? " cannot be started: it is in Debian's package user-mode-linux"
-                                  : " ended before the command did";
-    fprintf(stderr, "kova-box: the guest's kernel %s%s\n", kKernel, start.c_str());
+    fprintf(stderr, "kova-box: the guest's kernel %s%s\n", means_.kernel.c_str(), what_failed().c_str());
     constexpr off_t kLastWords = 2000;
     std::array<char, kLastWords> words;
     const off_t size = lseek(log_.get(), 0, SEEK_END);
     const ssize_t got = pread(log_.get(), words.data(), words.size(), std::max<off_t>(0, size - kLastWords));
     fwrite(words.data(), 1, got < 0 ? 0 : static_cast<std::size_t>(got), stderr);
-    return kNoBox;
+    return late_ && ready_ ? kTookTooLong : kNoBox;
 }
 
-// Waits for the end of the command or of the kernel. Returns false when it is to be ended instead.
+// Waits for the end of the command, of the kernel or of their time. Returns false when kova-box is told to end.
 bool keeper::wait_for_end(const unique_fd &told, const unique_fd &channel) {
     std::array<pollfd, 3> sources{{{told.get(), POLLIN, 0}, {channel.get(), POLLIN, 0}, {done_.get(), POLLIN, 0}}};
     for (;;) {
@@ -321,6 +369,10 @@ bool keeper::wait_for_end(const unique_fd &told, const unique_fd &channel) {
             if (info.ssi_signo == SIGTERM) {
                 return false;
             }
+            if (info.ssi_signo == SIGALRM) {
+                late_ = true;
+                return true;
+            }
             end_kernel(); // it died; what it still said is passed on to the end of the line
         }
     }
@@ -330,9 +382,11 @@ int keeper::run(const unique_fd &channel) {
     sigset_t signals;
     sigemptyset(&signals);
     sigaddset(&signals, SIGTERM);
+    sigaddset(&signals, SIGALRM);
     sigaddset(&signals, SIGCHLD);
     const unique_fd told{signalfd(-1, &signals, SFD_CLOEXEC)};
     require(told.get() >= 0 && done_.get() >= 0, "cannot wait for signals");
+    alarm(means_.boot_limit);
     start_kernel();
     const raw_terminal terminal(job_.terminal);
     std::thread(&keeper::talk, this).detach();
@@ -344,9 +398,9 @@ int keeper::run(const unique_fd &channel) {
     return status_ < 0 ? explain_failure() : status_.load();
 }
 
-int keep_guest(guest_job job, std::uint64_t megabytes, const unique_fd &channel) {
+int keep_guest(guest_job job, guest_means means, const unique_fd &channel) {
     try {
-        auto *guest = new keeper(std::move(job), megabytes); // as long as the process: its threads use it
+        auto *guest = new keeper(std::move(job), std::move(means)); // as long as the process: its threads use it
         return guest->run(channel);
     } catch (const std::exception &error) {
         fprintf(stderr, "kova-box: %s\n", error.what());
@@ -358,9 +412,8 @@ int keep_guest(guest_job job, std::uint64_t megabytes, const unique_fd &channel)
 
 int run_guest(const box_options &options, const std::vector<std::string> &arguments) {
     const guest_job job = job_of(options, arguments);
-    const std::uint64_t megabytes = memory_for(options.size);
-    return supervise([&](terminal_use, const unique_fd &channel) { return keep_guest(job, megabytes, channel); },
-                     SIGTERM);
+    const guest_means means{options.kernel, memory_for(options.size), options.boot_limit, options.limit};
+    return supervise([&](terminal_use, const unique_fd &channel) { return keep_guest(job, means, channel); }, SIGTERM);
 }
 
 } // namespace kova

@@ -61,6 +61,14 @@ void parse(CLI::App &app, int argc, char **argv, kova::box_options &options) {
         ->check(refuse_link_name);
     app.add_flag("--no-network", no_network, "loopback only");
     app.add_flag("--guest", options.guest, "on a kernel of its own, which has every kind of interface");
+    app.add_option("--kernel", options.kernel, "kernel of the guest")->type_name("FILE")->capture_default_str();
+    app.add_option("--boot-limit", options.boot_limit, "time for the guest to become ready")
+        ->type_name("SECONDS")
+        ->check(CLI::Range(1, 3600))
+        ->capture_default_str();
+    app.add_option("--limit", options.limit, "time for the command; after it, it is ended and the status is 124")
+        ->type_name("SECONDS")
+        ->check(CLI::Range(1, 1000000));
     app.add_option("--size", options.size, "limit of what can be written inside")
         ->check(refuse_size)
         ->capture_default_str();

@@ -7,6 +7,7 @@
 #include <array>
 #include <cerrno>
 #include <csignal>
+#include <cstdio>
 #include <poll.h>
 #include <sched.h>
 #include <stdexcept>
@@ -73,7 +74,7 @@ private:
     unique_fd channel_;
     unique_fd signals_;
     terminal_use use_;
-    int ended_by_ = 0; // signal that kova-box was told to end by
+    int ended_by_ = 0; // signal that kova-box was told to end by, SIGALRM at the end of the command's time
 };
 
 void supervisor::take_terminal_back() {
@@ -124,6 +125,10 @@ int supervisor::wait() {
     }
     take_terminal_back();
     require(ended == box_, "cannot wait for the box");
+    if (ended_by_ == SIGALRM) {
+        fputs("kova-box: the command took too long\n", stderr);
+        return kTookTooLong;
+    }
     if (ended_by_ != 0) {
         end_by(ended_by_);
     }
@@ -135,6 +140,7 @@ unique_fd open_signals() {
     sigset_t signals;
     sigemptyset(&signals);
     sigaddset(&signals, SIGCHLD);
+    sigaddset(&signals, SIGALRM);
     for (const int ending : kEndingSignals) {
         sigaddset(&signals, ending);
     }
@@ -168,6 +174,7 @@ int supervise(const std::function<int(terminal_use use, const unique_fd &channel
 
 int run_box(const box_options &options) {
     const bool mapped = enter_pid_namespace();
+    alarm(options.limit);
     return supervise(
         [&](terminal_use use, const unique_fd &channel) { return box_init(options, mapped, use, channel); }, SIGKILL);
 }
