@@ -277,6 +277,12 @@ void keeper::start_guard() {
     }
 }
 
+// Also other children are told of, and those that only stopped.
+bool has_ended(pid_t child) {
+    siginfo_t info{};
+    return waitid(P_PID, static_cast<id_t>(child), &info, WEXITED | WNOHANG | WNOWAIT) == 0 && info.si_pid == child;
+}
+
 // The kernel keeps the memory of each of its programs in a process, all in its process group.
 void keeper::end_kernel() {
     if (guard_ > 0) {
@@ -373,7 +379,9 @@ bool keeper::wait_for_end(const unique_fd &told, const unique_fd &channel) {
                 late_ = true;
                 return true;
             }
-            end_kernel(); // it died; what it still said is passed on to the end of the line
+            if (has_ended(kernel_)) {
+                end_kernel(); // what it still said is passed on to the end of the line
+            }
         }
     }
 }
