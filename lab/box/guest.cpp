@@ -261,7 +261,10 @@ void keeper::start_guard() {
     const unique_fd watched{ends[0]};
     guard_line_ = unique_fd{ends[1]};
     guard_ = fork();
-    require(guard_ >= 0, "cannot make a process");
+    if (guard_ < 0) {
+        end_kernel();
+        throw std::runtime_error("cannot make a process");
+    }
     if (guard_ == 0) {
         setsid();
         guard_line_ = unique_fd{};
@@ -285,6 +288,9 @@ bool has_ended(pid_t child) {
 
 // The kernel keeps the memory of each of its programs in a process, all in its process group.
 void keeper::end_kernel() {
+    if (kernel_ < 0) {
+        return;
+    }
     if (guard_ > 0) {
         kill(guard_, SIGKILL);
     }
@@ -294,6 +300,7 @@ void keeper::end_kernel() {
     for (pid_t ended = 0; (ended = wait(&status)) > 0;) {
         kernel_status_ = ended == kernel_ ? status : kernel_status_;
     }
+    kernel_ = guard_ = -1;
 }
 
 void keeper::pass_input() {
