@@ -42,7 +42,7 @@ KERNEL_PARTS = {
     "veth": "ip link add probe type veth peer name probe2",
     "vlan": "ip link add link eth0 name probe type vlan id 5",
 }
-OF_THE_LAB_ITSELF = {"test_box": "lab", "test_guest": "guest"}  # file -> ring; they make boxes, from outside
+OF_THE_LAB_ITSELF = {"test_box": ("lab", "box"), "test_guest": ("guest", "guest")}  # file -> ring, what it makes itself
 NOT_IN_GUEST = {"sanitize": "sanitizers do not run on its kernel", "valgrind": "valgrind does not run on its kernel"}
 
 
@@ -76,16 +76,20 @@ def shortcoming(backend, needs):
 class Step:
     """One test program in one backend (or on the host), whose results come as a JUnit file."""
 
-    def __init__(self, ring, name, command, report, environment=None, options=None, needs=frozenset()):
+    def __init__(self, ring, name, command, report, environment=None, options=None, needs=frozenset(),
+                 makes=None):
         self.ring, self.name, self.command, self.report = ring, name, command, report
         self.environment = {**os.environ, **(environment or {})}
         self.options, self.needs = options, needs  # of the box; None on the host
+        self.makes = makes  # the backend that the tests start themselves
         self.backend, self.reasons, self.seconds = None, [], 0.0
         self.passed = self.failed = self.skipped = 0
 
     def place(self, backends):
         """Chooses the first backend that has what the step needs."""
         if self.options is None:
+            if self.makes and refusal(self.makes):
+                self.skip(f"{self.makes}: {refusal(self.makes)}")
             return
         refused = []
         for backend in backends:
@@ -96,7 +100,10 @@ class Step:
                 self.command = in_backend(backend, [*self.options, "--limit", str(SLOWEST)], self.command)
                 return
             refused.append(f"{backend}: {reason}")
-        self.skipped, self.reasons = 1, [f"{self.name}: {'; '.join(refused)}"]
+        self.skip("; ".join(refused))
+
+    def skip(self, reason):
+        self.skipped, self.reasons = 1, [f"{self.name}: {reason}"]
 
     def run(self):
         if self.skipped:
@@ -167,13 +174,13 @@ def needs_of(path):
     return needs
 
 
-def pytest_step(out, ring, path, in_appliance=False):
+def pytest_step(out, ring, path, in_appliance=False, makes=None):
     """A file of tests, on the host, or in an appliance that has what its "# box:" and "# needs:" lines ask for."""
     report = out / f"{path.stem}.xml"
     command = [PYTHON, "-B", "-m", "pytest", "-q", "-p", "no:cacheprovider", f"--junitxml={report}", str(path)]
     environment = {"KOVA_BUILD": str(BUILD), "KOVA_BOX_PROGRAM": str(BOX)}
     if not in_appliance:
-        return Step(ring, path.stem, command, report, environment)
+        return Step(ring, path.stem, command, report, environment, makes=makes)
     options = ["--share", str(out), "--tree", str(BUILD / "stage"), *header(path, "box")]
     needs = needs_of(path)
     if needs and shortcoming("box", needs):
@@ -191,8 +198,8 @@ def all_steps(out):
     for kind in UNIT_PROGRAMS:
         yield gtest_step(out, "valgrind", kind, BUILD, wrapper=VALGRIND, without=NOT_UNDER_VALGRIND)
     for path in sorted((ROOT / "tests" / "lab").glob("test_*.py")):
-        ring = OF_THE_LAB_ITSELF.get(path.stem)
-        yield pytest_step(out, ring or "lab", path, in_appliance=ring is None)
+        ring, makes = OF_THE_LAB_ITSELF.get(path.stem, ("lab", None))
+        yield pytest_step(out, ring, path, in_appliance=makes is None, makes=makes)
 
 
 VALGRIND = ["valgrind", "--quiet", "--error-exitcode=9", "--leak-check=full", "--errors-for-leak-kinds=definite",
@@ -250,6 +257,8 @@ def main():
             print("\n".join(f"{step.ring}/{step.name}" for step in steps))
             print("units:", *units_of("unit"), *units_of("platform"))
             return 0
+        if not asked.backend and any(step.options is not None for step in steps) and refusal("box"):
+            print(f"no boxes here ({refusal('box')}): the guest is taken for everything")
         for step in steps:
             step.place([asked.backend] if asked.backend else ["box", "guest"])
         with concurrent.futures.ThreadPoolExecutor(max_workers=os.cpu_count()) as pool:

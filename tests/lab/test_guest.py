@@ -264,3 +264,42 @@ def test_a_guest_leaves_no_file():
     before = [set(folder.glob("*vm_file*")) | set(folder.glob(".uml*")) for folder in folders]
     assert guest("true").returncode == 0
     assert [set(folder.glob("*vm_file*")) | set(folder.glob(".uml*")) for folder in folders] == before
+
+
+# ---- the runner
+
+
+def run_tests(*words, prefix=()):
+    done = subprocess.run([*prefix, "/usr/bin/python3", "-B", "tests/run.py", *words], cwd=ROOT, text=True,
+                          stdout=subprocess.PIPE, stderr=subprocess.STDOUT, timeout=PATIENCE)  # fmt: skip
+    return done.returncode, done.stdout.splitlines()
+
+
+def test_named_test_runs_in_the_guest():
+    status, lines = run_tests("--backend", "guest", "cal_mask")
+    assert status == 0 and lines[0].startswith("ok     unit/unit/cal_mask: ") and lines[0].endswith(" s, in the guest)")
+    assert lines[-1].endswith(" passed, 0 failed, 0 skipped")
+
+
+def test_what_a_backend_cannot_give_is_skipped_with_the_reason():
+    assert run_tests("--backend", "guest", "sanitize") == (0, [
+        "-      sanitize/unit: 0 passed, 1 skipped (0.0 s)",
+        "       skipped unit: guest: sanitizers do not run on its kernel",
+        "-      sanitize/platform: 0 passed, 1 skipped (0.0 s)",
+        "       skipped platform: guest: sanitizers do not run on its kernel",
+        "0 passed, 0 failed, 2 skipped"])  # fmt: skip
+
+
+def test_where_boxes_are_refused_the_guest_is_taken():
+    """A box of an ordinary user is a machine on which that can be arranged."""
+    script = "echo 0 >/proc/sys/user/max_pid_namespaces; exec /usr/bin/python3 -B tests/run.py test_box cal_mask"
+    done = subprocess.run([*AS_USER, BOX, "--", "sh", "-c", script], cwd=ROOT, text=True, stdout=subprocess.PIPE,
+                          stderr=subprocess.STDOUT, timeout=PATIENCE, env={**os.environ, "CI": ""})  # fmt: skip
+    if "cannot make a PID namespace" in done.stdout and not done.stdout.startswith("no boxes here"):
+        pytest.skip(f"user namespaces are refused here: {done.stdout}")
+    refused = "kova-box: cannot make a PID namespace, nor one in a user namespace: No space left on device"
+    lines = done.stdout.splitlines()
+    assert lines[0] == f"no boxes here ({refused}): the guest is taken for everything"
+    assert lines[-1].endswith(" passed, 0 failed, 1 skipped") and done.returncode == 0
+    assert f"       skipped test_box: box: {refused}" in lines
+    assert [line for line in lines if line.startswith("ok     unit/unit/cal_mask: ") and "in the guest" in line]
