@@ -81,6 +81,7 @@ guest_job job_of(const box_options &options, const std::vector<std::string> &arg
     // the first one is the option: what follows -- is the command's own
     job.arguments.erase(std::find(job.arguments.begin(), job.arguments.end(), "--guest"));
     job.environment = environment();
+    job.environment.emplace_back("KOVA_GUEST=1");
     for (const std::string &share : options.shares) {
         job.shares.push_back(fs::canonical(share));
     }
