@@ -11,7 +11,8 @@ import time
 import pytest
 
 ROOT = pathlib.Path(__file__).resolve().parent.parent.parent
-BOX = os.environ.get("KOVA_BOX_PROGRAM", str(ROOT / "build" / "lab" / "kova-box"))
+BUILD = pathlib.Path(os.environ.get("KOVA_BUILD", ROOT / "build"))
+BOX = os.environ.get("KOVA_BOX_PROGRAM", str(BUILD / "lab" / "kova-box"))
 AS_USER = ["setpriv", "--reuid", "1000", "--regid", "1000", "--clear-groups"] if os.geteuid() == 0 else []
 PATIENCE = 120  # seconds that nothing here needs
 MODULES = ["8021q", "bonding", "bridge", "dummy", "ifb", "macvlan", "openvswitch", "ppp_async", "ppp_generic",
@@ -129,6 +130,12 @@ def test_an_ordinary_user_has_a_guest_too():
     done = guest("sh", "-c", "ip link add dummy0 type dummy && id -u && uname -r", prefix=AS_USER)
     assert (done.returncode, done.stderr) == (0, "")
     assert done.stdout.splitlines()[0] == "0" and done.stdout.splitlines()[1] != os.uname().release
+
+
+def test_the_appliance_and_its_neighbour_run_in_it():
+    done = guest("lab/appliance-up", "lab/demo", options=["--tree", BUILD / "stage"], cwd=ROOT)
+    assert done.returncode == 0, done.stdout + done.stderr
+    assert "eth0 is static and everything above is there." in done.stdout
 
 
 # ---- kernel
