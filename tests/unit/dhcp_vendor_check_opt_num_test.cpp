@@ -8,6 +8,7 @@ namespace {
 
 const std::string kFragment = "/etc/dhcpd/dhcpd-vendor.conf";
 const std::string kUnit = "ERR dhcp_vendor_check_opt_num:N ";
+const std::string kWarning = "WARNING dhcp_vendor_check_opt_num:N ";
 const texts kMkdir{"/bin/mkdir -p /etc/dhcpd"};
 const std::string kTwoVendors = "dhcp-option=vendor:MSFT,1,one\n"
                                 "dhcp-option=vendor:PXEClient,43,boot\n"
@@ -370,9 +371,16 @@ TEST_F(dhcp_vendor_check_opt_num, DHCPVendorEnum_otherLines_arePassedOver) {
 TEST_F(dhcp_vendor_check_opt_num, DHCPVendorEnum_lineWithoutVendor_isToldAndPassedOver) {
     write_file(kFragment, "dhcp-option=vendor:,1,a\ndhcp-option=vendor:\ndhcp-option=vendor:V,1,a\n");
     EXPECT_OUTCOME(enumerate(), {.result = 0,
-                                 .log = {kUnit + "wrong format [dhcp-option=vendor:,1,a] in DHCP vendor config",
-                                         kUnit + "wrong format [dhcp-option=vendor:] in DHCP vendor config"}});
+                                 .log = {kWarning + "wrong format [dhcp-option=vendor:,1,a] in DHCP vendor config",
+                                         kWarning + "wrong format [dhcp-option=vendor:] in DHCP vendor config"}});
     EXPECT_EQ(texts{"V"}, found());
+}
+
+TEST_F(dhcp_vendor_check_opt_num, DHCPVendor_whatIsNoFile_cannotBeRead) {
+    shell("mkdir -p " + std::string(kFragment));
+    const outcome unreadable{.result = -1, .log = {kUnit + "Failed to read DHCP vendor config"}};
+    EXPECT_OUTCOME(enumerate(), unreadable);
+    EXPECT_OUTCOME(get("V"), unreadable);
 }
 
 TEST_F(dhcp_vendor_check_opt_num, DHCPVendorEnum_failures_areTold) {
