@@ -193,8 +193,10 @@ TEST_F(dhcp_vendor_check_opt_num, DHCPVendorGetVendorOpt_badArguments_areTold) {
         EXPECT_OUTCOME(get_option("MSFT", number), told("MSFT", number));
     }
     EXPECT_OUTCOME(rig.observe([] { return DHCPVendorGetVendorOpt("MSFT", 1, nullptr, 9); }), told("MSFT", 1));
-    EXPECT_OUTCOME(get_option("MSFT", 1, 0),
-                   {.result = -1, .log = {kUnit + "Failed to parse vendor opt line [dhcp-option=vendor:MSFT,1,one], parameter error"}});
+    EXPECT_OUTCOME(
+        get_option("MSFT", 1, 0),
+        {.result = -1,
+         .log = {kUnit + "Failed to parse vendor opt line [dhcp-option=vendor:MSFT,1,one], parameter error"}});
     EXPECT_STREQ("untouched", value);
 }
 
