@@ -57,15 +57,18 @@ int parse_line(const char *line, vendor_option &option) {
     return 0;
 }
 
+line_text option_line(const char *vendor, const char *number, const char *value) {
+    return line_text{"dhcp-option=vendor:%s,%s,%s", vendor, number, value};
+}
+
 /** Whether a vendor class and a value make one line that can be read whole. */
 bool can_be_stored(const char *vendor, const char *number, const char *value) {
     return is_line_text(vendor) && strchr(vendor, ',') == nullptr && is_line_text(value) &&
-           line_text{"%s%s,%s,%s", kPrefix, vendor, number, value}.fits();
+           option_line(vendor, number, value).fits();
 }
 
 int append_option(const char *vendor, const char *number, const char *value, int flags) {
-    const line_text line{"%s%s,%s,%s", kPrefix, vendor, number, value};
-    return KLIBCFileAddLine(kFragment, nullptr, line.c_str(), flags);
+    return KLIBCFileAddLine(kFragment, nullptr, option_line(vendor, number, value).c_str(), flags);
 }
 
 /** Removes the lines that begin with a text and go on with "," or end there. */
