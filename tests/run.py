@@ -191,7 +191,7 @@ def coverage_steps(out):
 
 def all_steps(out):
     for path in sorted((ROOT / "tests" / "gates").glob("test_*.py")):
-        yield pytest_step(out, "gates", path)
+        yield pytest_step(out, "gates", path, makes="box" if path.stem == "test_bench" else None)
     for kind in UNIT_PROGRAMS:
         yield gtest_step(out, kind, kind, BUILD)
     yield gtest_step(out, "fault", "fault", BUILD, shown="fault points of ")

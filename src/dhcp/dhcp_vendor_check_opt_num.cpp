@@ -51,6 +51,7 @@ int parse_line(const char *line, vendor_option &option) {
     }
     copy_text(option.number, KLIBCSzListGet(fields.get(), 1));
     copy_text(option.value, KLIBCSzListGet(fields.get(), 2));
+    option.value[strcspn(option.value, "\r")] = '\0'; // the line may have been written elsewhere
     if (DHCPVendorCheckOptNum(option.number) == 0) {
         return fail_keeping_code(HERE, -1, "Wrong option number [%s]", option.number);
     }
