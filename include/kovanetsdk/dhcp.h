@@ -8,7 +8,7 @@
  * fails, sets no code of its own (that of a platform call may stay in the register) and does not restart the server.
  *
  * Interface names go into paths: one that is "." or "..", that is longer than 235 bytes, or that holds "/", a blank or
- * a control character is refused, with 0xD00 unless said otherwise. `type` is the family: 0 IPv4, 1 IPv6.
+ * a control character, or is empty, is refused, with 0xD00 unless said otherwise. `type` is the family: 0 IPv4, 1 IPv6.
  */
 #ifndef KOVANETSDK_DHCP_H
 #define KOVANETSDK_DHCP_H
@@ -102,9 +102,9 @@ int DHCPInterfaceListGet(KLIBSZLIST **list_inout, int type);
  * range, router, search domain (unless "") and name servers; makes the directory by /bin/mkdir -p.
  * @param conf    the subnet: ifname, tag, and when on start_ip, end_ip, netmask, lease_time, router, domain, dns1, dns2
  * @param enable  not 0: on; 0: off, .conf stays as it is
- * @return 1; 0 when nothing was written for a bad record (NULL, names as above, a text without its end or with a
- * control character, "," in a name or the range, a domain that makes its line longer than 1023 bytes), or when
- * directory or a file cannot be made: .info may be written already then
+ * @return 1; 0, without a code, when nothing was written for a bad record (NULL, names as above, a text without its end
+ * or with a control character, "," in a name or the range, a domain that makes its line longer than 1023 bytes), or
+ * when directory or a file cannot be made: .info may be written already then
  */
 int KOVANetSetDhcpServerConfigFiles(const DHCP_TAG_CONF *conf, int enable);
 /**

@@ -111,6 +111,9 @@ int read_options(const place &at, const char *path, option_list &options) {
             return fail_keeping_code(at, -1, "Failed to get dhcp options from [%s]", path);
         }
     }
+    if (ferror(file.get()) != 0) {
+        return fail_keeping_code(at, -1, "Failed to get dhcp options from [%s]", path);
+    }
     return 0;
 }
 

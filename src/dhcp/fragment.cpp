@@ -79,6 +79,9 @@ bool next_cut_line(const stream &file, char (&line)[kLineRoom]) {
             line[length++] = static_cast<char>(byte);
         }
     }
+    if (length > 0 && line[length - 1] == '\r') { // written elsewhere, perhaps
+        --length;
+    }
     line[length] = '\0';
     return is_there;
 }

@@ -313,6 +313,13 @@ TEST_F(dhcp_range, DHCPIsRangeConflict_failedList_fails) {
                    {.result = -1, .log = {"ERR dhcp_range:N Failed to get interface from interface list"}});
 }
 
+TEST_F(dhcp_range, DHCPIsRangeConflict_nameThatNoInterfaceHas_isPassedOver) {
+    write_file("/etc/dhcpd/dhcpd-my eth.info", "enable=\"yes\"\n");
+    serve("eth1", "10.0.0.1", "255.0.0.0");
+    EXPECT_OUTCOME(conflict("eth0", "192.168.0.1", "255.255.255.0"), {.result = 0});
+    EXPECT_OUTCOME(conflict("eth0", "10.0.0.1", "255.0.0.0"), {.result = 1});
+}
+
 TEST_F(dhcp_range, DHCPIsRangeConflict_otherInterfaceThatCannotBeRead_fails) {
     serve("eth1", "10.0.0.1", "255.0.0.0");
     write_file("/etc/dhcpd/dhcpd-eth2.info", "");
