@@ -291,7 +291,7 @@ def test_network_is_asked_and_the_interface_left_alone(network, was_up):
     assert addresses("eth0") == before == []
     assert is_up("eth0") == was_up
     assert not processes(CLIENT)
-    assert info_file("eth0").read_text() == f"IPADDR={address}\nNETMASK={mask}\n"
+    assert info_file("eth0").read_text() == f"IPADDR={address}\nNETMASK={mask}\nOFFER=yes\n"
     assert not pathlib.Path("/etc/dhclient/ipv4/dhcpcd-eth0.pid").exists()
     assert not pathlib.Path("/etc/iproute2/config/resolv4.conf").exists()
 
