@@ -42,6 +42,8 @@ FAULT_IN_FRONT(int, chown, (const char *path, uid_t user, gid_t group), (path, u
 FAULT_IN_FRONT(int, mkdir, (const char *path, mode_t mode), (path, mode), named(path), -1, ENOSPC)
 FAULT_IN_FRONT(int, link, (const char *from, const char *to), (from, to), between(from, to), -1, ENOSPC)
 FAULT_IN_FRONT(int, rename, (const char *from, const char *to), (from, to), between(from, to), -1, EIO)
+FAULT_IN_FRONT(int, renameat2, (int from_fd, const char *from, int to_fd, const char *to, unsigned flags),
+               (from_fd, from, to_fd, to, flags), between(from, to), -1, EIO)
 FAULT_IN_FRONT(int, unlink, (const char *path), (path), named(path), -1, EIO)
 FAULT_IN_FRONT(ssize_t, readlink, (const char *path, char *to, size_t size), (path, to, size), named(path), -1, EIO)
 FAULT_IN_FRONT(char *, realpath, (const char *path, char *resolved), (path, resolved), named(path), nullptr, EACCES)
@@ -184,6 +186,8 @@ FAULT_IN_FRONT(int, clone, (int (*function)(void *), void *stack, int flags, voi
 FAULT_BEHIND(pid_t, waitpid, (pid_t pid, int *status, int options), (pid, status, options), std::string{}, -1, ECHILD)
 FAULT_IN_FRONT(int, kill, (pid_t pid, int signal), (pid, signal), std::to_string(signal), -1, EPERM)
 FAULT_IN_FRONT(int, uname, (struct utsname * out), (out), std::string{}, -1, EFAULT)
+FAULT_IN_FRONT(int, sethostname, (const char *name, size_t size), (name, size), named(name), -1, EPERM)
+FAULT_IN_FRONT(int, gethostname, (char *name, size_t size), (name, size), std::string{}, -1, EFAULT)
 FAULT_IN_FRONT(int, __register_atfork, (void (*prepare)(), void (*parent)(), void (*child)(), void *object),
                (prepare, parent, child, object), std::string{}, ENOMEM, errno)
 

@@ -66,6 +66,7 @@ const tolerances &tolerated_everywhere() {
         {"mkdir /run/lock", "another process may have made it; whether it is there shows at the open"},
         {"chmod /run/lock", "the directory may be another's; whether the lock can be had shows at the open"},
         {"fchmod /run/lock", "the lock is held all the same"},
+        {"fstat /run/lock/kova/", "whether the mode has to be put right is not known; the lock is held all the same"},
         {"fcntl 37 ", "a lock that is not to be had is asked for again"},
     };
     return all;
@@ -175,9 +176,11 @@ const tolerances announced{
 };
 const tolerances backed_up{
     {"KLIBCExec /bin/cp", "logged; the change is made without a backup", std::nullopt, ".tmp1700000000"},
+    {"open /etc/sysconfig/network-scripts/ifcfg-eth0.tmp", "the copy keeps what the tool gave it"},
     {"stat /etc/sysconfig/network-scripts/ifcfg-", "the copy keeps what the tool gave it"},
-    {"chown /etc/sysconfig/network-scripts/ifcfg-", "the copy keeps what the tool gave it"},
-    {"chmod /etc/sysconfig/network-scripts/ifcfg-", "the copy keeps what the tool gave it"},
+    {"fchown /etc/sysconfig/network-scripts/ifcfg-eth0.tmp", "the copy keeps what the tool gave it"},
+    {"fchmod /etc/sysconfig/network-scripts/ifcfg-eth0.tmp", "the copy keeps what the tool gave it"},
+    {"fsync /etc/sysconfig/network-scripts/ifcfg-eth0.tmp", "the copy may be lost with the machine's power"},
     {"unlink /etc/sysconfig/network-scripts/ifcfg-", "logged; the copy stays", std::nullopt, ".tmp1700000000"},
     {"rename /etc/sysconfig/network-scripts/.ifcfg-", "neither can the copy be renamed; it stays", -1,
      ".tmp1700000000"},

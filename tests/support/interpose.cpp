@@ -802,6 +802,7 @@ const bool others_can_fail[] = {
     can_fail("fopen"),
     can_fail("access"),
     can_fail("opendir"),
+    can_fail("glob"),
     can_fail("malloc"),
     can_fail("calloc"),
     can_fail("realloc"),
