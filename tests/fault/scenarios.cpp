@@ -2,6 +2,7 @@
 
 #include <cstring>
 #include <kova/plugin.h>
+#include <utility>
 
 namespace fault {
 
@@ -10,7 +11,7 @@ using kova_test::write_file;
 
 // ---- the appliance that every call starts from: cards eth0 (static) and eth1 (DHCP), both members of bond0
 
-world::world() : list(KLIBCSzListAlloc(4)) {
+world::world() : list(KLIBCSzListAlloc(4)), map(KLIBCSzHashAlloc(4)) {
     KLIBCSzListPush(&list, "10.0.0.1");
     KLIBCSzListPush(&list, "10.0.0.2");
     kernel.add("eth0", {.ip = "192.168.1.10", .mask = "255.255.255.0", .supported = 0x20});
@@ -40,8 +41,10 @@ world::~world() {
 }
 
 void world::release() {
-    KLIBCSzListFree(list);
-    list = nullptr;
+    KLIBCSzListFree(std::exchange(list, nullptr));
+    KLIBCSzHashFree(std::exchange(map, nullptr));
+    DHCPOptionFree(std::exchange(subnet.options, nullptr));
+    DHCPRangeFree(std::exchange(ranges, nullptr));
     if (event != 0) {
         KLIBPluginExit(event);
         event = 0;
@@ -150,6 +153,214 @@ void dhcp_card_to_set(world &it) {
     it.card.nIPSource = 0;
 }
 
+// ---- the same for resolver, routes, host name and DHCP server
+
+constexpr char kServers[] = "nameserver\t10.0.0.1\nnameserver\t10.0.0.2\n";
+
+void default_route(world &it) {
+    it.rig.replace_file("/proc/net/route", "Iface Destination Gateway Flags RefCnt Use Metric Mask MTU Window IRTT\n"
+                                           "eth0 0001A8C0 00000000 0001 0 0 0 00FFFFFF 0 0 0\n"
+                                           "eth0 00000000 0101A8C0 0003 0 0 0 00000000 0 0 0\n");
+}
+
+void gateway_conf(world &) {
+    write_file("/etc/sysconfig/network", "NETWORKING=yes\nGATEWAY=192.168.1.1\n");
+}
+
+/** Two cards that can lose the route of their subnets. */
+void two_without_link(world &it) {
+    it.kernel.add("eth0", {.flags = IFF_UP});
+    it.kernel.add("eth1", {.flags = IFF_UP});
+}
+
+
+/** Some servers are in use, others are configured, and the services that are told of a change are there. */
+void resolver(world &) {
+    write_file("/etc/resolv.conf", "nameserver\t192.168.1.1\n");
+    write_file("/etc/resolv.conf.static", kServers);
+    write_file("/etc/resolv.conf.option", "domain\texample.net\n");
+    write_file("/etc/kovainfo.conf", "dns_mode=\"static\"\n");
+    write_file("/usr/kova/service/ddns", "#!/bin/sh\n");
+    write_file("/usr/kova/service/kovarelayd", "#!/bin/sh\n");
+}
+
+void automatic_resolver(world &it) {
+    resolver(it);
+    write_file("/etc/kovainfo.conf", "dns_mode=\"auto\"\n");
+    write_file("/etc/iproute2/config/resolv4.conf", "nameserver\t10.1.0.1\n");
+    write_file("/etc/iproute2/config/resolv6.conf", "nameserver\t2001:db8::53\n");
+}
+
+void host_names(world &) {
+    write_file("/etc/hostname", "before\n");
+    write_file("/etc/hosts", "127.0.0.1\tlocalhost\n");
+}
+
+void dhcp_switches(world &) {
+    write_file("/etc/dhcpd/dhcpd.info", "enable=\"yes\"\n");
+    for (const char *name : {"dhcpd-eth0", "dhcpd6-eth0", "dhcpd-eth1", "dhcpd-bond0"}) {
+        write_file(std::string("/etc/dhcpd/") + name + ".info", "enable=\"yes\"\nbonding_backup_enable=\"no\"\n");
+    }
+}
+
+void members_with_switches(world &it) {
+    dhcp_switches(it);
+    KLIBCSzListRemoveAll(it.list);
+    KLIBCSzListPush(&it.list, "eth0");
+    KLIBCSzListPush(&it.list, "eth1");
+}
+
+/** Subnets of both families, and everything else that goes with the name eth0. */
+void dhcp_subnets(world &it) {
+    dhcp_switches(it);
+    const std::string v4 = "interface=eth0\ndhcp-range=set:eth00,10.1.0.10,10.1.0.99,255.255.255.0,600\n"
+                           "dhcp-option=tag:eth00,option:router,10.1.0.1\n"
+                           "dhcp-option=tag:eth00,option:domain-search,example.net\n"
+                           "dhcp-option=tag:eth00,option:dns-server,10.1.0.2,10.1.0.3\n"
+                           "dhcp-option=tag:eth00,option:mtu,9000\n"
+                           "dhcp-option=tag:eth00,option:ntp-server,10.1.0.4,10.1.0.5\n";
+    const std::string v6 = "interface=eth0\ndhcp-range=set:eth0v60,2001:db8::10,2001:db8::99,64,600\n"
+                           "dhcp-option=tag:eth0v60,option6:dns-server,[2001:db8::53]\nenable-ra\n";
+    write_file("/etc/dhcpd/dhcpd-eth0-subnet0.conf", v4);
+    write_file("/etc/dhcpd/dhcpd-eth0-subnet1.conf", v4);
+    write_file("/etc/dhcpd/dhcpd6-eth0-subnet0.conf", v6);
+    write_file("/etc/dhcpd/dhcpd-eth0-office.conf", v4);
+    for (const char *name : {"dhcpd-eth0-subnet0", "dhcpd6-eth0-subnet0", "dhcpd-eth0-office", "wpad-eth0"}) {
+        write_file(std::string("/etc/dhcpd/") + name + ".info", "enable=\"yes\"\n");
+    }
+    write_file("/etc/dhcpd/dhcpd-eth0-static.conf", "dhcp-host=set:eth00,02:00:00:00:00:01,10.1.0.11\n");
+    write_file("/etc/dhcpd/wpad-eth0.conf", "dhcp-option=tag:eth00,252,http://wpad.example.net/wpad.dat\n");
+}
+
+/** Puts an option without a list of its own before the others. */
+DHCP_OPTION &add_option(world &it, int number, const char *name, const char *value) {
+    auto *const option = static_cast<DHCP_OPTION *>(calloc(1, sizeof(DHCP_OPTION)));
+    option->number = number;
+    strcpy(option->name, name);
+    strcpy(option->value, value);
+    option->next = it.subnet.options;
+    it.subnet.options = option;
+    return *option;
+}
+
+void subnet_to_set(world &it) {
+    it.subnet = {.enabled = 1,
+                 .lease_time = 600,
+                 .start_ip = "10.2.0.10",
+                 .end_ip = "10.2.0.99",
+                 .ifname = "eth0",
+                 .domain = "example.net",
+                 .dns1 = "10.2.0.2",
+                 .dns2 = "10.2.0.3",
+                 .netmask = "255.255.255.0",
+                 .router = "10.2.0.1",
+                 .tag = "office"};
+    add_option(it, 26, "mtu", "9000");
+    add_option(it, 42, "ntp-server", "").items = std::exchange(it.list, nullptr);
+}
+
+void subnet_to_change(world &it) {
+    dhcp_subnets(it);
+    subnet_to_set(it);
+}
+
+void v6_subnet_to_set(world &it) {
+    it.subnet = {.enabled = 1,
+                 .lease_time = 600,
+                 .start_ip = "2001:db8::10",
+                 .end_ip = "2001:db8::99",
+                 .dns1 = "2001:db8::53",
+                 .v6_mode = "stateful"};
+}
+
+void v6_subnet_to_change(world &it) {
+    dhcp_subnets(it);
+    it.subnet = {.enabled = 1, .lease_time = 900, .dns1 = "2001:db8::54", .v6_mode = "ra-stateless"};
+}
+
+void options_to_free(world &it) {
+    add_option(it, 26, "mtu", "9000");
+    add_option(it, 37, "tcp-ttl", "64");
+}
+
+void ranges_to_free(world &it) {
+    for (int i = 0; i < 2; ++i) {
+        auto *const range = static_cast<DHCP_RANGE *>(calloc(1, sizeof(DHCP_RANGE)));
+        range->next = it.ranges;
+        it.ranges = range;
+    }
+}
+
+void local_boot_to_set(world &it) {
+    it.boot = {.enabled = 1, .local_bootloader = "local.0"};
+}
+
+void remote_boot_to_change(world &it) {
+    write_file("/etc/dhcpd/dhcpd-pxe-setting", "enable=\"yes\"\nis_remote_tftp=\"no\"\nlocal_bootloader=\"local.0\"\n"
+                                               "remote_bootloader=\"old.0\"\nremote_tftp_server_ip=\"10.0.0.8\"\n");
+    write_file("/etc/dhcpd/dhcpd-pxe.info", "enable=\"yes\"\n");
+    write_file("/etc/dhcpd/dhcpd-pxe.conf", "dhcp-boot=tag:pxe,local.0\n");
+    it.boot = {.enabled = 1, .is_remote_tftp = 1, .remote_bootloader = "remote.0", .remote_tftp_server_ip = "10.0.0.9"};
+}
+
+void vendor_to_set(world &it) {
+    KLIBCSzHashSetValue(it.map, "1", "one");
+    KLIBCSzHashSetValue(it.map, "43", "boot");
+}
+
+void vendors(world &) {
+    write_file("/etc/dhcpd/dhcpd-vendor.conf", "dhcp-option=vendor:MSFT,1,first\ndhcp-option=vendor:PXEClient,43,x\n"
+                                               "dhcp-option=vendor:MSFT,2,second\n");
+}
+
+void vendor_to_change(world &it) {
+    vendors(it);
+    vendor_to_set(it);
+}
+
+void lease_to_ask_for(world &it) {
+    it.card = {.szIfname = "eth1"};
+    write_file("/etc/dhclient/dhclient-script", "#!/bin/sh\n");
+}
+
+// ---- calls that are more than an expression
+
+/** The lock is given back even where it could not be had; there is nobody else's that could be lost by it. */
+long give_back_a_lock(world &it, long result) {
+    int &held = it.rig.held["named locks"];
+    held = result < 0 && held == -1 ? 0 : held;
+    return result;
+}
+
+long list_served_interfaces(world &) {
+    KLIBSZLIST *found = nullptr;
+    const long result = DHCPInterfaceListGet(&found, 0);
+    KLIBCSzListFree(found);
+    return result;
+}
+
+long read_ranges(world &) {
+    DHCP_RANGE *found = nullptr;
+    const long result = DHCPGetInterfaceRanges("eth0", &found);
+    DHCPRangeFree(found);
+    return result;
+}
+
+long read_subnet(world &it) {
+    const long result = DHCPTagConfGet("eth0", 0, 0, &it.subnet);
+    DHCPOptionFree(std::exchange(it.subnet.options, nullptr));
+    return result;
+}
+
+/** Settings that cannot be read are told in the record. */
+long read_boot_switch(world &it) {
+    return DHCPPXEConfGetEnable(&it.boot) < 0 ? -1 : it.boot.enabled;
+}
+
+long read_boot_settings(world &it) {
+    return DHCPPXEConfGet(&it.boot) < 0 ? -1 : it.boot.enabled;
+}
+
 // ---- what functions get over by design
 
 const tolerances cards{
@@ -228,6 +439,29 @@ const tolerances interface_state{
     {"fopen /sys/class/net/eth0/flags", "the kernel itself refuses to rename what is up"},
     {"fread /sys/class/net/eth0/flags", "the kernel itself refuses to rename what is up"},
 };
+const tolerances told{
+    {"KLIBPluginSDKInit", "the change is made whether it is announced or not"},
+    {"KLIBPluginSetArg", "the change is made whether it is announced or not"},
+    {"KLIBPluginAction", "the change is made whether it is announced or not"},
+};
+const tolerances dispatch{
+    {"KLIBPluginHasInit", "logged; both phases run, and the call succeeds"},
+    {"KLIBPluginSetArg", "logged; both phases run, and the call succeeds"},
+    {"KLIBPluginAction", "logged; both phases run, and the call succeeds"},
+};
+const tolerances reloads{
+    {"KLIBServiceReload", "the file is made; the services follow with the next change"},
+    {"KLIBServiceIsRunning", "the file is made; the services follow with the next change"},
+};
+const tolerances servers_in_file{
+    {"fopen /etc/resolv.conf", "logged; a file that cannot be opened has no servers"},
+};
+const tolerances container{
+    {"KOVAIsDockerHMX", "a machine that cannot tell is no container"},
+};
+const tolerances off_unless_read{
+    {"KLIBCFileCheckKeyValue", "a switch that cannot be read is off", kAnyResult},
+};
 
 const char *const kOld[] = {"eth0"};
 const char *const kNew[] = {"bond0"};
@@ -253,11 +487,56 @@ const std::vector<scenario> &scenarios() {
         {"BlKLIBIsv6IpAddrValid", CALL(BlKLIBIsv6IpAddrValid("fe80::1/64")), pure},
         {"BlKOVALnxIsDHCP", CALL(BlKOVALnxIsDHCP("eth1")), failure::zero, protocol},
         {"BlKOVALnxIsDHCP/repair", CALL(BlKOVALnxIsDHCP("eth0")), no_protocol, failure::zero, protocol},
+        {"DHCPDConfChangeInterface", CALL(DHCPDConfChangeInterface("eth0", "lan0")), dhcp_subnets},
+        {"DHCPDLinkAggrSet/into", CALL(DHCPDLinkAggrSet(1, "bond0", it.list)), members_with_switches},
+        {"DHCPDLinkAggrSet/apart", CALL(DHCPDLinkAggrSet(0, "bond0", it.list)), members_with_switches},
+        {"DHCPGetInterfaceRanges", read_ranges, dhcp_subnets},
+        {"DHCPInterfaceIsEnabled", CALL(DHCPInterfaceIsEnabled("eth0", 1)), dhcp_switches, failure::below_one},
+        {"DHCPInterfaceListGet", list_served_interfaces, dhcp_switches},
+        {"DHCPInterfaceSetEnabled/new", CALL(DHCPInterfaceSetEnabled("eth0", 0, 1))},
+        {"DHCPInterfaceSetEnabled/change", CALL(DHCPInterfaceSetEnabled("eth0", 1, 0)), dhcp_switches},
+        {"DHCPIsEnabled", CALL(DHCPIsEnabled()), dhcp_switches, failure::zero},
+        {"DHCPIsRangeConflict",
+         CALL(DHCPIsRangeConflict("eth1", "10.1.0.0", "10.1.0.9", "255.255.255.128", it.text, 16)), dhcp_subnets},
+        {"DHCPOptionFree", CALL((DHCPOptionFree(std::exchange(it.subnet.options, nullptr)), 0)), options_to_free, pure},
+        {"DHCPOptionIsListValue", CALL(DHCPOptionIsListValue(42)), pure},
+        {"DHCPPXEConfGet", read_boot_settings, remote_boot_to_change},
+        {"DHCPPXEConfGetEnable", read_boot_switch, remote_boot_to_change},
+        {"DHCPPXEConfSet/new", CALL(DHCPPXEConfSet(&it.boot)), local_boot_to_set},
+        {"DHCPPXEConfSet/change", CALL(DHCPPXEConfSet(&it.boot)), remote_boot_to_change},
+        {"DHCPPXEConfSetEnable/new", CALL(DHCPPXEConfSetEnable(1))},
+        {"DHCPPXEConfSetEnable/change", CALL(DHCPPXEConfSetEnable(0)), remote_boot_to_change},
+        {"DHCPRangeFree", CALL((DHCPRangeFree(std::exchange(it.ranges, nullptr)), 0)), ranges_to_free, pure},
+        {"DHCPServerRestart", CALL(DHCPServerRestart()), failure::not_zero},
+        {"DHCPServerStart", CALL(DHCPServerStart()), failure::not_zero},
+        {"DHCPTagConfGet/ipv4", read_subnet, dhcp_subnets, failure::below_one},
+        {"DHCPTagConfGet/ipv6", CALL(DHCPTagConfGet("eth0", 0, 1, &it.subnet)), dhcp_subnets, failure::below_one},
+        {"DHCPTagConfGetEnable", CALL(DHCPTagConfGetEnable("eth0", 0, 0, &it.number)), dhcp_subnets,
+         failure::below_one},
+        {"DHCPTagConfSet/new", CALL(DHCPTagConfSet("eth0", 0, 0, &it.subnet)), subnet_to_set},
+        {"DHCPTagConfSet/change", CALL(DHCPTagConfSet("eth0", 0, 0, &it.subnet)), subnet_to_change},
+        {"DHCPTagConfSet/ipv6", CALL(DHCPTagConfSet("eth0", 0, 1, &it.subnet)), v6_subnet_to_change},
+        {"DHCPTagConfSetConfig/ipv4", CALL(DHCPTagConfSetConfig("eth0", 0, 0, &it.subnet)), subnet_to_change},
+        {"DHCPTagConfSetConfig/ipv6", CALL(DHCPTagConfSetConfig("eth0", 0, 1, &it.subnet)), v6_subnet_to_set},
+        {"DHCPTagConfSetEnable/new", CALL(DHCPTagConfSetEnable("eth0", 0, 0, 1))},
+        {"DHCPTagConfSetEnable/change", CALL(DHCPTagConfSetEnable("eth0", 0, 1, 0)), dhcp_subnets},
+        {"DHCPVendorCheckOptNum", CALL(DHCPVendorCheckOptNum("43")), pure},
+        {"DHCPVendorEnum", CALL(DHCPVendorEnum(&it.list)), vendors},
+        {"DHCPVendorGetVendor", CALL(DHCPVendorGetVendor("MSFT", &it.map)), vendors},
+        {"DHCPVendorGetVendorOpt", CALL(DHCPVendorGetVendorOpt("MSFT", 2, it.text, sizeof it.text)), vendors,
+         failure::below_one},
+        {"DHCPVendorSetVendor/new", CALL(DHCPVendorSetVendor("MSFT", it.map)), vendor_to_set},
+        {"DHCPVendorSetVendor/change", CALL(DHCPVendorSetVendor("MSFT", it.map)), vendor_to_change},
+        {"DHCPVendorSetVendorOpt/new", CALL(DHCPVendorSetVendorOpt("MSFT", 2, "new"))},
+        {"DHCPVendorSetVendorOpt/change", CALL(DHCPVendorSetVendorOpt("MSFT", 2, "new")), vendors},
+        {"DefaultGatewayGet", CALL(DefaultGatewayGet(it.text, sizeof it.text, it.names[0], sizeof it.names[0])),
+         default_route},
         {"ErrKLIBIpMaskToSubnet", CALL(ErrKLIBIpMaskToSubnet(strcpy(it.text, "10.0.0.1/255.0.0.0"), it.names[0])),
          pure},
         {"ErrKLIBSubnetToIpMask", CALL(ErrKLIBSubnetToIpMask(strcpy(it.text, "10.0.0.1/8"), nullptr)), pure},
         {"KLIBIsIpInRange", CALL(KLIBIsIpInRange("10.0.0.2", "10.0.0.1", "10.0.0.3", 2)), pure},
         {"KLIBNetBridgeIfIsSlave", CALL(KLIBNetBridgeIfIsSlave("eth0")), bridge_port, failure::zero},
+        {"KLIBNetDHCPServerRestart", CALL(KLIBNetDHCPServerRestart())},
         {"KLIBNetGetIfCfg", CALL(KLIBNetGetIfCfg("eth0", "IPADDR", it.text, sizeof it.text))},
         {"KLIBNetGetInterfaceInfo", CALL(KLIBNetGetInterfaceInfo(it.records, 32, 2)), two_vlans, cards},
         {"KLIBNetGetInterfaceInfo/cluster", CALL(KLIBNetGetInterfaceInfo(it.records, 32, 5)), cluster, cards},
@@ -289,23 +568,47 @@ const std::vector<scenario> &scenarios() {
              return records != nullptr;
          },
          failure::zero},
+        {"KLIBServicePlugin", CALL(KLIBServicePlugin(1, KLIB_SERVICE_IP_CHANGE)), dispatch},
+        {"KLIBServiceStopBeforeIPChange", CALL(KLIBServiceStopBeforeIPChange())},
         {"KOVAExternalIPGet", CALL(KOVAExternalIPGet(it.text, sizeof it.text))},
         {"KOVAGetMTU", CALL(KOVAGetMTU("eth0")), failure::below_one},
         {"KOVAGetMTUSetting", CALL(KOVAGetMTUSetting("eth0")), failure::below_one},
         {"KOVAGetMTUSetting/switch bond", CALL(KOVAGetMTUSetting("ovs_bond0")), virtual_switch, failure::below_one,
          switch_ports},
         {"KOVAGetMTUSetting/switch port", CALL(KOVAGetMTUSetting("ovs_eth0")), virtual_switch, failure::below_one},
+        {"KOVAIGetDHCPTestNetInfo", CALL(KOVAIGetDHCPTestNetInfo(&it.card)), lease_to_ask_for},
         {"KOVAILnxGetIP", CALL(KOVAILnxGetIP("eth0", it.text, sizeof it.text))},
         {"KOVAILnxGetIPFromCfg", CALL(KOVAILnxGetIPFromCfg("eth0", it.text, sizeof it.text))},
         {"KOVAILnxSetIPNetmask", CALL(KOVAILnxSetIPNetmask("eth0", "192.168.1.20", "255.255.255.0")), backed_up,
          announced},
+        {"KOVALnxGetHostname", CALL(KOVALnxGetHostname(it.text))},
         {"KOVALnxIPv6FlushAddr", CALL(KOVALnxIPv6FlushAddr("eth0")), off_and_on},
         {"KOVALnxIPv6ProcAction/enable", CALL(KOVALnxIPv6ProcAction("eth0", 0)), off_and_on},
         {"KOVALnxIPv6ProcAction/disable", CALL(KOVALnxIPv6ProcAction("eth0", 1)), off_and_on},
+        {"KOVALnxSetHostname", CALL(KOVALnxSetHostname("kova")), host_names, container},
         {"KOVALnxV6IPGet", CALL(KOVALnxV6IPGet("eth0", it.addresses, 16)), address_list},
         {"KOVANetCalBroadcast", CALL(KOVANetCalBroadcast("192.168.1.10/24", it.text, sizeof it.text)), calculator},
         {"KOVANetCalNetwork", CALL(KOVANetCalNetwork("192.168.1.10/24", it.text, sizeof it.text)), calculator},
         {"KOVANetDNSChangeHook", CALL(KOVANetDNSChangeHook(KLIB_PLUGIN_POST, it.list))},
+        {"KOVANetDNSFileSet", CALL(KOVANetDNSFileSet(it.list, it.list)), resolver, told},
+        {"KOVANetDNSGet", CALL(give_back_a_lock(it, KOVANetDNSGet(it.text, sizeof it.text))), resolver,
+         servers_in_file},
+        {"KOVANetDNSListGet", CALL(give_back_a_lock(it, KOVANetDNSListGet(&it.list))), resolver, servers_in_file},
+        {"KOVANetDNSListSet/new", CALL(KOVANetDNSListSet(it.list)), told},
+        {"KOVANetDNSListSet/change", CALL(KOVANetDNSListSet(it.list)), automatic_resolver, told, reloads},
+        {"KOVANetDNSModeSet/static", CALL(KOVANetDNSModeSet("static")), automatic_resolver, told, reloads},
+        {"KOVANetDNSModeSet/auto", CALL(KOVANetDNSModeSet("auto")), automatic_resolver, told, reloads},
+        {"KOVANetDNSSet", CALL(KOVANetDNSSet("10.0.0.3")), resolver, told, reloads},
+        {"KOVANetDNSUpdate/static", CALL(KOVANetDNSUpdate()), resolver, told, reloads},
+        {"KOVANetDNSUpdate/auto", CALL(KOVANetDNSUpdate()), automatic_resolver, told, reloads},
+        {"KOVANetDefaultGatewayGet", CALL(KOVANetDefaultGatewayGet(it.text, sizeof it.text)), default_route},
+        {"KOVANetDefaultGatewayGetConf", CALL(KOVANetDefaultGatewayGetConf(it.text, sizeof it.text)), gateway_conf},
+        {"KOVANetDefaultGatewayInterfaceGet", CALL(KOVANetDefaultGatewayInterfaceGet(it.text, sizeof it.text)),
+         default_route},
+        {"KOVANetDefaultGatewaySet", CALL(KOVANetDefaultGatewaySet("192.168.1.1"))},
+        {"KOVANetDefaultGatewaySetConf/new", CALL(KOVANetDefaultGatewaySetConf("192.168.1.2"))},
+        {"KOVANetDefaultGatewaySetConf/change", CALL(KOVANetDefaultGatewaySetConf("192.168.1.2")), gateway_conf},
+        {"KOVANetDefaultGatewaySetConf/none", CALL(KOVANetDefaultGatewaySetConf("")), gateway_conf},
         {"KOVANetDnsConfigChangeHook", CALL(KOVANetDnsConfigChangeHook(KLIB_PLUGIN_POST, "eth0", it.list))},
         {"KOVANetEnumCard", CALL(KOVANetEnumCard(2)), cards},
         {"KOVANetFlushIP/ipv4", CALL(KOVANetFlushIP("-4", "eth0"))},
@@ -318,6 +621,8 @@ const std::vector<scenario> &scenarios() {
          protocol},
         {"KOVANetGetCard1Ex/cluster", CALL(KOVANetGetCard1Ex(0, "10.9.0.2", 6, &it.card)), cluster, failure::below_one,
          cards, protocol},
+        {"KOVANetGetDhcpServerConf", CALL(KOVANetGetDhcpServerConf("office", "eth0", &it.subnet)), dhcp_subnets,
+         failure::zero},
         {"KOVANetGetEthInfo", CALL(KOVANetGetEthInfo(&it.ethernet, "eth0"))},
         {"KOVANetGetEthInfo/switch bond", CALL(KOVANetGetEthInfo(&it.ethernet, "ovs_bond0")), virtual_switch,
          switch_ports},
@@ -363,12 +668,22 @@ const std::vector<scenario> &scenarios() {
         {"KOVANetSetCard1/static", CALL(KOVANetSetCard1(&it.card, nullptr)), card_to_set, backed_up, announced,
          housekeeping},
         {"KOVANetSetCard1/dhcp", CALL(KOVANetSetCard1(&it.card, nullptr)), dhcp_card_to_set, backed_up, housekeeping},
+        {"KOVANetSetDhcpServerConfigFiles/new", CALL(KOVANetSetDhcpServerConfigFiles(&it.subnet, 1)), subnet_to_set,
+         failure::zero},
+        {"KOVANetSetDhcpServerConfigFiles/change", CALL(KOVANetSetDhcpServerConfigFiles(&it.subnet, 1)),
+         subnet_to_change, failure::zero},
         {"KOVANetSetIP/ipv4", CALL(KOVANetSetIP("-4", "eth0", "192.168.1.20", 24, "add")), announced},
         {"KOVANetSetIP/ipv4 without link", CALL(KOVANetSetIP("-4", "eth0", "192.168.1.10", 24, "add")), without_link,
          announced, calculator, route_update},
         {"KOVANetSetIP/ipv4 del", CALL(KOVANetSetIP("-4", "eth0", "192.168.1.10", 24, "del"))},
         {"KOVANetSetIP/ipv6", CALL(KOVANetSetIP("-6", "eth0", "2001:db8::1", 64, "add")), announced},
         {"KOVANetSetIfBlock", CALL(KOVANetSetIfBlock("eth0", 1, 1)), block_steps},
+        {"KOVANetStaticDNSListGet", CALL(KOVANetStaticDNSListGet(&it.list)), resolver, servers_in_file},
+        {"NetRoutetableCheck", CALL(NetRoutetableCheck()), two_without_link, cards, protocol},
+        {"NetRoutetableEdit/add", CALL(NetRoutetableEdit(NET_ROUTE_ADD, "10.0.0.1", "255.0.0.0", "eth0"))},
+        {"NetRoutetableEdit/delete", CALL(NetRoutetableEdit(NET_ROUTE_DELETE, "10.0.0.1", "255.0.0.0", "eth0"))},
+        {"NetRoutetableHandler/add", CALL(NetRoutetableHandler(NET_ROUTE_ADD, "eth0")), cards, protocol},
+        {"NetRoutetableHandler/dhcp", CALL(NetRoutetableHandler(NET_ROUTE_DELETE, "eth1")), cards, protocol},
         {"cKLIBICalMask", CALL(cKLIBICalMask(kMask)), pure},
         {"cKLIBISepIP", CALL(cKLIBISepIP("10.0.0.1", reinterpret_cast<uint32_t *>(it.text))), pure},
     };

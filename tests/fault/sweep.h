@@ -40,6 +40,10 @@ struct world {
     NETSTAT statistics[32];
     KOVAV6IP addresses[16];
     KOVALINKAGGROPT bond;
+    KLIBSZHASH *map; ///< empty
+    DHCP_TAG_CONF subnet = {};
+    DHCP_PXE_CONF boot = {};
+    DHCP_RANGE *ranges = nullptr;
 };
 
 /** How a function's result says that it failed. */
