@@ -15,6 +15,7 @@ namespace {
 constexpr char kFragment[] = "/etc/dhcpd/dhcpd-vendor.conf";
 constexpr char kPrefix[] = "dhcp-option=vendor:";
 constexpr int kLastNumber = 254;
+constexpr char kUnreadable[] = "Failed to read DHCP vendor config";
 
 // flags of the platform's line operations
 constexpr int kWholeField = 1026;
@@ -136,7 +137,7 @@ extern "C" int DHCPVendorGetVendor(const char *vendor, KLIBSZHASH **options) {
     }
     const stream file{fopen(kFragment, "re")};
     if (!file.is_held()) {
-        return fail_keeping_code(HERE, -1, "Failed to read DHCP vendor config");
+        return fail_keeping_code(HERE, -1, kUnreadable);
     }
     const line_text wanted{"%s%s,", kPrefix, shown(vendor)};
     char line[kLineRoom];
@@ -153,7 +154,7 @@ extern "C" int DHCPVendorGetVendor(const char *vendor, KLIBSZHASH **options) {
             return fail_keeping_code(HERE, result, "Failed to get vendor option: generate vendor hash error");
         }
     }
-    return 0;
+    return ferror(file.get()) == 0 ? 0 : fail_keeping_code(HERE, -1, kUnreadable);
 }
 
 extern "C" int DHCPVendorGetVendorOpt(const char *vendor, int number, char *value, unsigned int size) {
@@ -241,7 +242,7 @@ extern "C" int DHCPVendorEnum(KLIBSZLIST **vendors) {
     }
     const stream file{fopen(kFragment, "re")};
     if (!file.is_held()) {
-        return fail_keeping_code(HERE, -1, "Failed to read DHCP vendor config");
+        return fail_keeping_code(HERE, -1, kUnreadable);
     }
     char line[kLineRoom];
     while (next_cut_line(file, line)) {
@@ -249,5 +250,5 @@ extern "C" int DHCPVendorEnum(KLIBSZLIST **vendors) {
             return -1;
         }
     }
-    return 0;
+    return ferror(file.get()) == 0 ? 0 : fail_keeping_code(HERE, -1, kUnreadable);
 }
