@@ -6,6 +6,7 @@
 #include "support/fault_points.h"
 
 #include <cstdarg>
+#include <cstring>
 #include <dirent.h>
 #include <dlfcn.h>
 #include <fcntl.h>
@@ -47,7 +48,26 @@ FAULT_IN_FRONT(int, renameat2, (int from_fd, const char *from, int to_fd, const 
 FAULT_IN_FRONT(int, unlink, (const char *path), (path), named(path), -1, EIO)
 FAULT_IN_FRONT(ssize_t, readlink, (const char *path, char *to, size_t size), (path, to, size), named(path), -1, EIO)
 FAULT_IN_FRONT(char *, realpath, (const char *path, char *resolved), (path, resolved), named(path), nullptr, EACCES)
-FAULT_IN_FRONT(int, mkostemp, (char *path, int flags), (path, flags), named(path), -1, ENOSPC)
+
+/** The same name in each run: the first that is free. */
+extern "C" int failing_mkostemp(char *path, int flags) __asm__("mkostemp");
+extern "C" int failing_mkostemp(char *path, int flags) {
+    const fault_point point{"mkostemp", is_in_code_under_test(__builtin_return_address(0)),
+                            [&] { return named(path); }};
+    if (point.fails()) {
+        errno = ENOSPC;
+        return -1;
+    }
+    const rig_at_work guard;
+    char *const end = path + strlen(path) - 6;
+    int fd = -1;
+    for (int number = 0; fd < 0 && number < 100; ++number) {
+        snprintf(end, 7, "%06d", number);
+        fd = open(path, O_RDWR | O_CREAT | O_EXCL | flags, 0600);
+    }
+    return fd;
+}
+static const bool mkostemp_can_fail = can_fail("mkostemp");
 
 extern "C" int failing_openat(int fd, const char *path, int flags, ...) __asm__("openat");
 extern "C" int failing_openat(int fd, const char *path, int flags, ...) {
@@ -76,8 +96,20 @@ FAULT_IN_FRONT(int, fchown, (int fd, uid_t user, gid_t group), (fd, user, group)
 FAULT_BEHIND(int, close, (int fd), (fd), path_of(fd), -1, EIO)
 FAULT_IN_FRONT(int, memfd_create, (const char *name, unsigned flags), (name, flags), named(name), -1, ENFILE)
 FAULT_IN_FRONT(int, pipe2, (int *ends, int flags), (ends, flags), std::string{}, -1, EMFILE)
-FAULT_IN_FRONT(ssize_t, getrandom, (void *to, size_t size, unsigned flags), (to, size, flags), std::string{}, -1,
-               ENOSYS)
+
+/** The same bytes in each run. */
+extern "C" ssize_t failing_getrandom(void *to, size_t size, unsigned flags) __asm__("getrandom");
+extern "C" ssize_t failing_getrandom(void *to, size_t size, unsigned) {
+    const fault_point point{"getrandom", is_in_code_under_test(__builtin_return_address(0)),
+                            [] { return std::string(); }};
+    if (point.fails()) {
+        errno = ENOSYS;
+        return -1;
+    }
+    memset(to, 0x42, size);
+    return static_cast<ssize_t>(size);
+}
+static const bool getrandom_can_fail = can_fail("getrandom");
 
 /** Nothing goes to the disk: the files of a run are gone after it. */
 extern "C" int failing_fsync(int fd) __asm__("fsync");

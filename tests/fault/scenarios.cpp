@@ -173,7 +173,6 @@ void two_without_link(world &it) {
     it.kernel.add("eth1", {.flags = IFF_UP});
 }
 
-
 /** Some servers are in use, others are configured, and the services that are told of a change are there. */
 void resolver(world &) {
     write_file("/etc/resolv.conf", "nameserver\t192.168.1.1\n");
