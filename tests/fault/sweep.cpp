@@ -273,7 +273,7 @@ bool says_failure(failure how, long result) {
 }
 
 bool is_about(const tolerance &entry, const std::string &point) {
-    return (" > " + point).find(" > " + entry.at) != std::string::npos;
+    return (" > " + point + " ").find(" > " + entry.at) != std::string::npos;
 }
 
 const tolerance *tolerance_of(const scenario &one, const std::string &point) {

@@ -51,7 +51,7 @@ enum class failure { below_zero, zero, below_one, not_zero };
 
 /** A failure that a function gets over by design. */
 struct tolerance {
-    std::string at;               ///< what the point, or a call around it, begins with
+    std::string at;               ///< what the point, or a call around it, begins with; a blank at the end: what it is
     std::string reason;           ///< why, in one line
     std::optional<long> result{}; ///< what the function answers then; without one as when nothing failed
     std::string file{};           ///< file that may be in between, by a part of its path
