@@ -185,7 +185,9 @@ extern "C" FILE *failing_fdopen(int fd, const char *mode) {
         errno = ENOMEM;
         return nullptr;
     }
-    return is_counted ? watched(next(fd, mode), mode, path_of(fd)) : next(fd, mode);
+    FILE *const stream = next(fd, mode);
+    const rig_at_work guard;
+    return is_counted ? watched(stream, mode, path_of(fd)) : stream;
 }
 static const bool fdopen_can_fail = can_fail("fdopen");
 

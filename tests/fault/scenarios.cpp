@@ -1,6 +1,7 @@
 #include "fault/sweep.h"
 
 #include <cstring>
+#include <filesystem>
 #include <kova/plugin.h>
 #include <utility>
 
@@ -32,6 +33,7 @@ world::world() : list(KLIBCSzListAlloc(4)), map(KLIBCSzHashAlloc(4)) {
     rig.replace_file("/sys/class/net/bond0/bonding/slaves", "eth0 eth1\n");
     rig.replace_file("/sys/class/net/bond0/bonding/mode", "802.3ad 4\n");
     rig.replace_file("/proc/net/bonding//bond0", "\tPartner Mac Address: 00:11:22:33:44:55\n");
+    rig.answer("/bin/mkdir -p /etc/dhcpd", 0, "", [] { std::filesystem::create_directories("/etc/dhcpd"); });
     rig.answer("/bin/ipcalc -n", 0, "NETWORK=192.168.1.0\n");
     rig.answer("/bin/ipcalc -b", 0, "BROADCAST=192.168.1.255\n");
 }
@@ -460,6 +462,7 @@ const tolerances made_again{
     {"KLIBCFileGetLine /etc/resolv.conf.option", "no line was found", std::nullopt, "/etc/resolv.conf"},
     {"open /etc/ ", "the file is in its place; its name may be lost with the machine's power"},
     {"fsync /etc ", "the file is in its place; its name may be lost with the machine's power"},
+    {"fclose written /etc/resolv.conf", "what was written is on the disk already"},
     {"chmod /etc/resolv.conf", "logged; it was readable before it got its name"},
     {"KLIBServiceReload", "the file is made; the services are not waited for"},
     {"KLIBServiceIsRunning", "the file is made; the services are not waited for"},
