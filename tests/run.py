@@ -27,6 +27,7 @@ PYTHON = "/usr/bin/python3"
 UNIT_PROGRAMS = {"unit": "tests/kovanet-unit-tests", "platform": "tests/platform/kova-platform-tests"}
 PROGRAMS = {**UNIT_PROGRAMS, "fault": "tests/kovanet-fault-tests", "crash": "tests/crash/kova-crash-tests"}
 COUNTED = [kind for kind in PROGRAMS if kind != "crash"]  # whose lines count as tested; the killed count nothing
+FAULT_SHARDS = 2  # processes that share the sweep: it mostly waits for its own processes
 SLOWEST = 1800  # seconds for one step, on a machine that has much else to do
 
 
@@ -87,13 +88,21 @@ def boxed(out, options, command):
     return [str(BOX), "--share", str(out), *options, "--", *command]
 
 
-def gtest_step(out, ring, kind, build, unit=None, wrapper=(), without=(), **more):
+def gtest_step(out, ring, kind, build, unit=None, part=None, wrapper=(), without=(), **more):
     program = build / PROGRAMS[kind]
-    report = out / f"{ring}-{kind}-{unit or 'all'}.xml"
+    report = out / f"{ring}-{kind}-{unit or part or 'all'}.xml"
     chosen = f"{unit}.*" if unit else "*"
     command = [*wrapper, str(program), f"--gtest_output=xml:{report}", "--gtest_brief=1",
                f"--gtest_filter={chosen}{'-' + ':'.join(without) if without else ''}"]
-    return Step(ring, f"{kind}{'/' + unit if unit else ''}", boxed(out, [], command), report, **more)
+    named = "/".join([kind, *filter(None, [unit, part])])
+    return Step(ring, named, boxed(out, [], command), report, **more)
+
+
+def fault_steps(out):
+    """The sweep, in parts that run side by side."""
+    for number in range(FAULT_SHARDS):
+        yield gtest_step(out, "fault", "fault", BUILD, part=f"{number + 1}of{FAULT_SHARDS}", shown="fault points of ",
+                          environment={"GTEST_TOTAL_SHARDS": str(FAULT_SHARDS), "GTEST_SHARD_INDEX": str(number)})
 
 
 def property_step(out, name, seed, rounds, chosen="*"):
@@ -151,7 +160,7 @@ def all_steps(out):
         yield pytest_step(out, "gates", path, inside_box=False)
     for kind in UNIT_PROGRAMS:
         yield gtest_step(out, kind, kind, BUILD)
-    yield gtest_step(out, "fault", "fault", BUILD, shown="fault points of ")
+    yield from fault_steps(out)
     yield gtest_step(out, "crash", "crash", BUILD, shown="kill points of ")
     for kind in UNIT_PROGRAMS:
         yield gtest_step(out, "sanitize", kind, BUILD / "sanitize")
