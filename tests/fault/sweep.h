@@ -47,7 +47,13 @@ struct world {
 };
 
 /** How a function's result says that it failed. */
-enum class failure { below_zero, zero, below_one, not_zero };
+enum class failure {
+    below_zero,
+    zero,
+    below_one,
+    not_zero,
+    like_zero ///< zero, which is the call's answer also when nothing fails
+};
 
 /** A failure that a function gets over by design. */
 struct tolerance {
