@@ -32,6 +32,7 @@ UNIT_PROGRAMS = {"unit": "tests/kovanet-unit-tests", "platform": "tests/platform
 PROGRAMS = {**UNIT_PROGRAMS, "fault": "tests/kovanet-fault-tests", "crash": "tests/crash/kova-crash-tests"}
 COUNTED = [kind for kind in PROGRAMS if kind != "crash"]  # whose lines count as tested; the killed count nothing
 BUILT_ANEW = {"sanitize", "coverage"}  # rings that need the libraries once more, in a way of their own
+FAULT_SHARDS = 2  # processes that share the sweep: it mostly waits for its own processes
 SLOWEST = 1800  # seconds for one step, on a machine that has much else to do
 
 
@@ -114,14 +115,21 @@ class Step:
             self.failed = 1  # a step without a test proves nothing
 
 
-def gtest_step(out, ring, kind, build, unit=None, wrapper=(), without=(), **more):
+def gtest_step(out, ring, kind, build, unit=None, part=None, wrapper=(), without=(), **more):
     program = build / PROGRAMS[kind]
-    report = out / f"{ring}-{kind}-{unit or 'all'}.xml"
+    report = out / f"{ring}-{kind}-{unit or part or 'all'}.xml"
     chosen = f"{unit}.*" if unit else "*"
     command = [*wrapper, str(program), f"--gtest_output=xml:{report}", "--gtest_brief=1",
                f"--gtest_filter={chosen}{'-' + ':'.join(without) if without else ''}"]
-    return Step(ring, f"{kind}{'/' + unit if unit else ''}", command, report, options=["--share", str(out)],
-                **more)
+    named = "/".join([kind, *filter(None, [unit, part])])
+    return Step(ring, named, command, report, options=["--share", str(out)], **more)
+
+
+def fault_steps(out):
+    """The sweep, in parts that run side by side."""
+    for number in range(FAULT_SHARDS):
+        yield gtest_step(out, "fault", "fault", BUILD, part=f"{number + 1}of{FAULT_SHARDS}", shown="fault points of ",
+                          environment={"GTEST_TOTAL_SHARDS": str(FAULT_SHARDS), "GTEST_SHARD_INDEX": str(number)})
 
 
 def property_step(out, name, seed, rounds, chosen="*"):
@@ -194,7 +202,7 @@ def all_steps(out):
         yield pytest_step(out, "gates", path, makes="box" if path.stem == "test_bench" else None)
     for kind in UNIT_PROGRAMS:
         yield gtest_step(out, kind, kind, BUILD)
-    yield gtest_step(out, "fault", "fault", BUILD, shown="fault points of ")
+    yield from fault_steps(out)
     yield gtest_step(out, "crash", "crash", BUILD, shown="kill points of ")
     for kind in UNIT_PROGRAMS:
         yield gtest_step(out, "sanitize", kind, BUILD / "sanitize")

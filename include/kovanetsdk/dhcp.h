@@ -91,7 +91,8 @@ int DHCPInterfaceSetEnabled(const char *ifname, int type, int enable);
  * ".info": names that themselves hold "-" or "." are not listed, and of IPv4 "pxe" is when dhcpd-pxe.info exists.
  * @param list_inout  receives a new list when there is at least one; the list it held, if any, is freed then
  * @param type        family
- * @return their number; -1 for bad arguments, no memory or a directory that cannot be searched, *list_inout untouched
+ * @return their number; -1 for bad arguments, no memory for the lists or a directory that cannot be searched,
+ *         *list_inout untouched. A file whose name cannot be taken apart for lack of memory is logged and left out
  */
 int DHCPInterfaceListGet(KLIBSZLIST **list_inout, int type);
 
@@ -114,7 +115,8 @@ int KOVANetSetDhcpServerConfigFiles(const DHCP_TAG_CONF *conf, int enable);
  * @param ifname    interface
  * @param conf_out  receives enabled, start_ip, end_ip, netmask, lease_time, dns1, dns2, router, ifname, domain and tag;
  *                  all else is zero. Partly filled on failure
- * @return 1; 0 for NULL (silent), bad names, no .conf, or one without range, name servers, router or interface
+ * @return 1; 0 for NULL (silent), bad names, no .conf, one without range, name servers, router or interface, or one
+ *         that cannot be read
  */
 int KOVANetGetDhcpServerConf(const char *tag, const char *ifname, DHCP_TAG_CONF *conf_out);
 

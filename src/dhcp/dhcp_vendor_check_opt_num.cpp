@@ -15,6 +15,7 @@ namespace {
 constexpr char kFragment[] = "/etc/dhcpd/dhcpd-vendor.conf";
 constexpr char kPrefix[] = "dhcp-option=vendor:";
 constexpr int kLastNumber = 254;
+constexpr char kUnreadable[] = "Failed to read DHCP vendor config";
 
 // flags of the platform's line operations
 constexpr int kWholeField = 1026;
@@ -110,7 +111,7 @@ int append_options(const char *vendor, const KLIBSZHASH *options, const KLIBSZLI
 
 /** @return 0; -1, logged, when a file that was read to its end was not readable to its end */
 int fail_unless_read(const stream &file) {
-    return ferror(file.get()) == 0 ? 0 : fail_keeping_code(HERE, -1, "Failed to read DHCP vendor config");
+    return ferror(file.get()) == 0 ? 0 : fail_keeping_code(HERE, -1, kUnreadable);
 }
 
 /** Adds the vendor class that a line is about to a list, unless it is there. */
@@ -145,7 +146,7 @@ extern "C" int DHCPVendorGetVendor(const char *vendor, KLIBSZHASH **options) {
     }
     const stream file{fopen(kFragment, "re")};
     if (!file.is_held()) {
-        return fail_keeping_code(HERE, -1, "Failed to read DHCP vendor config");
+        return fail_keeping_code(HERE, -1, kUnreadable);
     }
     const line_text wanted{"%s%s,", kPrefix, shown(vendor)};
     char line[kLineRoom];
@@ -251,7 +252,7 @@ extern "C" int DHCPVendorEnum(KLIBSZLIST **vendors) {
     }
     const stream file{fopen(kFragment, "re")};
     if (!file.is_held()) {
-        return fail_keeping_code(HERE, -1, "Failed to read DHCP vendor config");
+        return fail_keeping_code(HERE, -1, kUnreadable);
     }
     char line[kLineRoom];
     while (next_cut_line(file, line)) {

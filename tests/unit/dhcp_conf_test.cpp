@@ -725,9 +725,12 @@ TEST_F(dhcp_conf, DHCPTagConfGet_v4_whateverMemoryFails_leavesNothing) {
     }
 }
 
-TEST_F(dhcp_conf, DHCPTagConfGet_v4OptionsThatCannotBeRead_areTold) {
+TEST_F(dhcp_conf, DHCPTagConfGet_v4DomainOrOptionsThatCannotBeRead_areTold) {
     write_file(kConf, kFragment);
     // the fragment is opened for name servers, router, domain, and then for the options
+    rig.fail("fopen", 3);
+    EXPECT_OUTCOME(
+        get(), failure({"Failed to get key option:domain-search", "Failed to get DHCP Server config from [eth0, 0]"}));
     rig.fail("fopen", 4);
     EXPECT_OUTCOME(get(), failure({"Failed to open DHCP config [" + kConf + "] for reading",
                                    "Failed to get DHCP Server config from [eth0, 0]"}));

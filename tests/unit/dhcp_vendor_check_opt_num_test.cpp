@@ -142,9 +142,11 @@ TEST_F(dhcp_vendor_check_opt_num, DHCPVendorGetVendor_overlongLine_isCut) {
     EXPECT_EQ((texts{"1=" + long_text(1023 - 26, 'v'), "2=two"}), content());
 }
 
-TEST_F(dhcp_vendor_check_opt_num, DHCPVendorGetVendor_fragmentThatCannotBeOpened_isTold) {
+TEST_F(dhcp_vendor_check_opt_num, DHCPVendorGetVendor_fragmentThatCannotBeRead_isTold) {
     write_file(kFragment, kTwoVendors);
     rig.fail("fopen");
+    EXPECT_OUTCOME(get("MSFT"), {.result = -1, .log = {kUnit + "Failed to read DHCP vendor config"}});
+    rig.redirect(kFragment, "/proc/self/mem"); // opens, and cannot be read at its beginning
     EXPECT_OUTCOME(get("MSFT"), {.result = -1, .log = {kUnit + "Failed to read DHCP vendor config"}});
 }
 
@@ -394,6 +396,9 @@ TEST_F(dhcp_vendor_check_opt_num, DHCPVendorEnum_failures_areTold) {
     write_file(kFragment, kTwoVendors);
     rig.fail("fopen");
     EXPECT_OUTCOME(enumerate(), {.result = -1, .log = {kUnit + "Failed to read DHCP vendor config"}});
+    rig.redirect(kFragment, "/proc/self/mem"); // opens, and cannot be read at its beginning
+    EXPECT_OUTCOME(enumerate(), {.result = -1, .log = {kUnit + "Failed to read DHCP vendor config"}});
+    rig.redirect(kFragment, kFragment);
     rig.fail("KLIBCSzListPush");
     outcome got = enumerate();
     EXPECT_EQ(-1, got.result);
