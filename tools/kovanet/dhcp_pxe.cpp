@@ -1,0 +1,98 @@
+// kovanet dhcp-server pxe: what clients are told that boot from the network.
+#include "dhcp_server.h"
+#include "rules.h"
+
+#include <cstdio>
+#include <kovanetsdk/dhcp.h>
+
+namespace kova {
+namespace {
+
+struct pxe_words {
+    std::string server;
+    std::string file;
+};
+
+constexpr column kColumns[] = {
+    {"state", [](const json &row) { return std::string(row.at("enabled") == true ? "on" : "off"); }},
+    {"boot from", [](const json &row) { return field(row, "mode"); }},
+    {"local file", [](const json &row) { return field(row, "local_file"); }},
+    {"remote server", [](const json &row) { return field(row, "remote_server"); }},
+    {"remote file", [](const json &row) { return field(row, "remote_file"); }},
+};
+
+void show(bool as_json) {
+    const config_lock lock{config_lock::kShared};
+    DHCP_PXE_CONF conf{};
+    clear_error();
+    if (DHCPPXEConfGet(&conf) < 0) {
+        call_failed("cannot read the settings of network boot");
+    }
+    const bool is_set = conf.is_remote_tftp == 1 || conf.local_bootloader[0] != '\0';
+    const json record = {{"enabled", conf.enabled == 1},
+                         {"mode", is_set ? json(conf.is_remote_tftp == 1 ? "remote" : "local") : json()},
+                         {"local_file", known_text(conf.local_bootloader)},
+                         {"remote_server", known_text(conf.remote_tftp_server_ip)},
+                         {"remote_file", known_text(conf.remote_bootloader)}};
+    if (as_json) {
+        print_json(record);
+    } else {
+        print_record(record, kColumns);
+    }
+}
+
+void store(const DHCP_PXE_CONF &conf) {
+    change_server([&conf] {
+        clear_error();
+        if (DHCPPXEConfSet(&conf) < 0) {
+            call_failed("cannot store the settings of network boot");
+        }
+    });
+}
+
+/** @param more  what follows the file in the server's line */
+void require_file(const std::string &file, const std::string &more) {
+    require("file \"" + file + "\"", refuse_server_text(file));
+    require("the name of the file", refuse_server_line("dhcp-boot=tag:pxe," + file + more));
+}
+
+void set_local(const pxe_words &words) {
+    require_file(words.file, "");
+    DHCP_PXE_CONF conf{};
+    conf.enabled = 1;
+    snprintf(conf.local_bootloader, sizeof conf.local_bootloader, "%s", words.file.c_str());
+    store(conf);
+}
+
+void set_remote(const pxe_words &words) {
+    require("server \"" + words.server + "\"", refuse_address(words.server));
+    const std::string server = plain_address(words.server);
+    require_file(words.file, ",bootserver," + server);
+    DHCP_PXE_CONF conf{};
+    conf.enabled = conf.is_remote_tftp = 1;
+    snprintf(conf.remote_bootloader, sizeof conf.remote_bootloader, "%s", words.file.c_str());
+    snprintf(conf.remote_tftp_server_ip, sizeof conf.remote_tftp_server_ip, "%s", server.c_str());
+    store(conf);
+}
+
+} // namespace
+
+void add_pxe_verbs(CLI::App &object, const global_options &options) {
+    auto &words = words_of<pxe_words>();
+    CLI::App &all = *object.add_subcommand("pxe", "clients that boot from the network");
+    all.add_subcommand("show", "where they boot from")->callback([&options] { show(options.json); });
+
+    CLI::App &change = *all.add_subcommand("set", "answer them: they boot from here, or from another server");
+    change.require_subcommand(1);
+    CLI::App &local = add_change(change, "local", "they boot from this machine");
+    local.add_option("FILE", words.file, "name of the boot file")->required();
+    local.callback([&words] { set_local(words); });
+    CLI::App &remote = add_change(change, "remote", "they boot from another server");
+    remote.add_option("SERVER", words.server, "IPv4 address of the server")->required();
+    remote.add_option("FILE", words.file, "name of the boot file there")->required();
+    remote.callback([&words] { set_remote(words); });
+
+    add_change(all, "off", "answer them no more, and keep the settings").callback([] { store({}); });
+}
+
+} // namespace kova
