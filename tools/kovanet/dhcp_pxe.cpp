@@ -9,8 +9,8 @@ namespace kova {
 namespace {
 
 struct pxe_words {
-    std::string server;
-    std::string file;
+    std::string mode;
+    std::vector<std::string> values;
 };
 
 constexpr column kColumns[] = {
@@ -56,23 +56,36 @@ void require_file(const std::string &file, const std::string &more) {
     require("the name of the file", refuse_server_line("dhcp-boot=tag:pxe," + file + more));
 }
 
-void set_local(const pxe_words &words) {
-    require_file(words.file, "");
+void set_local(const std::string &file) {
+    require_file(file, "");
     DHCP_PXE_CONF conf{};
     conf.enabled = 1;
-    snprintf(conf.local_bootloader, sizeof conf.local_bootloader, "%s", words.file.c_str());
+    snprintf(conf.local_bootloader, sizeof conf.local_bootloader, "%s", file.c_str());
     store(conf);
 }
 
-void set_remote(const pxe_words &words) {
-    require("server \"" + words.server + "\"", refuse_address(words.server));
-    const std::string server = plain_address(words.server);
-    require_file(words.file, ",bootserver," + server);
+void set_remote(const std::string &given, const std::string &file) {
+    require("server \"" + given + "\"", refuse_address(given));
+    const std::string server = plain_address(given);
+    require_file(file, ",bootserver," + server);
     DHCP_PXE_CONF conf{};
     conf.enabled = conf.is_remote_tftp = 1;
-    snprintf(conf.remote_bootloader, sizeof conf.remote_bootloader, "%s", words.file.c_str());
+    snprintf(conf.remote_bootloader, sizeof conf.remote_bootloader, "%s", file.c_str());
     snprintf(conf.remote_tftp_server_ip, sizeof conf.remote_tftp_server_ip, "%s", server.c_str());
     store(conf);
+}
+
+void set(const pxe_words &words) {
+    const bool is_local = words.mode == "local";
+    if (words.values.size() != (is_local ? 1 : 2)) {
+        throw failure{kUsage, std::string(is_local ? "local takes FILE" : "remote takes SERVER and FILE") +
+                                  "; see kovanet dhcp-server pxe set --help"};
+    }
+    if (is_local) {
+        set_local(words.values[0]);
+    } else {
+        set_remote(words.values[0], words.values[1]);
+    }
 }
 
 } // namespace
@@ -82,15 +95,13 @@ void add_pxe_verbs(CLI::App &object, const global_options &options) {
     CLI::App &all = *object.add_subcommand("pxe", "clients that boot from the network");
     all.add_subcommand("show", "where they boot from")->callback([&options] { show(options.json); });
 
-    CLI::App &change = *all.add_subcommand("set", "answer them: they boot from here, or from another server");
-    change.require_subcommand(1);
-    CLI::App &local = add_change(change, "local", "they boot from this machine");
-    local.add_option("FILE", words.file, "name of the boot file")->required();
-    local.callback([&words] { set_local(words); });
-    CLI::App &remote = add_change(change, "remote", "they boot from another server");
-    remote.add_option("SERVER", words.server, "IPv4 address of the server")->required();
-    remote.add_option("FILE", words.file, "name of the boot file there")->required();
-    remote.callback([&words] { set_remote(words); });
+    CLI::App &change = add_change(all, "set", "answer them: they boot from here, or from another server");
+    change.add_option("local|remote", words.mode, "this machine, or another server")
+        ->required()
+        ->check(CLI::IsMember({"local", "remote"}));
+    change.add_option("[SERVER] FILE", words.values, "IPv4 address of the other server, and name of the boot file")
+        ->required();
+    change.callback([&words] { set(words); });
 
     add_change(all, "off", "answer them no more, and keep the settings").callback([] { store({}); });
 }

@@ -40,12 +40,18 @@ std::vector<std::string> vendors() {
     return texts_of(list);
 }
 
-/** The options of a vendor class. */
-owned_map options_of(const std::string &vendor) {
+/** The options of a vendor class, nothing when one of them cannot be read. */
+owned_map readable_options(const std::string &vendor) {
     owned_map map = make_map();
     KLIBSZHASH *options = map.get();
     clear_error();
-    if (DHCPVendorGetVendor(vendor.c_str(), &options) < 0) {
+    return DHCPVendorGetVendor(vendor.c_str(), &options) < 0 ? nullptr : std::move(map);
+}
+
+/** The same, ending the program. */
+owned_map options_of(const std::string &vendor) {
+    owned_map map = readable_options(vendor);
+    if (map == nullptr) {
         call_failed("cannot read the options of vendor class " + vendor);
     }
     return map;
@@ -92,7 +98,8 @@ void list(bool as_json) {
     const config_lock lock{config_lock::kShared};
     json rows = json::array();
     for (const std::string &vendor : vendors()) {
-        rows.push_back({{"class", vendor}, {"options", rows_of(options_of(vendor)).size()}});
+        const owned_map map = readable_options(vendor);
+        rows.push_back({{"class", vendor}, {"options", map != nullptr ? json(rows_of(map).size()) : json()}});
     }
     print_rows(rows, kVendors, as_json);
 }
