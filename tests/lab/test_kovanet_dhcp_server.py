@@ -1,4 +1,4 @@
-# box: --link eth0 --link lan0 --link a%b
+# box: --link eth0 --link lan0
 """kovanet dhcp-server, compared with the files below /etc/dhcpd, with the library, and with what the server runs on."""
 
 import contextlib
@@ -126,9 +126,9 @@ def test_status_counts_subnets_and_tells_the_switches():
     assert lines[4].split() == ["eth0", "IPv4", "off", "2"]
 
 
-@pytest.mark.parametrize("name", ["eth0.10", "a-b", "a%b", "a'b", "-x", "ä"])
+@pytest.mark.parametrize("name", ["eth0.10", "a-b", "a'b", "-x", "ä"])
 def test_odd_names_of_interfaces_are_served(name):
-    with interface(name) if name != "a%b" else contextlib.nullcontext():
+    with interface(name):
         server("enable", "--", name)
         server("subnet", "set", "--", name, "0", *RANGE)
         server("option", "set", "--", name, "0", "mtu", "1400")
@@ -573,7 +573,7 @@ BAD = {
     "subnet set eth0 0 6 mode stateful dns 2001:db8::1 range 2001:db8::2 2001:db8:0:1::3": NO,
     "subnet set eth0 0 6 mode stateful dns 2001:db8::1 range 2001:db8::2/64 2001:db8::3": NO,
     "conflict lan0 10.0.0.1 10.0.0.2 255.0.255.0": NO, "conflict lan0 10.0.0.1 host 255.0.0.0": NO,
-    "enable nope": NOT_FOUND, "disable nope": NOT_FOUND, "subnet set nope 0 range 10.0.0.1 10.0.0.2 mask 255.0.0.0 router "
+    "enable nope": NOT_FOUND, "enable a%b": NOT_FOUND, "subnet show a%n 0": NOT_FOUND, "disable nope": NOT_FOUND, "subnet set nope 0 range 10.0.0.1 10.0.0.2 mask 255.0.0.0 router "
     "10.0.0.3": NOT_FOUND, "subnet show eth0 1": NOT_FOUND, "subnet show lan0 0": NOT_FOUND, "subnet show eth0 0 6":
     NOT_FOUND, "subnet off eth0 1": NOT_FOUND, "option list eth0 1": NOT_FOUND, "option set eth0 1 mtu 1400": NOT_FOUND,
     "option del eth0 0 mtu": NOT_FOUND, "vendor show MSFT": NOT_FOUND, "vendor del MSFT": NOT_FOUND,

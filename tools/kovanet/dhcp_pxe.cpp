@@ -4,13 +4,15 @@
 
 #include <cstdio>
 #include <kovanetsdk/dhcp.h>
+#include <optional>
 
 namespace kova {
 namespace {
 
 struct pxe_words {
     std::string mode;
-    std::vector<std::string> values;
+    std::string file_or_server;
+    std::optional<std::string> file;
 };
 
 constexpr column kColumns[] = {
@@ -76,15 +78,15 @@ void set_remote(const std::string &given, const std::string &file) {
 }
 
 void set(const pxe_words &words) {
-    const bool is_local = words.mode == "local";
-    if (words.values.size() != (is_local ? 1 : 2)) {
-        throw failure{kUsage, std::string(is_local ? "local takes FILE" : "remote takes SERVER and FILE") +
+    const bool is_remote = words.mode == "remote";
+    if (words.file.has_value() != is_remote) {
+        throw failure{kUsage, std::string(is_remote ? "remote takes SERVER and FILE" : "local takes FILE alone") +
                                   "; see kovanet dhcp-server pxe set --help"};
     }
-    if (is_local) {
-        set_local(words.values[0]);
+    if (is_remote) {
+        set_remote(words.file_or_server, *words.file);
     } else {
-        set_remote(words.values[0], words.values[1]);
+        set_local(words.file_or_server);
     }
 }
 
@@ -99,8 +101,9 @@ void add_pxe_verbs(CLI::App &object, const global_options &options) {
     change.add_option("local|remote", words.mode, "this machine, or another server")
         ->required()
         ->check(CLI::IsMember({"local", "remote"}));
-    change.add_option("[SERVER] FILE", words.values, "IPv4 address of the other server, and name of the boot file")
+    change.add_option("FILE|SERVER", words.file_or_server, "boot file on this machine, or address of the server")
         ->required();
+    change.add_option("FILE", words.file, "boot file on the server");
     change.callback([&words] { set(words); });
 
     add_change(all, "off", "answer them no more, and keep the settings").callback([] { store({}); });

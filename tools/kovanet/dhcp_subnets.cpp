@@ -371,9 +371,10 @@ void add_subnet_verbs(CLI::App &object, const global_options &options) {
     CLI::App &change = add_change(subnets, "set", "serve a subnet; what is not given stays as it is");
     add_subnet_words(change, words);
     add_family_word(change, words);
-    change.add_option("KEYS", words.keys,
-                      "IPv4: range START END, mask MASK, router ADDRESS, domain NAME, dns ADDRESS..., lease SECONDS; "
-                      "IPv6: mode ra-only|ra-stateless|stateful, range START END, dns ADDRESS..., lease SECONDS");
+    constexpr char kKeys[] =
+        "IPv4: range START END, mask MASK, router ADDRESS, domain NAME, dns ADDRESS..., lease SECONDS; "
+        "IPv6: mode ra-only|ra-stateless|stateful, range START END, dns ADDRESS..., lease SECONDS";
+    change.add_option("KEYS", words.keys, kKeys);
     change.add_flag("--force", words.force, "also when it overlaps a subnet of another interface");
     change.callback([&words] { set(words); });
 
