@@ -1,6 +1,8 @@
 """What the lab tests share. They run as root inside the box: on a private root with the appliance's files in place,
 wired to the network namespace "net", in which the servers and the other hosts live."""
 
+import contextlib
+import json
 import os
 import pathlib
 import re
@@ -14,6 +16,10 @@ import pytest
 
 # programs start much slower in a guest, so everything may take longer there
 SLOWNESS = 5 if "KOVA_GUEST" in os.environ else 1
+KOVANET = "/usr/bin/kovanet"
+DOCUMENT = pathlib.Path(__file__).resolve().parents[2] / "docs" / "kovanet-json.md"
+DONE, NO, USAGE, NOT_FOUND, CALL_FAILED, NO_PERMISSION = range(6)  # kovanet's exit codes
+CONFIG_EXCLUSIVE, CONFIG_NAME = 0x106, 0x100
 OTHER_SIDE = ("ip", "netns", "exec", "net")
 
 
@@ -46,6 +52,53 @@ def run(*command, status=0, **options):
 
 def on_other_side(*command, **options):
     return run(*OTHER_SIDE, *command, **options)
+
+
+def kovanet(*words, status=DONE, **options):
+    done = run(KOVANET, *words, status=status, **options)
+    if status == DONE:
+        assert done.stderr == ""
+    return done
+
+
+def data(*words, **options):
+    """What a command prints with --json: one line."""
+    printed = kovanet(*words, "--json", **options).stdout
+    assert printed.count("\n") == 1 and printed.endswith("\n")
+    return json.loads(printed)
+
+
+def complaint(*words, status):
+    """The line on standard error of a command that fails and prints nothing else."""
+    done = kovanet(*words, status=status)
+    assert done.stdout == ""
+    assert re.fullmatch(r"kovanet: [^\n]+\n", done.stderr), done.stderr
+    return done.stderr.removeprefix("kovanet: ").rstrip("\n")
+
+
+def documented(section):
+    """The fields that the document names in a section."""
+    text = DOCUMENT.read_text().split(f"\n## {section}\n", 1)[1].split("\n## ", 1)[0]
+    fields = re.findall(r"^\| `(\w+)` \|", text, re.MULTILINE)
+    assert fields
+    return fields
+
+
+@contextlib.contextmanager
+def held_configuration_lock():
+    """Another program that is changing the network."""
+    program = ("import ctypes; core = ctypes.CDLL('libkovacore.so.6');"
+               f"print(core.KLIBCFileLock({CONFIG_EXCLUSIVE}, 5), flush=True); input()")
+    other = subprocess.Popen(["/usr/bin/python3", "-c", program], stdin=subprocess.PIPE, stdout=subprocess.PIPE, text=True)
+    try:
+        assert other.stdout.readline() == "0\n"
+        yield
+    finally:
+        other.communicate("\n", timeout=10)
+
+
+def keys_of(path):
+    return dict(line.split("=", 1) for line in path.read_text().splitlines() if "=" in line)
 
 
 class Daemon:

@@ -13,36 +13,13 @@ import subprocess
 import time
 
 import pytest
-from conftest import SLOWNESS, DhcpServer, on_other_side, processes, run, wait_for
+from conftest import (
+    CALL_FAILED, CONFIG_EXCLUSIVE, CONFIG_NAME, DONE, KOVANET, NO, NO_PERMISSION, NOT_FOUND, SLOWNESS, USAGE, DhcpServer,
+    complaint, data, documented, held_configuration_lock, keys_of, kovanet, on_other_side, processes, run, wait_for,
+)  # fmt: skip
 
-KOVANET = "/usr/bin/kovanet"
 SCRIPTS = pathlib.Path("/etc/sysconfig/network-scripts")
 NETWORK = pathlib.Path("/etc/sysconfig/network")
-DOCUMENT = pathlib.Path(__file__).resolve().parents[2] / "docs" / "kovanet-json.md"
-DONE, NO, USAGE, NOT_FOUND, CALL_FAILED, NO_PERMISSION = range(6)
-CONFIG_EXCLUSIVE, CONFIG_NAME = 0x106, 0x100
-
-
-def kovanet(*words, status=DONE, **options):
-    done = run(KOVANET, *words, status=status, **options)
-    if status == DONE:
-        assert done.stderr == ""
-    return done
-
-
-def data(*words, **options):
-    """What a command prints with --json: one line."""
-    printed = kovanet(*words, "--json", **options).stdout
-    assert printed.count("\n") == 1 and printed.endswith("\n")
-    return json.loads(printed)
-
-
-def complaint(*words, status):
-    """The line on standard error of a command that fails and prints nothing else."""
-    done = kovanet(*words, status=status)
-    assert done.stdout == ""
-    assert re.fullmatch(r"kovanet: [^\n]+\n", done.stderr), done.stderr
-    return done.stderr.removeprefix("kovanet: ").rstrip("\n")
 
 
 def ip(*words):
@@ -62,10 +39,6 @@ def interface_file(name):
     return SCRIPTS / f"ifcfg-{name}"
 
 
-def keys_of(path):
-    return dict(line.split("=", 1) for line in path.read_text().splitlines() if "=" in line)
-
-
 def keys(name):
     return keys_of(interface_file(name))
 
@@ -77,27 +50,6 @@ def everything():
     files["network"] = NETWORK.read_text() if NETWORK.exists() else ""
     shown = [run("ip", *words).stdout for words in (["-o", "addr"], ["-o", "link"], ["route"])]
     return os.uname().nodename, shown, files
-
-
-@contextlib.contextmanager
-def held_configuration_lock():
-    """Another program that is changing the network."""
-    program = ("import ctypes; core = ctypes.CDLL('libkovacore.so.6');"
-               f"print(core.KLIBCFileLock({CONFIG_EXCLUSIVE}, 5), flush=True); input()")
-    other = subprocess.Popen(["/usr/bin/python3", "-c", program], stdin=subprocess.PIPE, stdout=subprocess.PIPE, text=True)
-    try:
-        assert other.stdout.readline() == "0\n"
-        yield
-    finally:
-        other.communicate("\n", timeout=10)
-
-
-def documented(section):
-    """The fields that the document names in a section."""
-    text = DOCUMENT.read_text().split(f"\n## {section}\n", 1)[1].split("\n## ", 1)[0]
-    fields = re.findall(r"^\| `(\w+)` \|", text, re.MULTILINE)
-    assert fields
-    return fields
 
 
 @pytest.fixture(autouse=True)

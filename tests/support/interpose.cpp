@@ -789,7 +789,6 @@ const bool others_can_fail[] = {
     can_fail("KLIBPluginSetArgByArray"),
     can_fail("KLIBPluginAction"),
     can_fail("KLIBPluginExit"),
-    can_fail("glob"),
     can_fail("ioctl"),
     can_fail("socket"),
     can_fail("open"),

@@ -1,35 +1,15 @@
 // kovanet dns: the name servers, and where they come from.
 #include "errors.h"
 #include "interfaces.h"
+#include "lists.h"
 #include "objects.h"
 #include "rules.h"
 
 #include <kova/core.h>
 #include <kovanetsdk/dns.h>
-#include <memory>
 
 namespace kova {
 namespace {
-
-struct list_free {
-    void operator()(KLIBSZLIST *list) const { KLIBCSzListFree(list); }
-};
-using owned_list = std::unique_ptr<KLIBSZLIST, list_free>;
-
-owned_list make_list(const std::vector<std::string> &texts = {}) {
-    constexpr int kCapacity = 16;
-    clear_error();
-    KLIBSZLIST *list = KLIBCSzListAlloc(kCapacity);
-    owned_list owned{list};
-    bool is_complete = list != nullptr;
-    for (const std::string &text : texts) {
-        is_complete = is_complete && KLIBCSzListPush(&list, text.c_str()) == 0;
-    }
-    if (!is_complete) {
-        call_failed("cannot make a list of servers");
-    }
-    return owned;
-}
 
 /** The servers that one of the library's readers finds. */
 json servers_of(int (*read)(KLIBSZLIST **), const char *what) {
@@ -39,25 +19,13 @@ json servers_of(int (*read)(KLIBSZLIST **), const char *what) {
     if (read(&list) < 0) {
         call_failed(std::string("cannot read the ") + what);
     }
-    json servers = json::array();
-    for (int i = 0; const char *server = KLIBCSzListGet(list, i); ++i) {
-        servers.push_back(server);
-    }
-    return servers;
-}
-
-std::string joined(const json &row, const char *key) {
-    std::string line;
-    for (const json &server : row[key]) {
-        line += (line.empty() ? "" : " ") + printable(server.get<std::string>());
-    }
-    return line.empty() ? "-" : line;
+    return texts_of(list);
 }
 
 constexpr column kColumns[] = {
     {"mode", [](const json &row) { return field(row, "mode"); }},
-    {"servers", [](const json &row) { return joined(row, "servers"); }},
-    {"configured", [](const json &row) { return joined(row, "configured_servers"); }},
+    {"servers", [](const json &row) { return words_field(row, "servers"); }},
+    {"configured", [](const json &row) { return words_field(row, "configured_servers"); }},
 };
 
 void show(bool as_json) {

@@ -67,9 +67,9 @@ void call_failed(const std::string &what) {
                                             KLIBCErrorGetFile(), found ? known->hint : kSeeLog)};
 }
 
-void require_root() {
+void require_root(const char *what) {
     if (geteuid() != 0) {
-        throw failure{kNoPermission, "changing the network needs root; run it as root or with sudo"};
+        throw failure{kNoPermission, std::string(what) + " needs root; run it as root or with sudo"};
     }
 }
 

@@ -35,7 +35,7 @@ void clear_error();
  * reported it and what to do. */
 [[noreturn]] void call_failed(const std::string &what);
 
-/** Ends the program unless it runs as root. */
-void require_root();
+/** Ends the program unless it runs as root. @param what  what needs it */
+void require_root(const char *what = "changing the network");
 
 } // namespace kova

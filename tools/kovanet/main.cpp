@@ -2,11 +2,11 @@
 #include "errors.h"
 #include "objects.h"
 #include "table.h"
+#include "words.h"
 
 #include <algorithm>
 #include <cstdio>
 #include <cstring>
-#include <numeric>
 #include <string>
 #include <syslog.h>
 #include <vector>
@@ -62,6 +62,18 @@ constexpr object kObjects[] = {
      "  kovanet dns set 192.168.1.1 2001:db8::53\n"
      "  kovanet dns mode auto\n"
      "  kovanet dns update"},
+    {"dhcp-server", "the DHCP and router-advertisement server", add_dhcp_server,
+     "  kovanet dhcp-server status\n"
+     "  kovanet dhcp-server enable eth0\n"
+     "  kovanet dhcp-server subnet list\n"
+     "  kovanet dhcp-server subnet set eth0 0 range 192.168.1.100 192.168.1.200 mask 255.255.255.0 router 192.168.1.1\n"
+     "  kovanet dhcp-server subnet set eth0 0 domain lan.example dns 192.168.1.1 192.168.1.2 lease 86400\n"
+     "  kovanet dhcp-server subnet set eth0 0 6 mode ra-stateless dns 2001:db8::53\n"
+     "  kovanet dhcp-server option set eth0 0 ntp-server 192.168.1.1 192.168.1.2\n"
+     "  kovanet dhcp-server vendor set MSFT 2 1i\n"
+     "  kovanet dhcp-server pxe set remote 192.168.1.5 pxelinux.0\n"
+     "  kovanet dhcp-server conflict eth1 192.168.1.10 192.168.1.20 255.255.255.0\n"
+     "  kovanet dhcp-server test-client eth0"},
     {"hostname", "the name of the appliance", add_hostname,
      "  kovanet hostname show\n"
      "  kovanet hostname set nas01"},
@@ -87,49 +99,47 @@ public:
     }
 };
 
-/** Number of letters to change, add or leave out to get from one word to the other. */
-size_t distance(const std::string &from, const std::string &to) {
-    std::vector<size_t> row(to.size() + 1);
-    std::iota(row.begin(), row.end(), 0U);
-    for (size_t i = 1; i <= from.size(); ++i) {
-        size_t diagonal = std::exchange(row[0], i);
-        for (size_t j = 1; j <= to.size(); ++j) {
-            const size_t changed = diagonal + (from[i - 1] == to[j - 1] ? 0 : 1);
-            diagonal = std::exchange(row[j], std::min({changed, row[j] + 1, row[j - 1] + 1}));
-        }
-    }
-    return row.back();
-}
-
 /** Ends the program unless a word that may have been given is one of the commands below another. */
 void require_known(const char *what, const char *word, const CLI::App &parent) {
-    constexpr size_t kClose = 2;
-    const auto known = parent.get_subcommands([](const CLI::App *) { return true; });
-    const auto is_word = [word](const CLI::App *command) { return command->get_name() == word; };
-    if (word == nullptr || known.empty() || std::any_of(known.begin(), known.end(), is_word)) {
+    std::vector<std::string> known;
+    for (const CLI::App *command : parent.get_subcommands([](const CLI::App *) { return true; })) {
+        known.push_back(command->get_name());
+    }
+    if (word == nullptr || known.empty() || std::find(known.begin(), known.end(), word) != known.end()) {
         return;
     }
-    const auto *const nearest =
-        *std::min_element(known.begin(), known.end(), [word](const auto *one, const auto *other) {
-            return distance(word, one->get_name()) < distance(word, other->get_name());
-        });
-    const std::string &name = nearest->get_name();
-    throw failure{kUsage, std::string(what) + " \"" + word + "\" is not known" +
-                              (distance(word, name) <= kClose ? "; did you mean " + name + "?" : "")};
+    throw failure{kUsage, std::string(what) + " \"" + word + "\" is not known" + suggestion(word, known)};
 }
 
-/** The first words that are no options: the object and the verb. */
+/** The first words that are no options: the object, the verb, and what may be a verb below that. */
 struct command_words {
     const char *object = nullptr;
     const char *verb = nullptr;
+    const char *detail = nullptr;
 };
 
 command_words first_words(int argc, char **argv) {
-    const auto is_word = [](const char *argument) { return argument[0] != '-'; };
+    command_words words;
     char **const end = argv + argc;
-    char **const object = std::find_if(argv + 1, end, is_word);
-    char **const verb = std::find_if(std::min(object + 1, end), end, is_word);
-    return {object != end ? *object : nullptr, verb != end ? *verb : nullptr};
+    char **at = argv;
+    for (const char **word : {&words.object, &words.verb, &words.detail}) {
+        at = std::find_if(std::min(at + 1, end), end, [](const char *argument) { return argument[0] != '-'; });
+        *word = at != end ? *at : nullptr;
+    }
+    return words;
+}
+
+/** The verbs below a verb, for the objects that have them. */
+void require_known_detail(const command_words &words, CLI::App &object) {
+    const auto has_verbs = [](CLI::App *verb) {
+        return !verb->get_subcommands([](CLI::App *) { return true; }).empty();
+    };
+    for (CLI::App *verb : object.get_subcommands(has_verbs)) {
+        verb->require_subcommand(1);
+        if (words.verb != nullptr && verb->get_name() == words.verb) {
+            require_known("verb", words.detail, *verb);
+        }
+    }
 }
 
 void name_groups(CLI::App &app) {
@@ -158,6 +168,7 @@ void describe(CLI::App &app, global_options &options, const command_words &words
             if (each.add != add_stats) { // which has no verbs
                 command.require_subcommand(1);
                 require_known("verb", words.verb, command);
+                require_known_detail(words, command);
             }
         }
     }

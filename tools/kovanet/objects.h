@@ -22,6 +22,7 @@ void add_route(CLI::App &object, const global_options &options);
 void add_stats(CLI::App &object, const global_options &options);
 void add_block(CLI::App &object, const global_options &options);
 void add_dns(CLI::App &object, const global_options &options);
+void add_dhcp_server(CLI::App &object, const global_options &options);
 void add_hostname(CLI::App &object, const global_options &options);
 void add_service(CLI::App &object, const global_options &options);
 void add_check(CLI::App &object, const global_options &options);

@@ -169,6 +169,37 @@ refusal refuse_interface_name(const std::string &name) {
     return std::nullopt;
 }
 
+refusal refuse_server_text(const std::string &text) {
+    if (text.empty()) {
+        return "it is empty";
+    }
+    if (std::any_of(text.begin(), text.end(),
+                    [](char c) { return c != ' ' && is_control(static_cast<unsigned char>(c)); })) {
+        return "it holds a control character";
+    }
+    if (text.find(',') != std::string::npos) {
+        return "it holds \",\", which stands between the values in the server's file";
+    }
+    if (text.find('"') != std::string::npos) {
+        return "it holds a double quote, which means something else in the server's file";
+    }
+    if (text.find(" #") != std::string::npos) {
+        return "it holds \"#\" behind a blank, which begins a comment in the server's file";
+    }
+    if (text.front() == ' ' || text.back() == ' ') {
+        return "it begins or ends with a blank, which the server would drop";
+    }
+    return std::nullopt;
+}
+
+refusal refuse_server_line(const std::string &line) {
+    constexpr size_t kLongest = 1023;
+    if (line.size() <= kLongest) {
+        return std::nullopt;
+    }
+    return textf("it is %zu characters too long for a line of the server's file", line.size() - kLongest);
+}
+
 void require(const std::string &what, const refusal &refused) {
     if (refused) {
         throw failure{kNo, what + " is not valid: " + *refused};

@@ -27,6 +27,10 @@ refusal refuse_domain(const std::string &name);
 /** A name server: an address of either family. */
 refusal refuse_server(const std::string &address);
 refusal refuse_interface_name(const std::string &name);
+/** A text that becomes a field of a line in the DHCP server's files. */
+refusal refuse_server_text(const std::string &text);
+/** A whole line of those files. */
+refusal refuse_server_line(const std::string &line);
 
 /** Ends the program when there is a refusal. */
 void require(const std::string &what, const refusal &refused);

@@ -68,6 +68,14 @@ std::string field(const json &row, const char *key) {
     return printable(found->is_string() ? found->get<std::string>() : found->dump());
 }
 
+std::string words_field(const json &row, const char *key) {
+    std::string line;
+    for (const json &word : row.value(key, json::array())) {
+        line += (line.empty() ? "" : " ") + printable(word.get<std::string>());
+    }
+    return line.empty() ? "-" : line;
+}
+
 int print_table(const json &rows, std::span<const column> columns) {
     std::vector<std::vector<std::string>> lines(1);
     for (const column &one : columns) {

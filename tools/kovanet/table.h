@@ -23,6 +23,9 @@ struct column {
 /** A field as a table shows it, "-" when it is null or absent. */
 std::string field(const json &row, const char *key);
 
+/** The same of a field that is an array of texts, with blanks between them. */
+std::string words_field(const json &row, const char *key);
+
 /** Rows as an aligned table with a header line; returns the number of lines. */
 int print_table(const json &rows, std::span<const column> columns);
 /** One record as "title: text" lines. */
