@@ -1,12 +1,15 @@
 #!/usr/bin/env python3
 """Runs the rings of the proof and adds up their results.
 
-usage: ./test [--list] [--refresh] [NAME...]
+usage: ./test [--list] [--refresh] [--backend box|guest] [NAME...]
 
-A NAME is a ring (unit, platform, property, fault, crash, sanitize, valgrind, coverage, lab, gates), a test file
+A NAME is a ring (unit, platform, property, fault, crash, sanitize, valgrind, coverage, lab, guest, gates), a test file
 (test_jobs, test_abi), a source unit (net_set_ip), or dhcp-fuzz, which tries 10000 random DHCP subnets with another seed
 each time; without a name everything runs. KOVA_SEED and KOVA_ROUNDS say what the random tests try. The last line counts
 the test cases.
+
+A lab test names in a line "# needs:" what its kernel has to have. It runs in the box where this machine's kernel has that,
+otherwise in the guest (ring guest); where boxes are refused everything runs in the guest.
 """
 import argparse
 import concurrent.futures
@@ -20,36 +23,68 @@ import tempfile
 import time
 import xml.etree.ElementTree as xml
 
+from backends import BOX, KERNEL_PARTS, in_backend, refusal, shortcoming
+
 ROOT = pathlib.Path(__file__).resolve().parent.parent
 BUILD = ROOT / "build"
-BOX = BUILD / "lab" / "kova-box"
 PYTHON = "/usr/bin/python3"
 UNIT_PROGRAMS = {"unit": "tests/kovanet-unit-tests", "platform": "tests/platform/kova-platform-tests"}
 PROGRAMS = {**UNIT_PROGRAMS, "fault": "tests/kovanet-fault-tests", "crash": "tests/crash/kova-crash-tests"}
 COUNTED = [kind for kind in PROGRAMS if kind != "crash"]  # whose lines count as tested; the killed count nothing
+BUILT_ANEW = {"sanitize", "coverage"}  # rings that need the libraries once more, in a way of their own
+FAULT_SHARDS = 2  # processes that share the sweep: it mostly waits for its own processes
 SLOWEST = 1800  # seconds for one step, on a machine that has much else to do
+
+
+OF_THE_LAB_ITSELF = {"test_box": ("lab", "box"), "test_guest": ("guest", "guest")}  # file -> ring, what it makes itself
+NOT_IN_GUEST = {"sanitize": "sanitizers do not run on its kernel", "valgrind": "valgrind does not run on its kernel"}
 
 
 class Step:
     """
-    One test program in one box (or on the host), whose results come as a JUnit file. Lines of its output that begin
+    One test program in one backend (or on the host), whose results come as a JUnit file. Lines of its output that begin
     with the text "shown" are measurements, to be seen also when all is well. One that is "last" judges what the others
     have left.
     """
 
-    note = ""  # what else names the run
-
-    def __init__(self, ring, name, command, report, environment=None, shown=None, last=False):
-        self.ring, self.name, self.command, self.report, self.shown = ring, name, command, report, shown
+    def __init__(self, ring, name, command, report, environment=None, options=None, needs=frozenset(), makes=None,
+                 shown=None, last=False, note=""):
+        self.ring, self.name, self.command, self.report = ring, name, command, report
         self.environment = {**os.environ, **(environment or {})}
-        self.last = last
+        self.options, self.needs = options, needs  # of the box; None on the host
+        self.makes = makes  # the backend that the tests start themselves
+        self.shown, self.last, self.note = shown, last, note
+        self.backend, self.reasons, self.seconds = None, [], 0.0
+        self.passed = self.failed = self.skipped = 0
+
+    def place(self, backends):
+        """Chooses the first backend that has what the step needs."""
+        if self.options is None:
+            if self.makes and refusal(self.makes):
+                self.skip(f"{self.makes}: {refusal(self.makes)}")
+            return
+        refused = []
+        for backend in backends:
+            reason = NOT_IN_GUEST.get(self.ring) if backend == "guest" else None
+            reason = reason or shortcoming(backend, self.needs)
+            if not reason:
+                self.backend = backend
+                self.command = in_backend(backend, [*self.options, "--limit", str(SLOWEST)], self.command)
+                return
+            refused.append(f"{backend}: {reason}")
+        self.skip("; ".join(refused))
+
+    def skip(self, reason):
+        self.skipped, self.reasons = 1, [f"{self.name}: {reason}"]
 
     def run(self):
+        if self.skipped:
+            return self
         begin = time.monotonic()
         try:
             done = subprocess.run(self.command, cwd=ROOT, env=self.environment, stdin=subprocess.DEVNULL,
                                   stdout=subprocess.PIPE, stderr=subprocess.STDOUT, text=True, errors="replace",
-                                  timeout=SLOWEST)
+                                  timeout=SLOWEST + 60)  # a box ends by itself before
             self.output, self.status = done.stdout, done.returncode
         except subprocess.TimeoutExpired as late:
             self.output = (late.stdout or b"").decode(errors="replace") + f"\nstill running after {SLOWEST} s\n"
@@ -59,8 +94,6 @@ class Step:
         return self
 
     def count(self):
-        self.passed = self.failed = self.skipped = 0
-        self.reasons = []
         try:
             suites = xml.parse(self.report).getroot()
         except (OSError, xml.ParseError):
@@ -82,18 +115,21 @@ class Step:
             self.failed = 1  # a step without a test proves nothing
 
 
-def boxed(out, options, command):
-    """A command inside the box, which may write to the directory of results."""
-    return [str(BOX), "--share", str(out), *options, "--", *command]
-
-
-def gtest_step(out, ring, kind, build, unit=None, wrapper=(), without=(), **more):
+def gtest_step(out, ring, kind, build, unit=None, part=None, wrapper=(), without=(), **more):
     program = build / PROGRAMS[kind]
-    report = out / f"{ring}-{kind}-{unit or 'all'}.xml"
+    report = out / f"{ring}-{kind}-{unit or part or 'all'}.xml"
     chosen = f"{unit}.*" if unit else "*"
     command = [*wrapper, str(program), f"--gtest_output=xml:{report}", "--gtest_brief=1",
                f"--gtest_filter={chosen}{'-' + ':'.join(without) if without else ''}"]
-    return Step(ring, f"{kind}{'/' + unit if unit else ''}", boxed(out, [], command), report, **more)
+    named = "/".join([kind, *filter(None, [unit, part])])
+    return Step(ring, named, command, report, options=["--share", str(out)], **more)
+
+
+def fault_steps(out):
+    """The sweep, in parts that run side by side."""
+    for number in range(FAULT_SHARDS):
+        yield gtest_step(out, "fault", "fault", BUILD, part=f"{number + 1}of{FAULT_SHARDS}", shown="fault points of ",
+                          environment={"GTEST_TOTAL_SHARDS": str(FAULT_SHARDS), "GTEST_SHARD_INDEX": str(number)})
 
 
 def property_step(out, name, seed, rounds, chosen="*"):
@@ -102,9 +138,8 @@ def property_step(out, name, seed, rounds, chosen="*"):
                f"--gtest_filter={chosen}"]
     settings = {"KOVA_SEED": os.environ.get("KOVA_SEED", str(seed)),
                 "KOVA_ROUNDS": os.environ.get("KOVA_ROUNDS", str(rounds))}
-    step = Step("property", name, boxed(out, [], command), report, settings)
-    step.note = " ".join(f"{name}={value}" for name, value in settings.items())
-    return step
+    note = " ".join(f"{name}={value}" for name, value in settings.items())
+    return Step("property", name, command, report, settings, options=["--share", str(out)], note=note)
 
 
 def record_fault_points():
@@ -119,19 +154,35 @@ def units_of(kind):
     return sorted(path.name.removesuffix("_test.cpp") for path in folder.glob("*_test.cpp"))
 
 
-def box_options(path):
-    """What a lab test asks of the box, from its first line: "# box: --link lan0"."""
-    first = path.read_text().splitlines()[0]
-    return first.removeprefix("# box:").split() if first.startswith("# box:") else []
+def header(path, key):
+    """The words of a test file's line "# KEY: ...", among the comments it begins with."""
+    for line in path.read_text().splitlines():
+        if not line.startswith("#"):
+            break
+        if line.startswith(f"# {key}:"):
+            return line.partition(":")[2].split()
+    return []
 
 
-def pytest_step(out, ring, path, inside_box, options=(), environment=None, **more):
+def needs_of(path):
+    needs = frozenset(header(path, "needs"))
+    if unknown := needs - KERNEL_PARTS.keys():
+        sys.exit(f"{path}: no part of a kernel that is known here: {' '.join(sorted(unknown))}")
+    return needs
+
+
+def pytest_step(out, ring, path, in_appliance=False, makes=None, options=(), environment=None, **more):
+    """A file of tests, on the host, or in an appliance that has what its "# box:" and "# needs:" lines ask for."""
     report = out / f"{path.stem}.xml"
     command = [PYTHON, "-B", "-m", "pytest", "-q", "-p", "no:cacheprovider", *options, f"--junitxml={report}", str(path)]
     environment = {"KOVA_BUILD": str(BUILD), "KOVA_BOX_PROGRAM": str(BOX), **(environment or {})}
-    if inside_box:
-        command = boxed(out, ["--tree", str(BUILD / "stage"), *box_options(path)], command)
-    return Step(ring, path.stem, command, report, environment, **more)
+    if not in_appliance:
+        return Step(ring, path.stem, command, report, environment, makes=makes, **more)
+    place = ["--share", str(out), "--tree", str(BUILD / "stage"), *header(path, "box")]
+    needs = needs_of(path)
+    if needs and shortcoming("box", needs):
+        ring = "guest"
+    return Step(ring, path.stem, command, report, environment, place, needs, **more)
 
 
 def coverage_steps(out):
@@ -142,16 +193,16 @@ def coverage_steps(out):
                  "LD_PRELOAD": str(counting / "tests" / "coverage" / "libkova-leave.so")}
     for kind in COUNTED:
         yield gtest_step(out, "coverage", kind, BUILD, environment={**counts, **preloaded})
-    yield pytest_step(out, "coverage", ROOT / "tests" / "coverage" / "test_coverage.py", inside_box=False,
-                      options=["--capture=no"], environment=counts, shown="coverage of ", last=True)
+    yield pytest_step(out, "coverage", ROOT / "tests" / "coverage" / "test_coverage.py", options=["--capture=no"],
+                      environment=counts, shown="coverage of ", last=True)
 
 
 def all_steps(out):
     for path in sorted((ROOT / "tests" / "gates").glob("test_*.py")):
-        yield pytest_step(out, "gates", path, inside_box=False)
+        yield pytest_step(out, "gates", path, makes="box" if path.stem == "test_bench" else None)
     for kind in UNIT_PROGRAMS:
         yield gtest_step(out, kind, kind, BUILD)
-    yield gtest_step(out, "fault", "fault", BUILD, shown="fault points of ")
+    yield from fault_steps(out)
     yield gtest_step(out, "crash", "crash", BUILD, shown="kill points of ")
     for kind in UNIT_PROGRAMS:
         yield gtest_step(out, "sanitize", kind, BUILD / "sanitize")
@@ -160,7 +211,8 @@ def all_steps(out):
     yield from coverage_steps(out)
     yield property_step(out, "random", seed=1, rounds=500)
     for path in sorted((ROOT / "tests" / "lab").glob("test_*.py")):
-        yield pytest_step(out, "lab", path, inside_box=path.name != "test_box.py")
+        ring, makes = OF_THE_LAB_ITSELF.get(path.stem, ("lab", None))
+        yield pytest_step(out, ring, path, in_appliance=makes is None, makes=makes)
 
 
 VALGRIND = ["valgrind", "--quiet", "--error-exitcode=9", "--leak-check=full", "--errors-for-leak-kinds=definite",
@@ -198,23 +250,26 @@ def chosen_steps(out, names):
 def show(step):
     counts = f"{step.passed} passed" + (f", {step.failed} failed" if step.failed else "") \
         + (f", {step.skipped} skipped" if step.skipped else "")
-    line = f"{'FAILED' if step.failed else 'ok':7}{step.ring}/{step.name}: {counts} ({step.seconds:.1f} s) {step.note}"
+    place = ", in the guest" if step.backend == "guest" else ""
+    verdict = "FAILED" if step.failed else "ok" if step.passed else "-"
+    line = f"{verdict:7}{step.ring}/{step.name}: {counts} ({step.seconds:.1f} s{place}) {step.note}"
     print(line.rstrip(), flush=True)
     for reason in step.reasons:
         print(f"       skipped {reason}")
     if step.failed:
         print(step.output, flush=True)
-    elif step.shown:
+    elif step.shown and step.passed:
         print("".join(f"       {line}\n" for line in step.output.splitlines() if line.startswith(step.shown)), end="",
               flush=True)
 
 
 def main():
     parser = argparse.ArgumentParser(prog="./test", description=__doc__.split("\n\n")[0],
-                                     epilog=__doc__.split("\n\n")[2])
+                                     epilog="\n\n".join(__doc__.split("\n\n")[2:]))
     parser.add_argument("names", nargs="*", metavar="NAME")
     parser.add_argument("--list", action="store_true", help="print the names")
     parser.add_argument("--refresh", action="store_true", help="with fault: record the points that are met now")
+    parser.add_argument("--backend", choices=["box", "guest"], help="run there what runs in an appliance")
     asked = parser.parse_args()
     if asked.refresh:
         record_fault_points()
@@ -226,6 +281,12 @@ def main():
             print("dhcp-fuzz")
             print("units:", *units_of("unit"), *units_of("platform"))
             return 0
+        if not asked.backend and any(step.options is not None for step in steps) and refusal("box"):
+            print(f"no boxes here ({refusal('box')}): the guest is taken for everything")
+        for step in steps:
+            step.place([asked.backend] if asked.backend else ["box", "guest"])
+        for ring in sorted({step.ring for step in steps if not step.skipped} & BUILT_ANEW):
+            subprocess.run([ROOT / "lab" / "build", f"--{ring}"], check=True)
         for now in ([step for step in steps if not step.last], [step for step in steps if step.last]):
             with concurrent.futures.ThreadPoolExecutor(max_workers=os.cpu_count()) as pool:
                 for future in concurrent.futures.as_completed([pool.submit(step.run) for step in now]):
@@ -234,7 +295,7 @@ def main():
         shutil.rmtree(out, ignore_errors=True)
     passed, failed, skipped = (sum(getattr(step, field) for step in steps) for field in ("passed", "failed", "skipped"))
     print(f"{passed} passed, {failed} failed, {skipped} skipped")
-    lab_skipped = any(step.skipped for step in steps if step.ring == "lab")
+    lab_skipped = any(step.skipped for step in steps if step.ring in ("lab", "guest"))
     return 1 if failed or (os.environ.get("CI") and lab_skipped) else 0
 
 

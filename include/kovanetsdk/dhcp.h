@@ -8,7 +8,7 @@
  * fails, sets no code of its own (that of a platform call may stay in the register) and does not restart the server.
  *
  * Interface names go into paths: one that is "." or "..", that is longer than 235 bytes, or that holds "/", a blank or
- * a control character is refused, with 0xD00 unless said otherwise. `type` is the family: 0 IPv4, 1 IPv6.
+ * a control character, or is empty, is refused, with 0xD00 unless said otherwise. `type` is the family: 0 IPv4, 1 IPv6.
  */
 #ifndef KOVANETSDK_DHCP_H
 #define KOVANETSDK_DHCP_H
@@ -91,7 +91,8 @@ int DHCPInterfaceSetEnabled(const char *ifname, int type, int enable);
  * ".info": names that themselves hold "-" or "." are not listed, and of IPv4 "pxe" is when dhcpd-pxe.info exists.
  * @param list_inout  receives a new list when there is at least one; the list it held, if any, is freed then
  * @param type        family
- * @return their number; -1 for bad arguments, no memory or a directory that cannot be searched, *list_inout untouched
+ * @return their number; -1 for bad arguments, no memory for the lists or a directory that cannot be searched,
+ *         *list_inout untouched. A file whose name cannot be taken apart for lack of memory is logged and left out
  */
 int DHCPInterfaceListGet(KLIBSZLIST **list_inout, int type);
 
@@ -102,9 +103,9 @@ int DHCPInterfaceListGet(KLIBSZLIST **list_inout, int type);
  * range, router, search domain (unless "") and name servers; makes the directory by /bin/mkdir -p.
  * @param conf    the subnet: ifname, tag, and when on start_ip, end_ip, netmask, lease_time, router, domain, dns1, dns2
  * @param enable  not 0: on; 0: off, .conf stays as it is
- * @return 1; 0 when nothing was written for a bad record (NULL, names as above, a text without its end or with a
- * control character, "," in a name or the range, a domain that makes its line longer than 1023 bytes), or when
- * directory or a file cannot be made: .info may be written already then
+ * @return 1; 0, without a code, when nothing was written for a bad record (NULL, names as above, a text without its end
+ * or with a control character, "," in a name or the range, a domain that makes its line longer than 1023 bytes), or
+ * when directory or a file cannot be made: .info may be written already then
  */
 int KOVANetSetDhcpServerConfigFiles(const DHCP_TAG_CONF *conf, int enable);
 /**
@@ -114,7 +115,8 @@ int KOVANetSetDhcpServerConfigFiles(const DHCP_TAG_CONF *conf, int enable);
  * @param ifname    interface
  * @param conf_out  receives enabled, start_ip, end_ip, netmask, lease_time, dns1, dns2, router, ifname, domain and tag;
  *                  all else is zero. Partly filled on failure
- * @return 1; 0 for NULL (silent), bad names, no .conf, or one without range, name servers, router or interface
+ * @return 1; 0 for NULL (silent), bad names, no .conf, one without range, name servers, router or interface, or one
+ *         that cannot be read
  */
 int KOVANetGetDhcpServerConf(const char *tag, const char *ifname, DHCP_TAG_CONF *conf_out);
 

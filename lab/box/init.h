@@ -9,6 +9,7 @@
 namespace kova {
 
 // Exit statuses of kova-box itself.
+constexpr int kTookTooLong = 124;
 constexpr int kNoBox = 125;
 constexpr int kCannotExecute = 126;
 constexpr int kNotFound = 127;

@@ -1,4 +1,6 @@
 // kova-box: runs a command in a throw-away appliance of namespaces and memory over the system it is started on.
+#include "guest.h"
+#include "guest_init.h"
 #include "init.h"
 #include "supervisor.h"
 
@@ -9,6 +11,7 @@
 #include <cstring>
 #include <fstream>
 #include <iterator>
+#include <unistd.h>
 
 namespace {
 
@@ -57,6 +60,15 @@ void parse(CLI::App &app, int argc, char **argv, kova::box_options &options) {
         ->take_all()
         ->check(refuse_link_name);
     app.add_flag("--no-network", no_network, "loopback only");
+    app.add_flag("--guest", options.guest, "on a kernel of its own, which has every kind of interface");
+    app.add_option("--kernel", options.kernel, "kernel of the guest")->type_name("FILE")->capture_default_str();
+    app.add_option("--boot-limit", options.boot_limit, "time for the guest to become ready")
+        ->type_name("SECONDS")
+        ->check(CLI::Range(1, 3600))
+        ->capture_default_str();
+    app.add_option("--limit", options.limit, "time for the command; after it, it is ended and the status is 124")
+        ->type_name("SECONDS")
+        ->check(CLI::Range(1, 1000000));
     app.add_option("--size", options.size, "limit of what can be written inside")
         ->check(refuse_size)
         ->capture_default_str();
@@ -93,13 +105,16 @@ int run(int argc, char **argv) {
     } catch (const CLI::Success &help) {
         return app.exit(help);
     }
-    return kova::run_box(options);
+    return options.guest ? kova::run_guest(options, {argv, argv + argc}) : kova::run_box(options);
 }
 
 } // namespace
 
 int main(int argc, char **argv) {
     try {
+        if (getpid() == 1 && argc > 1 && strcmp(argv[1], kova::kGuestInit) == 0) {
+            kova::guest_init();
+        }
         return run(argc, argv);
     } catch (const std::exception &error) {
         fprintf(stderr, "kova-box: %s\n", error.what());

@@ -17,6 +17,10 @@ struct box_options {
     std::optional<std::string> ovs_bonds;  // text of /sys/class/net/kova_ovs_bonds
     std::optional<int> internal_lan_ports; // number in /proc/sys/kernel/kova_internal_netif_num
     bool network = true;                   // false: loopback only, no other side
+    bool guest = false;                    // on a kernel of its own
+    std::string kernel = "/usr/bin/linux.uml";
+    unsigned boot_limit = 60; // seconds for the guest to become ready
+    unsigned limit = 0;       // seconds for the command, 0 for any time
     std::vector<std::string> command;
 };
 

@@ -7,6 +7,7 @@
 #include <array>
 #include <cerrno>
 #include <csignal>
+#include <cstdio>
 #include <poll.h>
 #include <sched.h>
 #include <stdexcept>
@@ -56,8 +57,8 @@ void end_by(int ending_signal) {
 
 class supervisor {
 public:
-    supervisor(pid_t box, unique_fd channel, unique_fd signals, terminal_use use)
-        : box_(box), channel_(std::move(channel)), signals_(std::move(signals)), use_(use) {}
+    supervisor(pid_t box, int ending, unique_fd channel, unique_fd signals, terminal_use use)
+        : box_(box), ending_(ending), channel_(std::move(channel)), signals_(std::move(signals)), use_(use) {}
 
     // Waits for the end of the box. Returns its exit status.
     int wait();
@@ -66,13 +67,14 @@ private:
     void on_signal();
     void on_message();
     void take_terminal_back();
-    void end_box() { kill(box_, SIGKILL); }
+    void end_box() { kill(box_, ending_); }
 
     pid_t box_;
+    int ending_;
     unique_fd channel_;
     unique_fd signals_;
     terminal_use use_;
-    int ended_by_ = 0; // signal that kova-box was told to end by
+    int ended_by_ = 0; // signal that kova-box was told to end by, SIGALRM at the end of the command's time
 };
 
 void supervisor::take_terminal_back() {
@@ -123,6 +125,10 @@ int supervisor::wait() {
     }
     take_terminal_back();
     require(ended == box_, "cannot wait for the box");
+    if (ended_by_ == SIGALRM) {
+        fputs("kova-box: the command took too long\n", stderr);
+        return kTookTooLong;
+    }
     if (ended_by_ != 0) {
         end_by(ended_by_);
     }
@@ -134,6 +140,7 @@ unique_fd open_signals() {
     sigset_t signals;
     sigemptyset(&signals);
     sigaddset(&signals, SIGCHLD);
+    sigaddset(&signals, SIGALRM);
     for (const int ending : kEndingSignals) {
         sigaddset(&signals, ending);
     }
@@ -145,7 +152,7 @@ unique_fd open_signals() {
 
 } // namespace
 
-int run_box(const box_options &options) {
+int supervise(const std::function<int(terminal_use use, const unique_fd &channel)> &work, int ending) {
     const terminal_use use = terminal_of_caller();
     unique_fd signals = open_signals();
     signal(SIGTTOU, SIG_IGN); // the terminal is given and taken by a process that does not own it
@@ -155,15 +162,21 @@ int run_box(const box_options &options) {
     unique_fd outside{ends[0]};
     unique_fd inside{ends[1]};
 
-    const bool mapped = enter_pid_namespace();
     const pid_t box = fork();
-    require(box >= 0, "cannot make a process in a new PID namespace");
+    require(box >= 0, "cannot make a process");
     if (box == 0) {
         outside = unique_fd{};
-        _exit(box_init(options, mapped, use, inside));
+        _exit(work(use, inside));
     }
     inside = unique_fd{};
-    return supervisor(box, std::move(outside), std::move(signals), use).wait();
+    return supervisor(box, ending, std::move(outside), std::move(signals), use).wait();
+}
+
+int run_box(const box_options &options) {
+    const bool mapped = enter_pid_namespace();
+    alarm(options.limit);
+    return supervise(
+        [&](terminal_use use, const unique_fd &channel) { return box_init(options, mapped, use, channel); }, SIGKILL);
 }
 
 } // namespace kova

@@ -1,6 +1,7 @@
 #include "core/file_backup.h"
 
 #include "core/guards.h"
+#include "core/replacement_file.h"
 
 #include <cstring>
 #include <ctime>
@@ -19,13 +20,6 @@ void complete_copy(const char *from, const char *to) {
         fchmod(copy.get(), status.st_mode & 07777);
     }
     fsync(copy.get());
-}
-
-/** A rename is on the disk when its directory is. */
-void sync_directory_of(const char *path) {
-    const path_text name{"%.*s", static_cast<int>(strrchr(path, '/') - path), path};
-    const descriptor directory{open(name.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC)};
-    fsync(directory.get());
 }
 
 } // namespace

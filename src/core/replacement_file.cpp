@@ -1,23 +1,20 @@
 #include "core/replacement_file.h"
 
+#include "core/text.h"
+
 #include <cstring>
 #include <fcntl.h>
 #include <sys/stat.h>
 
 namespace kova {
 
-namespace {
-
-/** A rename is on the disk when its directory is. Cuts the path off behind its last slash. */
-void sync_directory_of(char *path) {
-    strrchr(path, '/')[1] = '\0';
-    const descriptor directory{open(path, O_RDONLY | O_DIRECTORY | O_CLOEXEC)};
+void sync_directory_of(const char *path) {
+    const path_text name{"%.*s", static_cast<int>(strrchr(path, '/') + 1 - path), path};
+    const descriptor directory{open(name.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC)};
     if (directory.is_held()) {
         fsync(directory.get());
     }
 }
-
-} // namespace
 
 replacement_file::replacement_file(const char *target) : target_(target) {
     const int length = snprintf(path_, sizeof path_, "%s.XXXXXX", target);
@@ -46,7 +43,7 @@ bool replacement_file::replace() {
     if (is_temporary_) {
         return false;
     }
-    sync_directory_of(path_);
+    sync_directory_of(target_);
     return true;
 }
 

@@ -32,4 +32,10 @@ private:
     bool is_temporary_ = false;
 };
 
+/**
+ * Brings what was renamed to a path to the disk, as far as the file system of its directory can. The file is in its
+ * place whatever comes of it.
+ */
+void sync_directory_of(const char *path);
+
 } // namespace kova

@@ -6,47 +6,36 @@
 #include "dhcp/dhcpd_files.h"
 
 #include <cstring>
-#include <glob.h>
 
 using namespace kova;
 
 namespace {
 
-/** The paths that match a pattern, sorted. */
-class matches {
-public:
-    explicit matches(const path_text &pattern) : result_(glob(pattern.c_str(), 0, nullptr, &found_)) {}
-    matches(const matches &) = delete;
-    matches &operator=(const matches &) = delete;
-    ~matches() { globfree(&found_); }
-    /** 0, GLOB_NOMATCH, or what went wrong. */
-    [[nodiscard]] int result() const { return result_; }
-    [[nodiscard]] size_t count() const { return found_.gl_pathc; }
-    [[nodiscard]] const char *operator[](size_t index) const { return found_.gl_pathv[index]; }
+/** Whether a file's name is "<prefix><anything>.info"; the prefix is known to be there. */
+bool is_info_file(const char *name, const char *prefix) {
+    constexpr char kEnding[] = ".info";
+    const size_t length = strlen(name);
+    return length >= strlen(prefix) + strlen(kEnding) && strcmp(name + length - strlen(kEnding), kEnding) == 0;
+}
 
-private:
-    glob_t found_{};
-    int result_;
-};
-
-/** The name in "<prefix>-<name>.info", cut out of the path; NULL when the path has another form. */
-const char *cut_out_name(char *path) {
+/** The name in "<prefix>-<name>.info", cut out of the file's; NULL when that has another form. */
+const char *cut_out_name(char *file) {
     constexpr char kDelimiters[] = "-.";
     char *rest = nullptr;
-    KLIBCStrTok(path, kDelimiters, &rest);
+    KLIBCStrTok(file, kDelimiters, &rest);
     const char *const name = KLIBCStrTok(nullptr, kDelimiters, &rest);
     const char *const ending = KLIBCStrTok(nullptr, kDelimiters, &rest);
     return ending != nullptr && strcmp(ending, "info") == 0 ? name : nullptr;
 }
 
-/** @return 1 when the path gave a name, 0 when not, -1 when memory ran out */
-int push_name(KLIBSZLIST *list, const char *path) {
-    const size_t size = strlen(path) + 1;
+/** @return 1 when the file gave a name, 0 when not, -1 when the list cannot take it */
+int push_name(KLIBSZLIST *list, const char *file) {
+    const size_t size = strlen(file) + 1;
     const heap<char> copy{static_cast<char *>(calloc(1, size))};
     if (copy == nullptr) {
         return fail_keeping_code(HERE, 0, "calloc() failed");
     }
-    memcpy(copy.get(), path, size);
+    memcpy(copy.get(), file, size);
     const char *const name = cut_out_name(copy.get());
     if (name == nullptr) {
         return 0;
@@ -55,6 +44,26 @@ int push_name(KLIBSZLIST *list, const char *path) {
         return fail_keeping_code(HERE, -1, "Failed to push [%s] into interface list", name);
     }
     return 1;
+}
+
+/**
+ * Lists the names that the info files of a family give. Not by the C library's pattern search, which frees memory twice
+ * when it runs out of it. @return their number; -1, logged
+ */
+int collect_names(const char *prefix, KLIBSZLIST *files, KLIBSZLIST *names) {
+    constexpr int kAnyType = 64;
+    if (KLIBCFileEnumDir(kDhcpdDir, files, prefix, kAnyType) < 0) {
+        return fail_keeping_code(HERE, -1, "glob() error");
+    }
+    int count = 0;
+    for (int i = 0; const char *file = KLIBCSzListGet(files, i); ++i) {
+        const int pushed = is_info_file(file, prefix) ? push_name(names, file) : 0;
+        if (pushed < 0) {
+            return -1;
+        }
+        count += pushed;
+    }
+    return count;
 }
 
 } // namespace
@@ -66,25 +75,15 @@ extern "C" int DHCPInterfaceListGet(KLIBSZLIST **list_inout, int type) {
     if (!is_dhcp_type(type)) {
         return fail_keeping_code(HERE, -1, "Wrong DHCPD ip type");
     }
-    const matches found{path_text{"%s-*.info", type == kTypeV4 ? kDhcpdV4 : kDhcpdV6}};
-    if (found.result() == GLOB_NOMATCH) {
+    if (KLIBCFileCheckDir(kDhcpdDir) == 0) {
         return 0;
     }
-    if (found.result() != 0) {
-        return fail_keeping_code(HERE, -1, "glob() error");
-    }
+    const string_list files = make_list();
     string_list names = make_list();
-    if (!names.is_held()) {
+    if (!files.is_held() || !names.is_held()) {
         return fail_keeping_code(HERE, -1, "Allocate interface list failed");
     }
-    int count = 0;
-    for (size_t i = 0; i < found.count(); ++i) {
-        const int pushed = push_name(names.get(), found[i]);
-        if (pushed < 0) {
-            return -1;
-        }
-        count += pushed;
-    }
+    const int count = collect_names(type == kTypeV4 ? "dhcpd-" : "dhcpd6-", files.get(), names.get());
     if (count > 0) {
         const string_list old{*list_inout};
         *list_inout = names.give_up();

@@ -90,7 +90,7 @@ bool is_route_destination(const char *item, int index) {
 bool is_item(option_rule rule, char *item, int index) {
     const bool is_second = index % 2 == 1;
     if (rule == option_rule::routes) {
-        return is_second ? is_route_address(item, item, index) : *item != '\0' && is_route_destination(item, index);
+        return *item != '\0' && (is_second ? is_route_address(item, item, index) : is_route_destination(item, index));
     }
     return rule == option_rule::addresses_and_masks && is_second ? is_mask_item(item, index)
                                                                  : is_address_item(item, index);

@@ -111,7 +111,7 @@ int read_options(const place &at, const char *path, option_list &options) {
             return fail_keeping_code(at, -1, "Failed to get dhcp options from [%s]", path);
         }
     }
-    return 0;
+    return ferror(file.get()) == 0 ? 0 : fail_keeping_code(at, -1, "Failed to get dhcp options from [%s]", path);
 }
 
 } // namespace kova

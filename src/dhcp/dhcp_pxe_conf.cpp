@@ -37,7 +37,12 @@ template<size_t Size> bool read_loader(const char *key, char (&value)[Size]) {
 }
 
 bool read_boot_settings(DHCP_PXE_CONF &conf) {
-    conf.is_remote_tftp = KLIBCFileCheckKeyValue(kSettings, kIsRemote, "yes", 0) == 1 ? 1 : 0;
+    const int is_remote = KLIBCFileCheckKeyValue(kSettings, kIsRemote, "yes", 0);
+    if (is_remote < 0) {
+        log_err(HERE, "Failed to get [%s] key", kIsRemote);
+        return false;
+    }
+    conf.is_remote_tftp = is_remote == 1 ? 1 : 0;
     if (!read_loader(kLocalLoader, conf.local_bootloader) || !read_loader(kRemoteLoader, conf.remote_bootloader)) {
         return false;
     }

@@ -99,6 +99,9 @@ bool overlaps(const char *start, const char *netmask, const DHCP_RANGE &range) {
 
 /** @return 1 when the subnet overlaps one of the interface, 0 when not, -1 when its ranges cannot be read */
 int overlaps_interface(const char *other, const char *start, const char *netmask) {
+    if (*other != '\0' && !is_interface_name(other)) {
+        return 0; // a file of another making, whose name no subnet can have
+    }
     range_list ranges;
     if (DHCPGetInterfaceRanges(other, ranges.out()) < 0) {
         return fail_keeping_code(HERE, -1, "Failed to get DHCP ranges for interface [%s]", other);

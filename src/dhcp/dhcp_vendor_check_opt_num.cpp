@@ -15,6 +15,7 @@ namespace {
 constexpr char kFragment[] = "/etc/dhcpd/dhcpd-vendor.conf";
 constexpr char kPrefix[] = "dhcp-option=vendor:";
 constexpr int kLastNumber = 254;
+constexpr char kUnreadable[] = "Failed to read DHCP vendor config";
 
 // flags of the platform's line operations
 constexpr int kWholeField = 1026;
@@ -51,21 +52,25 @@ int parse_line(const char *line, vendor_option &option) {
     }
     copy_text(option.number, KLIBCSzListGet(fields.get(), 1));
     copy_text(option.value, KLIBCSzListGet(fields.get(), 2));
+    option.value[strcspn(option.value, "\r")] = '\0'; // the line may have been written elsewhere
     if (DHCPVendorCheckOptNum(option.number) == 0) {
         return fail_keeping_code(HERE, -1, "Wrong option number [%s]", option.number);
     }
     return 0;
 }
 
+line_text option_line(const char *vendor, const char *number, const char *value) {
+    return line_text{"dhcp-option=vendor:%s,%s,%s", vendor, number, value};
+}
+
 /** Whether a vendor class and a value make one line that can be read whole. */
 bool can_be_stored(const char *vendor, const char *number, const char *value) {
     return is_line_text(vendor) && strchr(vendor, ',') == nullptr && is_line_text(value) &&
-           line_text{"%s%s,%s,%s", kPrefix, vendor, number, value}.fits();
+           option_line(vendor, number, value).fits();
 }
 
 int append_option(const char *vendor, const char *number, const char *value, int flags) {
-    const line_text line{"%s%s,%s,%s", kPrefix, vendor, number, value};
-    return KLIBCFileAddLine(kFragment, nullptr, line.c_str(), flags);
+    return KLIBCFileAddLine(kFragment, nullptr, option_line(vendor, number, value).c_str(), flags);
 }
 
 /** Removes the lines that begin with a text and go on with "," or end there. */
@@ -104,11 +109,16 @@ int append_options(const char *vendor, const KLIBSZHASH *options, const KLIBSZLI
     return 0;
 }
 
+/** @return 0; -1, logged, when a file that was read to its end was not readable to its end */
+int fail_unless_read(const stream &file) {
+    return ferror(file.get()) == 0 ? 0 : fail_keeping_code(HERE, -1, kUnreadable);
+}
+
 /** Adds the vendor class that a line is about to a list, unless it is there. */
 int add_vendor(const char *line, KLIBSZLIST **vendors) {
     char vendor[kLineRoom];
     if (sscanf(line, "%*[^:]:%1023[^,],%*s", vendor) != 1) {
-        log_err(HERE, "wrong format [%s] in DHCP vendor config", line);
+        log_warning(HERE, "wrong format [%s] in DHCP vendor config", line); // passed over
         return 0;
     }
     if (KLIBCSzListFind(*vendors, vendor) >= 0 || KLIBCSzListPush(vendors, vendor) >= 0) {
@@ -136,11 +146,12 @@ extern "C" int DHCPVendorGetVendor(const char *vendor, KLIBSZHASH **options) {
     }
     const stream file{fopen(kFragment, "re")};
     if (!file.is_held()) {
-        return fail_keeping_code(HERE, -1, "Failed to read DHCP vendor config");
+        return fail_keeping_code(HERE, -1, kUnreadable);
     }
     const line_text wanted{"%s%s,", kPrefix, shown(vendor)};
     char line[kLineRoom];
-    while (vendor != nullptr && wanted.fits() && next_cut_line(file, line)) {
+    const bool can_be_there = vendor != nullptr && wanted.fits() && strchr(vendor, ',') == nullptr;
+    while (can_be_there && next_cut_line(file, line)) {
         if (strstr(line, wanted.c_str()) == nullptr) {
             continue;
         }
@@ -153,7 +164,7 @@ extern "C" int DHCPVendorGetVendor(const char *vendor, KLIBSZHASH **options) {
             return fail_keeping_code(HERE, result, "Failed to get vendor option: generate vendor hash error");
         }
     }
-    return 0;
+    return fail_unless_read(file);
 }
 
 extern "C" int DHCPVendorGetVendorOpt(const char *vendor, int number, char *value, unsigned int size) {
@@ -161,11 +172,8 @@ extern "C" int DHCPVendorGetVendorOpt(const char *vendor, int number, char *valu
         return fail_keeping_code(HERE, -1, "get vendor [%s] option [#%d] failed: wrong input format", shown(vendor),
                                  number);
     }
-    if (size == 0) {
-        return fail_keeping_code(HERE, -1, "Failed to parse vendor opt line [%s], parameter error", "");
-    }
     const line_text wanted{"%s%s,%d", kPrefix, vendor, number};
-    if (KLIBCFileExist(kFragment) == 0 || !wanted.fits()) {
+    if (KLIBCFileExist(kFragment) == 0 || !wanted.fits() || strchr(vendor, ',') != nullptr) { // none could be stored
         return 0;
     }
     char line[kLineRoom];
@@ -176,6 +184,9 @@ extern "C" int DHCPVendorGetVendorOpt(const char *vendor, int number, char *valu
     if (found == 0) {
         log_debug(HERE, "No match [%s] line in DHCP vendor config", wanted.c_str());
         return 0;
+    }
+    if (size == 0) {
+        return fail_keeping_code(HERE, -1, "Failed to parse vendor opt line [%s], parameter error", line);
     }
     vendor_option option;
     if (parse_line(line, option) < 0) {
@@ -241,7 +252,7 @@ extern "C" int DHCPVendorEnum(KLIBSZLIST **vendors) {
     }
     const stream file{fopen(kFragment, "re")};
     if (!file.is_held()) {
-        return fail_keeping_code(HERE, -1, "Failed to read DHCP vendor config");
+        return fail_keeping_code(HERE, -1, kUnreadable);
     }
     char line[kLineRoom];
     while (next_cut_line(file, line)) {
@@ -249,5 +260,5 @@ extern "C" int DHCPVendorEnum(KLIBSZLIST **vendors) {
             return -1;
         }
     }
-    return 0;
+    return fail_unless_read(file);
 }

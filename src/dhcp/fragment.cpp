@@ -79,24 +79,31 @@ bool next_cut_line(const stream &file, char (&line)[kLineRoom]) {
             line[length++] = static_cast<char>(byte);
         }
     }
+    if (length > 0 && line[length - 1] == '\r') { // written elsewhere, perhaps
+        --length;
+    }
     line[length] = '\0';
     return is_there;
 }
 
-heap<char> line_holding(const path_text &path, const char *text) {
+found_line line_holding(const path_text &path, const char *text) {
     const stream file{fopen(path.c_str(), "re")};
-    heap<char> line = file.is_held() ? next_line(file) : nullptr;
+    if (!file.is_held()) {
+        return {nullptr, false};
+    }
+    heap<char> line = next_line(file);
     while (line != nullptr && strstr(line.get(), text) == nullptr) {
         line = next_line(file);
     }
-    if (line != nullptr) {
-        line.get()[strcspn(line.get(), "\r")] = '\0'; // written elsewhere, perhaps
+    if (line == nullptr) {
+        return {nullptr, feof(file.get()) != 0};
     }
-    return line;
+    line.get()[strcspn(line.get(), "\r")] = '\0'; // written elsewhere, perhaps
+    return {std::move(line), true};
 }
 
 comma_fields fields_of_line(const path_text &path, const char *text) {
-    return comma_fields{line_holding(path, text).get()};
+    return comma_fields{line_holding(path, text).text.get()};
 }
 
 comma_fields fields_of_range(const path_text &path) {
@@ -114,14 +121,14 @@ bool read_v4_range(const path_text &path, DHCP_TAG_CONF &conf) {
     return fields.is_held();
 }
 
-bool read_option(const path_text &path, const char *name, char *out, size_t size) {
-    const heap<char> line = line_holding(path, name);
-    if (line == nullptr) {
-        return false;
+int read_option(const path_text &path, const char *name, char *out, size_t size) {
+    const found_line line = line_holding(path, name);
+    if (line.text == nullptr) {
+        return line.is_read ? 0 : -1;
     }
-    const char *const comma = strrchr(line.get(), ',');
-    copy_cut(out, size, comma != nullptr ? comma + 1 : line.get());
-    return true;
+    const char *const comma = strrchr(line.text.get(), ',');
+    copy_cut(out, size, comma != nullptr ? comma + 1 : line.text.get());
+    return 1;
 }
 
 } // namespace kova

@@ -100,11 +100,14 @@ private:
 /** The next line without its newline, cut to the room; what is beyond is passed over. @return false at the end */
 [[nodiscard]] bool next_cut_line(const stream &file, char (&line)[kLineRoom]);
 
-/**
- * The first line of a file that holds a text anywhere, without its line end.
- * @return the line; NULL when there is none, the file cannot be read or memory runs out
- */
-[[nodiscard]] heap<char> line_holding(const path_text &path, const char *text);
+/** What looking for a line has found. */
+struct found_line {
+    heap<char> text; ///< without its line end; NULL when there is none
+    bool is_read;    ///< whether the file could be read as far as needed, and memory was enough
+};
+
+/** The first line of a file that holds a text anywhere. */
+[[nodiscard]] found_line line_holding(const path_text &path, const char *text);
 
 /** The fields of that line, tag first; not held when there is none. */
 [[nodiscard]] comma_fields fields_of_line(const path_text &path, const char *text);
@@ -122,8 +125,8 @@ inline constexpr size_t kAddressRoom = 20;
 /**
  * Reads an option: the last field of the first line that holds its name.
  * @param out  receives the value, cut; untouched when there is none
- * @return whether there is one
+ * @return 1; 0 when there is none; -1 when that cannot be told
  */
-[[nodiscard]] bool read_option(const path_text &path, const char *name, char *out, size_t size);
+[[nodiscard]] int read_option(const path_text &path, const char *name, char *out, size_t size);
 
 } // namespace kova

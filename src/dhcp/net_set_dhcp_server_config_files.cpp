@@ -77,13 +77,15 @@ int read_subnet(const path_text &path, DHCP_TAG_CONF &conf) {
     if (!read_dns(path, conf)) {
         return fail_keeping_code(HERE, 0, kMissing, daemon_key::kOption);
     }
-    if (!read_option(path, daemon_key::kRouter, conf.router, kAddressRoom)) {
+    if (read_option(path, daemon_key::kRouter, conf.router, kAddressRoom) <= 0) {
         return fail_keeping_code(HERE, 0, kMissing, daemon_key::kRouter);
     }
     if (KLIBCFileGetKeyValue(path.c_str(), daemon_key::kInterface, conf.ifname, sizeof conf.ifname, 0) <= 0) {
         return fail_keeping_code(HERE, 0, "Failed to get key %s in %s", daemon_key::kInterface, path.c_str());
     }
-    (void)read_option(path, daemon_key::kDomainSearch, conf.domain, kAddressRoom); // a subnet may do without
+    if (read_option(path, daemon_key::kDomainSearch, conf.domain, kAddressRoom) < 0) { // a subnet may do without
+        return fail_keeping_code(HERE, 0, kMissing, daemon_key::kDomainSearch);
+    }
     return 1;
 }
 

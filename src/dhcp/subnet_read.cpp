@@ -54,10 +54,12 @@ int read_v4_subnet(const place &at, const path_text &path, DHCP_TAG_CONF &conf) 
     }
     copy_text(conf.dns1, servers[2]);
     copy_text(conf.dns2, servers[3]);
-    if (!read_option(path, daemon_key::kRouter, conf.router, kAddressRoom)) {
+    if (read_option(path, daemon_key::kRouter, conf.router, kAddressRoom) <= 0) {
         return fail_keeping_code(at, -1, kMissing, daemon_key::kRouter);
     }
-    (void)read_option(path, daemon_key::kDomainSearch, conf.domain, kDomainRoom); // a subnet may do without
+    if (read_option(path, daemon_key::kDomainSearch, conf.domain, kDomainRoom) < 0) { // a subnet may do without
+        return fail_keeping_code(at, -1, kMissing, daemon_key::kDomainSearch);
+    }
     option_list options;
     if (read_options(at, path.c_str(), options) < 0) {
         return -1;

@@ -1,6 +1,7 @@
 #include <kovanetsdk/hostname.h>
 
 #include "core/guards.h"
+#include "core/replacement_file.h"
 #include "core/report.h"
 #include "core/text.h"
 
@@ -30,12 +31,6 @@ uint32_t write_file(const char *path, const char *text) {
     return is_written && is_closed ? 0 : NET_ERR_FILE_WRITE;
 }
 
-/** A rename is on the disk when its directory is; file systems that cannot sync one say so. */
-bool sync_directory() {
-    const descriptor directory{open("/etc", O_RDONLY | O_DIRECTORY | O_CLOEXEC)};
-    return directory.is_held() && (fsync(directory.get()) == 0 || errno == EINVAL);
-}
-
 /** Puts a new file in the place of one in /etc. @return 0 or the code of the failure, with errno */
 uint32_t replace_file(const char *path, const char *text) {
     char fresh[1024];
@@ -51,7 +46,8 @@ uint32_t replace_file(const char *path, const char *text) {
         unlink(fresh);
         return code;
     }
-    return sync_directory() ? 0 : NET_ERR_FILE_WRITE;
+    sync_directory_of(path);
+    return 0;
 }
 
 /** Whether what is at a path, if anything, is a file that could be opened for writing. */

@@ -146,6 +146,16 @@ const std::vector<operation> &operations() {
          .call = [](const char *) { return set_card(0); },
          .path = kIfcfg,
          .is_built_of_others = true},
+        {.name = "KOVANetDefaultGatewaySetConf",
+         .floor = 44,
+         .call = [](const char *) { return KOVANetDefaultGatewaySetConf("192.168.7.1") == 0; },
+         .path = "/etc/sysconfig/network",
+         .is_built_of_others = true},
+        {.name = "DHCPInterfaceSetEnabled",
+         .floor = 44,
+         .call = [](const char *) { return DHCPInterfaceSetEnabled("eth0", 0, 1) == 0; },
+         .path = "/etc/dhcpd/dhcpd-eth0.info",
+         .is_built_of_others = true},
     };
     return all;
 }

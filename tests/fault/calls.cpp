@@ -6,6 +6,7 @@
 #include "support/fault_points.h"
 
 #include <cstdarg>
+#include <cstring>
 #include <dirent.h>
 #include <dlfcn.h>
 #include <fcntl.h>
@@ -42,10 +43,31 @@ FAULT_IN_FRONT(int, chown, (const char *path, uid_t user, gid_t group), (path, u
 FAULT_IN_FRONT(int, mkdir, (const char *path, mode_t mode), (path, mode), named(path), -1, ENOSPC)
 FAULT_IN_FRONT(int, link, (const char *from, const char *to), (from, to), between(from, to), -1, ENOSPC)
 FAULT_IN_FRONT(int, rename, (const char *from, const char *to), (from, to), between(from, to), -1, EIO)
+FAULT_IN_FRONT(int, renameat2, (int from_fd, const char *from, int to_fd, const char *to, unsigned flags),
+               (from_fd, from, to_fd, to, flags), between(from, to), -1, EIO)
 FAULT_IN_FRONT(int, unlink, (const char *path), (path), named(path), -1, EIO)
 FAULT_IN_FRONT(ssize_t, readlink, (const char *path, char *to, size_t size), (path, to, size), named(path), -1, EIO)
 FAULT_IN_FRONT(char *, realpath, (const char *path, char *resolved), (path, resolved), named(path), nullptr, EACCES)
-FAULT_IN_FRONT(int, mkostemp, (char *path, int flags), (path, flags), named(path), -1, ENOSPC)
+
+/** The same name in each run: the first that is free. */
+extern "C" int failing_mkostemp(char *path, int flags) __asm__("mkostemp");
+extern "C" int failing_mkostemp(char *path, int flags) {
+    const fault_point point{"mkostemp", is_in_code_under_test(__builtin_return_address(0)),
+                            [&] { return named(path); }};
+    if (point.fails()) {
+        errno = ENOSPC;
+        return -1;
+    }
+    const rig_at_work guard;
+    char *const end = path + strlen(path) - 6;
+    int fd = -1;
+    for (int number = 0; fd < 0 && number < 100; ++number) {
+        snprintf(end, 7, "%06d", number);
+        fd = open(path, O_RDWR | O_CREAT | O_EXCL | flags, 0600);
+    }
+    return fd;
+}
+static const bool mkostemp_can_fail = can_fail("mkostemp");
 
 extern "C" int failing_openat(int fd, const char *path, int flags, ...) __asm__("openat");
 extern "C" int failing_openat(int fd, const char *path, int flags, ...) {
@@ -74,8 +96,20 @@ FAULT_IN_FRONT(int, fchown, (int fd, uid_t user, gid_t group), (fd, user, group)
 FAULT_BEHIND(int, close, (int fd), (fd), path_of(fd), -1, EIO)
 FAULT_IN_FRONT(int, memfd_create, (const char *name, unsigned flags), (name, flags), named(name), -1, ENFILE)
 FAULT_IN_FRONT(int, pipe2, (int *ends, int flags), (ends, flags), std::string{}, -1, EMFILE)
-FAULT_IN_FRONT(ssize_t, getrandom, (void *to, size_t size, unsigned flags), (to, size, flags), std::string{}, -1,
-               ENOSYS)
+
+/** The same bytes in each run. */
+extern "C" ssize_t failing_getrandom(void *to, size_t size, unsigned flags) __asm__("getrandom");
+extern "C" ssize_t failing_getrandom(void *to, size_t size, unsigned) {
+    const fault_point point{"getrandom", is_in_code_under_test(__builtin_return_address(0)),
+                            [] { return std::string(); }};
+    if (point.fails()) {
+        errno = ENOSYS;
+        return -1;
+    }
+    memset(to, 0x42, size);
+    return static_cast<ssize_t>(size);
+}
+static const bool getrandom_can_fail = can_fail("getrandom");
 
 /** Nothing goes to the disk: the files of a run are gone after it. */
 extern "C" int failing_fsync(int fd) __asm__("fsync");
@@ -151,7 +185,9 @@ extern "C" FILE *failing_fdopen(int fd, const char *mode) {
         errno = ENOMEM;
         return nullptr;
     }
-    return is_counted ? watched(next(fd, mode), mode, path_of(fd)) : next(fd, mode);
+    FILE *const stream = next(fd, mode);
+    const rig_at_work guard;
+    return is_counted ? watched(stream, mode, path_of(fd)) : stream;
 }
 static const bool fdopen_can_fail = can_fail("fdopen");
 
@@ -184,6 +220,8 @@ FAULT_IN_FRONT(int, clone, (int (*function)(void *), void *stack, int flags, voi
 FAULT_BEHIND(pid_t, waitpid, (pid_t pid, int *status, int options), (pid, status, options), std::string{}, -1, ECHILD)
 FAULT_IN_FRONT(int, kill, (pid_t pid, int signal), (pid, signal), std::to_string(signal), -1, EPERM)
 FAULT_IN_FRONT(int, uname, (struct utsname * out), (out), std::string{}, -1, EFAULT)
+FAULT_IN_FRONT(int, sethostname, (const char *name, size_t size), (name, size), named(name), -1, EPERM)
+FAULT_IN_FRONT(int, gethostname, (char *name, size_t size), (name, size), std::string{}, -1, EFAULT)
 FAULT_IN_FRONT(int, __register_atfork, (void (*prepare)(), void (*parent)(), void (*child)(), void *object),
                (prepare, parent, child, object), std::string{}, ENOMEM, errno)
 

@@ -1,7 +1,9 @@
 #include "fault/sweep.h"
 
 #include <cstring>
+#include <filesystem>
 #include <kova/plugin.h>
+#include <utility>
 
 namespace fault {
 
@@ -10,7 +12,7 @@ using kova_test::write_file;
 
 // ---- the appliance that every call starts from: cards eth0 (static) and eth1 (DHCP), both members of bond0
 
-world::world() : list(KLIBCSzListAlloc(4)) {
+world::world() : list(KLIBCSzListAlloc(4)), map(KLIBCSzHashAlloc(4)) {
     KLIBCSzListPush(&list, "10.0.0.1");
     KLIBCSzListPush(&list, "10.0.0.2");
     kernel.add("eth0", {.ip = "192.168.1.10", .mask = "255.255.255.0", .supported = 0x20});
@@ -31,6 +33,7 @@ world::world() : list(KLIBCSzListAlloc(4)) {
     rig.replace_file("/sys/class/net/bond0/bonding/slaves", "eth0 eth1\n");
     rig.replace_file("/sys/class/net/bond0/bonding/mode", "802.3ad 4\n");
     rig.replace_file("/proc/net/bonding//bond0", "\tPartner Mac Address: 00:11:22:33:44:55\n");
+    rig.answer("/bin/mkdir -p /etc/dhcpd", 0, "", [] { std::filesystem::create_directories("/etc/dhcpd"); });
     rig.answer("/bin/ipcalc -n", 0, "NETWORK=192.168.1.0\n");
     rig.answer("/bin/ipcalc -b", 0, "BROADCAST=192.168.1.255\n");
 }
@@ -40,8 +43,10 @@ world::~world() {
 }
 
 void world::release() {
-    KLIBCSzListFree(list);
-    list = nullptr;
+    KLIBCSzListFree(std::exchange(list, nullptr));
+    KLIBCSzHashFree(std::exchange(map, nullptr));
+    DHCPOptionFree(std::exchange(subnet.options, nullptr));
+    DHCPRangeFree(std::exchange(ranges, nullptr));
     if (event != 0) {
         KLIBPluginExit(event);
         event = 0;
@@ -52,12 +57,14 @@ const tolerances &tolerated_everywhere() {
     static const tolerances all{
         {"access ", "a look whether something is there has no third answer", kAnyResult},
         {"KLIBCFileExist ", "a look whether something is there has no third answer", kAnyResult},
+        {"KLIBCFileCheckDir ", "a look whether something is there has no third answer", kAnyResult},
         {"KOVAHA", "a machine that cannot tell is no node of a cluster", kAnyResult},
         {"KLIBCModuleIsLoad 8021q > ", "one of several places that tell; a kernel that tells nowhere has no VLANs",
          kAnyResult},
         {"fopen /sys/class/net/kova_ovs_bonds", "logged; without the list there is no switch", kAnyResult},
         {"fread /sys/class/net/kova_ovs_bonds", "without the list there is no switch", kAnyResult},
         {"close ", "what it was for is done"},
+        {"closedir ", "what it was for is done"},
         {"fclose read ", "what it was for is done"},
         {"fclose written /proc/sys/", "the flush before it told"},
         {"setvbuf ", "only the speed depends on it"},
@@ -66,7 +73,11 @@ const tolerances &tolerated_everywhere() {
         {"mkdir /run/lock", "another process may have made it; whether it is there shows at the open"},
         {"chmod /run/lock", "the directory may be another's; whether the lock can be had shows at the open"},
         {"fchmod /run/lock", "the lock is held all the same"},
+        {"fstat /run/lock/kova/", "whether the mode has to be put right is not known; the lock is held all the same"},
         {"fcntl 37 ", "a lock that is not to be had is asked for again"},
+        {"open /etc/kova/platform.conf", "what this machine does not say is not set"},
+        {"fstat /etc/kova/platform.conf", "what this machine does not say is not set"},
+        {"read /etc/kova/platform.conf", "what this machine does not say is not set"},
     };
     return all;
 }
@@ -149,6 +160,213 @@ void dhcp_card_to_set(world &it) {
     it.card.nIPSource = 0;
 }
 
+// ---- the same for resolver, routes, host name and DHCP server
+
+constexpr char kServers[] = "nameserver\t10.0.0.1\nnameserver\t10.0.0.2\n";
+
+void default_route(world &it) {
+    it.rig.replace_file("/proc/net/route", "Iface Destination Gateway Flags RefCnt Use Metric Mask MTU Window IRTT\n"
+                                           "eth0 0001A8C0 00000000 0001 0 0 0 00FFFFFF 0 0 0\n"
+                                           "eth0 00000000 0101A8C0 0003 0 0 0 00000000 0 0 0\n");
+}
+
+void gateway_conf(world &) {
+    write_file("/etc/sysconfig/network", "NETWORKING=yes\nGATEWAY=192.168.1.1\n");
+}
+
+/** Two cards that can lose the route of their subnets. */
+void two_without_link(world &it) {
+    it.kernel.add("eth0", {.flags = IFF_UP});
+    it.kernel.add("eth1", {.flags = IFF_UP});
+}
+
+/** Some servers are in use, others are configured, and the services that are told of a change are there. */
+void resolver(world &) {
+    write_file("/etc/resolv.conf", "nameserver\t192.168.1.1\n");
+    write_file("/etc/resolv.conf.static", kServers);
+    write_file("/etc/resolv.conf.option", "domain\texample.net\n");
+    write_file("/etc/kovainfo.conf", "dns_mode=\"static\"\n");
+    write_file("/usr/kova/service/ddns", "#!/bin/sh\n");
+    write_file("/usr/kova/service/kovarelayd", "#!/bin/sh\n");
+}
+
+void automatic_resolver(world &it) {
+    resolver(it);
+    write_file("/etc/kovainfo.conf", "dns_mode=\"auto\"\n");
+    write_file("/etc/iproute2/config/resolv4.conf", "nameserver\t10.1.0.1\n");
+    write_file("/etc/iproute2/config/resolv6.conf", "nameserver\t2001:db8::53\n");
+}
+
+void host_names(world &) {
+    write_file("/etc/hostname", "before\n");
+    write_file("/etc/hosts", "127.0.0.1\tlocalhost\n");
+}
+
+void dhcp_switches(world &) {
+    write_file("/etc/dhcpd/dhcpd.info", "enable=\"yes\"\n");
+    for (const char *name : {"dhcpd-eth0", "dhcpd6-eth0", "dhcpd-eth1", "dhcpd-bond0"}) {
+        write_file(std::string("/etc/dhcpd/") + name + ".info", "enable=\"yes\"\nbonding_backup_enable=\"no\"\n");
+    }
+}
+
+void members_with_switches(world &it) {
+    dhcp_switches(it);
+    KLIBCSzListRemoveAll(it.list);
+    KLIBCSzListPush(&it.list, "eth0");
+    KLIBCSzListPush(&it.list, "eth1");
+}
+
+/** Subnets of both families, and everything else that goes with the name eth0. */
+void dhcp_subnets(world &it) {
+    dhcp_switches(it);
+    const std::string v4 = "interface=eth0\ndhcp-range=set:eth00,10.1.0.10,10.1.0.99,255.255.255.0,600\n"
+                           "dhcp-option=tag:eth00,option:router,10.1.0.1\n"
+                           "dhcp-option=tag:eth00,option:domain-search,example.net\n"
+                           "dhcp-option=tag:eth00,option:dns-server,10.1.0.2,10.1.0.3\n"
+                           "dhcp-option=tag:eth00,option:mtu,9000\n"
+                           "dhcp-option=tag:eth00,option:ntp-server,10.1.0.4,10.1.0.5\n";
+    const std::string v6 = "interface=eth0\ndhcp-range=set:eth0v60,2001:db8::10,2001:db8::99,64,600\n"
+                           "dhcp-option=tag:eth0v60,option6:dns-server,[2001:db8::53]\nenable-ra\n";
+    write_file("/etc/dhcpd/dhcpd-eth0-subnet0.conf", v4);
+    write_file("/etc/dhcpd/dhcpd-eth0-subnet1.conf", v4);
+    write_file("/etc/dhcpd/dhcpd6-eth0-subnet0.conf", v6);
+    write_file("/etc/dhcpd/dhcpd-eth0-office.conf", v4);
+    for (const char *name : {"dhcpd-eth0-subnet0", "dhcpd6-eth0-subnet0", "dhcpd-eth0-office", "wpad-eth0"}) {
+        write_file(std::string("/etc/dhcpd/") + name + ".info", "enable=\"yes\"\n");
+    }
+    write_file("/etc/dhcpd/dhcpd-eth0-static.conf", "dhcp-host=set:eth00,02:00:00:00:00:01,10.1.0.11\n");
+    write_file("/etc/dhcpd/wpad-eth0.conf", "dhcp-option=tag:eth00,252,http://wpad.example.net/wpad.dat\n");
+}
+
+/** Puts an option without a list of its own before the others. */
+DHCP_OPTION &add_option(world &it, int number, const char *name, const char *value) {
+    auto *const option = static_cast<DHCP_OPTION *>(calloc(1, sizeof(DHCP_OPTION)));
+    option->number = number;
+    strcpy(option->name, name);
+    strcpy(option->value, value);
+    option->next = it.subnet.options;
+    it.subnet.options = option;
+    return *option;
+}
+
+void subnet_to_set(world &it) {
+    it.subnet = {.enabled = 1,
+                 .lease_time = 600,
+                 .start_ip = "10.2.0.10",
+                 .end_ip = "10.2.0.99",
+                 .ifname = "eth0",
+                 .domain = "example.net",
+                 .dns1 = "10.2.0.2",
+                 .dns2 = "10.2.0.3",
+                 .netmask = "255.255.255.0",
+                 .router = "10.2.0.1",
+                 .tag = "office"};
+    add_option(it, 26, "mtu", "9000");
+    add_option(it, 42, "ntp-server", "").items = std::exchange(it.list, nullptr);
+}
+
+void subnet_to_change(world &it) {
+    dhcp_subnets(it);
+    subnet_to_set(it);
+}
+
+void v6_subnet_to_set(world &it) {
+    it.subnet = {.enabled = 1,
+                 .lease_time = 600,
+                 .start_ip = "2001:db8::10",
+                 .end_ip = "2001:db8::99",
+                 .dns1 = "2001:db8::53",
+                 .v6_mode = "stateful"};
+}
+
+void v6_subnet_to_change(world &it) {
+    dhcp_subnets(it);
+    it.subnet = {.enabled = 1, .lease_time = 900, .dns1 = "2001:db8::54", .v6_mode = "ra-stateless"};
+}
+
+void options_to_free(world &it) {
+    add_option(it, 26, "mtu", "9000");
+    add_option(it, 37, "tcp-ttl", "64");
+}
+
+void ranges_to_free(world &it) {
+    for (int i = 0; i < 2; ++i) {
+        auto *const range = static_cast<DHCP_RANGE *>(calloc(1, sizeof(DHCP_RANGE)));
+        range->next = it.ranges;
+        it.ranges = range;
+    }
+}
+
+void local_boot_to_set(world &it) {
+    it.boot = {.enabled = 1, .local_bootloader = "local.0"};
+}
+
+void remote_boot_to_change(world &it) {
+    write_file("/etc/dhcpd/dhcpd-pxe-setting", "enable=\"yes\"\nis_remote_tftp=\"no\"\nlocal_bootloader=\"local.0\"\n"
+                                               "remote_bootloader=\"old.0\"\nremote_tftp_server_ip=\"10.0.0.8\"\n");
+    write_file("/etc/dhcpd/dhcpd-pxe.info", "enable=\"yes\"\n");
+    write_file("/etc/dhcpd/dhcpd-pxe.conf", "dhcp-boot=tag:pxe,local.0\n");
+    it.boot = {.enabled = 1, .is_remote_tftp = 1, .remote_bootloader = "remote.0", .remote_tftp_server_ip = "10.0.0.9"};
+}
+
+void vendor_to_set(world &it) {
+    KLIBCSzHashSetValue(it.map, "1", "one");
+    KLIBCSzHashSetValue(it.map, "43", "boot");
+}
+
+void vendors(world &) {
+    write_file("/etc/dhcpd/dhcpd-vendor.conf", "dhcp-option=vendor:MSFT,1,first\ndhcp-option=vendor:PXEClient,43,x\n"
+                                               "dhcp-option=vendor:MSFT,2,second\n");
+}
+
+void vendor_to_change(world &it) {
+    vendors(it);
+    vendor_to_set(it);
+}
+
+void lease_to_ask_for(world &it) {
+    it.card = {.szIfname = "eth1"};
+    write_file("/etc/dhclient/dhclient-script", "#!/bin/sh\n");
+}
+
+// ---- calls that are more than an expression
+
+/** The lock is given back even where it could not be had; there is nobody else's that could be lost by it. */
+long give_back_a_lock(world &it, long result) {
+    int &held = it.rig.held["named locks"];
+    held = result < 0 && held == -1 ? 0 : held;
+    return result;
+}
+
+long list_served_interfaces(world &) {
+    KLIBSZLIST *found = nullptr;
+    const long result = DHCPInterfaceListGet(&found, 0);
+    KLIBCSzListFree(found);
+    return result;
+}
+
+long read_ranges(world &) {
+    DHCP_RANGE *found = nullptr;
+    const long result = DHCPGetInterfaceRanges("eth0", &found);
+    DHCPRangeFree(found);
+    return result;
+}
+
+long read_subnet(world &it) {
+    const long result = DHCPTagConfGet("eth0", 0, 0, &it.subnet);
+    DHCPOptionFree(std::exchange(it.subnet.options, nullptr));
+    return result;
+}
+
+/** Settings that cannot be read are told in the record. */
+long read_boot_switch(world &it) {
+    return DHCPPXEConfGetEnable(&it.boot) < 0 ? -1 : it.boot.enabled;
+}
+
+long read_boot_settings(world &it) {
+    return DHCPPXEConfGet(&it.boot) < 0 ? -1 : it.boot.enabled;
+}
+
 // ---- what functions get over by design
 
 const tolerances cards{
@@ -175,9 +393,11 @@ const tolerances announced{
 };
 const tolerances backed_up{
     {"KLIBCExec /bin/cp", "logged; the change is made without a backup", std::nullopt, ".tmp1700000000"},
+    {"open /etc/sysconfig/network-scripts/ifcfg-eth0.tmp", "the copy keeps what the tool gave it"},
     {"stat /etc/sysconfig/network-scripts/ifcfg-", "the copy keeps what the tool gave it"},
-    {"chown /etc/sysconfig/network-scripts/ifcfg-", "the copy keeps what the tool gave it"},
-    {"chmod /etc/sysconfig/network-scripts/ifcfg-", "the copy keeps what the tool gave it"},
+    {"fchown /etc/sysconfig/network-scripts/ifcfg-eth0.tmp", "the copy keeps what the tool gave it"},
+    {"fchmod /etc/sysconfig/network-scripts/ifcfg-eth0.tmp", "the copy keeps what the tool gave it"},
+    {"fsync /etc/sysconfig/network-scripts/ifcfg-eth0.tmp", "the copy may be lost with the machine's power"},
     {"unlink /etc/sysconfig/network-scripts/ifcfg-", "logged; the copy stays", std::nullopt, ".tmp1700000000"},
     {"rename /etc/sysconfig/network-scripts/.ifcfg-", "neither can the copy be renamed; it stays", -1,
      ".tmp1700000000"},
@@ -225,6 +445,81 @@ const tolerances interface_state{
     {"fopen /sys/class/net/eth0/flags", "the kernel itself refuses to rename what is up"},
     {"fread /sys/class/net/eth0/flags", "the kernel itself refuses to rename what is up"},
 };
+const tolerances told{
+    {"KLIBPluginSDKInit", "the change is made whether it is announced or not"},
+    {"KLIBPluginSetArg", "the change is made whether it is announced or not"},
+    {"KLIBPluginAction", "the change is made whether it is announced or not"},
+};
+const tolerances dispatch{
+    {"KLIBPluginHasInit", "logged; both phases run, and the call succeeds"},
+    {"KLIBPluginSetArg", "logged; both phases run, and the call succeeds"},
+    {"KLIBPluginAction", "logged; both phases run, and the call succeeds"},
+};
+const tolerances made_again{
+    {"KLIBCFileExist", "a source that is not there has no lines", kAnyResult, "/etc/resolv.conf"},
+    {"KLIBCFileCheckKeyValue /etc/kovainfo.conf", "what is not known to be static is automatic", std::nullopt,
+     "/etc/resolv.conf"},
+    {"KLIBCFileGetLine /etc/resolv.conf.option", "no line was found", std::nullopt, "/etc/resolv.conf"},
+    {"open /etc/ ", "the file is in its place; its name may be lost with the machine's power"},
+    {"fsync /etc ", "the file is in its place; its name may be lost with the machine's power"},
+    {"fclose written /etc/resolv.conf", "what was written is on the disk already"},
+    {"chmod /etc/resolv.conf", "logged; it was readable before it got its name"},
+    {"KLIBServiceReload", "the file is made; the services are not waited for"},
+    {"KLIBServiceIsRunning", "the file is made; the services are not waited for"},
+};
+const tolerances server_list{
+    {"fopen /etc/resolv.conf", "logged; a file that cannot be opened has no servers"},
+    {"fread /etc/resolv.conf", "the list ends where the file cannot be read on"},
+};
+const tolerances host_name{
+    {"KOVAIsDockerHMX", "a machine that cannot tell is no container"},
+};
+const tolerances old_route{
+    {"KLIBCExecl /sbin/route delete default", "there may be none"},
+};
+const tolerances route_tools{
+    {"KLIBCExecl /sbin/ip route", "noted; the other tool is asked"},
+    {"KLIBCExecl /sbin/route", "noted; nobody else is left to ask"},
+};
+const tolerances known_kind{
+    {"fopen /proc/net/dev", "an interface whose kind cannot be told is left alone"},
+    {"fread /proc/net/dev", "an interface whose kind cannot be told is left alone"},
+    {"calloc", "an interface whose kind cannot be told is left alone"},
+    {"KLIBCModuleIsLoad 8021q", "an interface whose kind cannot be told is left alone"},
+};
+const tolerances dhcp_switch{
+    {"KLIBCFileCheckKeyValue /etc/dhcpd/", "a switch that cannot be read is off"},
+};
+const tolerances logged_switch{
+    {"KLIBCFileSetKeyValue /etc/dhcpd/", "told in the log alone"},
+};
+const tolerances handed_on{
+    {"KLIBCFileSetKeyValue /etc/dhcpd/", "a switch and what is kept of it are two keys; each is written whole", -1,
+     ".info"},
+    {"KLIBCExec /etc/rc.network", "the switches are handed on whether the server restarts or not"},
+};
+const tolerances script_status{
+    {"KLIBCExec /etc/rc.network", "only the status 1 is the script's word that the server failed"},
+};
+const tolerances listed_files{
+    {"calloc", "logged; the file is left out", kAnyResult},
+};
+const tolerances in_place{
+    {"fwrite /etc/dhcpd/", "what the server reads is written in place", -1, "/etc/dhcpd/"},
+};
+const tolerances in_place_tagged{
+    {"fwrite /etc/dhcpd/", "what the server reads is written in place", 0, "/etc/dhcpd/"},
+};
+const tolerances boot_steps{
+    {"KLIBCFileSetKeyValue /etc/dhcpd/dhcpd-pxe", "the settings are several keys; each is written whole", -1,
+     "dhcpd-pxe-setting"},
+    {"KLIBCExec /bin/mkdir", "the switch is set before the rest", -1, "dhcpd-pxe-setting"},
+};
+const tolerances vendor_steps{
+    {"KLIBCFileExist", "lines of a file that is not there need not go", kAnyResult, "dhcpd-vendor.conf"},
+    {"KLIBCFileRemoveKey", "the old lines go before the new ones are added, each whole", -1, "dhcpd-vendor.conf"},
+    {"KLIBCFileAddLine", "the old lines go before the new ones are added, each whole", -1, "dhcpd-vendor.conf"},
+};
 
 const char *const kOld[] = {"eth0"};
 const char *const kNew[] = {"bond0"};
@@ -249,12 +544,59 @@ const std::vector<scenario> &scenarios() {
         {"BlKLIBIsValidIpMask", CALL(BlKLIBIsValidIpMask("192.168.1.10", "255.255.0.0")), pure},
         {"BlKLIBIsv6IpAddrValid", CALL(BlKLIBIsv6IpAddrValid("fe80::1/64")), pure},
         {"BlKOVALnxIsDHCP", CALL(BlKOVALnxIsDHCP("eth1")), failure::zero, protocol},
-        {"BlKOVALnxIsDHCP/repair", CALL(BlKOVALnxIsDHCP("eth0")), no_protocol, failure::zero, protocol},
+        {"BlKOVALnxIsDHCP/repair", CALL(BlKOVALnxIsDHCP("eth0")), no_protocol, failure::like_zero, protocol},
+        {"DHCPDConfChangeInterface", CALL(DHCPDConfChangeInterface("eth0", "lan0")), dhcp_subnets},
+        {"DHCPDLinkAggrSet/into", CALL(DHCPDLinkAggrSet(1, "bond0", it.list)), members_with_switches, handed_on},
+        {"DHCPDLinkAggrSet/apart", CALL(DHCPDLinkAggrSet(0, "bond0", it.list)), members_with_switches, handed_on},
+        {"DHCPGetInterfaceRanges", read_ranges, dhcp_subnets},
+        {"DHCPInterfaceIsEnabled", CALL(DHCPInterfaceIsEnabled("eth0", 1)), dhcp_switches, failure::below_one},
+        {"DHCPInterfaceListGet", list_served_interfaces, dhcp_switches, listed_files},
+        {"DHCPInterfaceSetEnabled/new", CALL(DHCPInterfaceSetEnabled("eth0", 0, 1)), logged_switch},
+        {"DHCPInterfaceSetEnabled/change", CALL(DHCPInterfaceSetEnabled("eth0", 1, 0)), dhcp_switches, logged_switch},
+        {"DHCPIsEnabled", CALL(DHCPIsEnabled()), dhcp_switches, failure::zero},
+        {"DHCPIsRangeConflict",
+         CALL(DHCPIsRangeConflict("eth1", "10.1.0.0", "10.1.0.9", "255.255.255.128", it.text, 16)), dhcp_subnets,
+         listed_files},
+        {"DHCPOptionFree", CALL((DHCPOptionFree(std::exchange(it.subnet.options, nullptr)), 0)), options_to_free, pure},
+        {"DHCPOptionIsListValue", CALL(DHCPOptionIsListValue(42)), pure},
+        {"DHCPPXEConfGet", read_boot_settings, remote_boot_to_change},
+        {"DHCPPXEConfGetEnable", read_boot_switch, remote_boot_to_change},
+        {"DHCPPXEConfSet/new", CALL(DHCPPXEConfSet(&it.boot)), local_boot_to_set, boot_steps, in_place},
+        {"DHCPPXEConfSet/change", CALL(DHCPPXEConfSet(&it.boot)), remote_boot_to_change, boot_steps, in_place},
+        {"DHCPPXEConfSetEnable/new", CALL(DHCPPXEConfSetEnable(1)), boot_steps},
+        {"DHCPPXEConfSetEnable/change", CALL(DHCPPXEConfSetEnable(0)), remote_boot_to_change, boot_steps},
+        {"DHCPRangeFree", CALL((DHCPRangeFree(std::exchange(it.ranges, nullptr)), 0)), ranges_to_free, pure},
+        {"DHCPServerRestart", CALL(DHCPServerRestart()), failure::not_zero, script_status},
+        {"DHCPServerStart", CALL(DHCPServerStart()), failure::not_zero, script_status},
+        {"DHCPTagConfGet/ipv4", read_subnet, dhcp_subnets, failure::below_one, dhcp_switch},
+        {"DHCPTagConfGet/ipv6", CALL(DHCPTagConfGet("eth0", 0, 1, &it.subnet)), dhcp_subnets, failure::below_one,
+         dhcp_switch},
+        {"DHCPTagConfGetEnable", CALL(DHCPTagConfGetEnable("eth0", 0, 0, &it.number)), dhcp_subnets, failure::below_one,
+         dhcp_switch},
+        {"DHCPTagConfSet/new", CALL(DHCPTagConfSet("eth0", 0, 0, &it.subnet)), subnet_to_set, in_place},
+        {"DHCPTagConfSet/change", CALL(DHCPTagConfSet("eth0", 0, 0, &it.subnet)), subnet_to_change, in_place},
+        {"DHCPTagConfSet/ipv6", CALL(DHCPTagConfSet("eth0", 0, 1, &it.subnet)), v6_subnet_to_change, in_place},
+        {"DHCPTagConfSetConfig/ipv4", CALL(DHCPTagConfSetConfig("eth0", 0, 0, &it.subnet)), subnet_to_change, in_place},
+        {"DHCPTagConfSetConfig/ipv6", CALL(DHCPTagConfSetConfig("eth0", 0, 1, &it.subnet)), v6_subnet_to_set, in_place},
+        {"DHCPTagConfSetEnable/new", CALL(DHCPTagConfSetEnable("eth0", 0, 0, 1)), in_place},
+        {"DHCPTagConfSetEnable/change", CALL(DHCPTagConfSetEnable("eth0", 0, 1, 0)), dhcp_subnets, in_place},
+        {"DHCPVendorCheckOptNum", CALL(DHCPVendorCheckOptNum("43")), pure},
+        {"DHCPVendorEnum", CALL(DHCPVendorEnum(&it.list)), vendors},
+        {"DHCPVendorGetVendor", CALL(DHCPVendorGetVendor("MSFT", &it.map)), vendors},
+        {"DHCPVendorGetVendorOpt", CALL(DHCPVendorGetVendorOpt("MSFT", 2, it.text, sizeof it.text)), vendors,
+         failure::below_one},
+        {"DHCPVendorSetVendor/new", CALL(DHCPVendorSetVendor("MSFT", it.map)), vendor_to_set, vendor_steps},
+        {"DHCPVendorSetVendor/change", CALL(DHCPVendorSetVendor("MSFT", it.map)), vendor_to_change, vendor_steps},
+        {"DHCPVendorSetVendorOpt/new", CALL(DHCPVendorSetVendorOpt("MSFT", 2, "new")), vendor_steps},
+        {"DHCPVendorSetVendorOpt/change", CALL(DHCPVendorSetVendorOpt("MSFT", 2, "new")), vendors, vendor_steps},
+        {"DefaultGatewayGet", CALL(DefaultGatewayGet(it.text, sizeof it.text, it.names[0], sizeof it.names[0])),
+         default_route},
         {"ErrKLIBIpMaskToSubnet", CALL(ErrKLIBIpMaskToSubnet(strcpy(it.text, "10.0.0.1/255.0.0.0"), it.names[0])),
          pure},
         {"ErrKLIBSubnetToIpMask", CALL(ErrKLIBSubnetToIpMask(strcpy(it.text, "10.0.0.1/8"), nullptr)), pure},
         {"KLIBIsIpInRange", CALL(KLIBIsIpInRange("10.0.0.2", "10.0.0.1", "10.0.0.3", 2)), pure},
         {"KLIBNetBridgeIfIsSlave", CALL(KLIBNetBridgeIfIsSlave("eth0")), bridge_port, failure::zero},
+        {"KLIBNetDHCPServerRestart", CALL(KLIBNetDHCPServerRestart())},
         {"KLIBNetGetIfCfg", CALL(KLIBNetGetIfCfg("eth0", "IPADDR", it.text, sizeof it.text))},
         {"KLIBNetGetInterfaceInfo", CALL(KLIBNetGetInterfaceInfo(it.records, 32, 2)), two_vlans, cards},
         {"KLIBNetGetInterfaceInfo/cluster", CALL(KLIBNetGetInterfaceInfo(it.records, 32, 5)), cluster, cards},
@@ -286,23 +628,46 @@ const std::vector<scenario> &scenarios() {
              return records != nullptr;
          },
          failure::zero},
+        {"KLIBServicePlugin", CALL(KLIBServicePlugin(1, KLIB_SERVICE_IP_CHANGE)), dispatch},
+        {"KLIBServiceStopBeforeIPChange", CALL(KLIBServiceStopBeforeIPChange())},
         {"KOVAExternalIPGet", CALL(KOVAExternalIPGet(it.text, sizeof it.text))},
         {"KOVAGetMTU", CALL(KOVAGetMTU("eth0")), failure::below_one},
         {"KOVAGetMTUSetting", CALL(KOVAGetMTUSetting("eth0")), failure::below_one},
         {"KOVAGetMTUSetting/switch bond", CALL(KOVAGetMTUSetting("ovs_bond0")), virtual_switch, failure::below_one,
          switch_ports},
         {"KOVAGetMTUSetting/switch port", CALL(KOVAGetMTUSetting("ovs_eth0")), virtual_switch, failure::below_one},
+        {"KOVAIGetDHCPTestNetInfo", CALL(KOVAIGetDHCPTestNetInfo(&it.card)), lease_to_ask_for},
         {"KOVAILnxGetIP", CALL(KOVAILnxGetIP("eth0", it.text, sizeof it.text))},
         {"KOVAILnxGetIPFromCfg", CALL(KOVAILnxGetIPFromCfg("eth0", it.text, sizeof it.text))},
         {"KOVAILnxSetIPNetmask", CALL(KOVAILnxSetIPNetmask("eth0", "192.168.1.20", "255.255.255.0")), backed_up,
          announced},
+        {"KOVALnxGetHostname", CALL(KOVALnxGetHostname(it.text))},
         {"KOVALnxIPv6FlushAddr", CALL(KOVALnxIPv6FlushAddr("eth0")), off_and_on},
         {"KOVALnxIPv6ProcAction/enable", CALL(KOVALnxIPv6ProcAction("eth0", 0)), off_and_on},
         {"KOVALnxIPv6ProcAction/disable", CALL(KOVALnxIPv6ProcAction("eth0", 1)), off_and_on},
+        {"KOVALnxSetHostname", CALL(KOVALnxSetHostname("kova")), host_names, host_name},
         {"KOVALnxV6IPGet", CALL(KOVALnxV6IPGet("eth0", it.addresses, 16)), address_list},
         {"KOVANetCalBroadcast", CALL(KOVANetCalBroadcast("192.168.1.10/24", it.text, sizeof it.text)), calculator},
         {"KOVANetCalNetwork", CALL(KOVANetCalNetwork("192.168.1.10/24", it.text, sizeof it.text)), calculator},
         {"KOVANetDNSChangeHook", CALL(KOVANetDNSChangeHook(KLIB_PLUGIN_POST, it.list))},
+        {"KOVANetDNSFileSet", CALL(KOVANetDNSFileSet(it.list, it.list)), resolver, told, made_again},
+        {"KOVANetDNSGet", CALL(give_back_a_lock(it, KOVANetDNSGet(it.text, sizeof it.text))), resolver, server_list},
+        {"KOVANetDNSListGet", CALL(give_back_a_lock(it, KOVANetDNSListGet(&it.list))), resolver, server_list},
+        {"KOVANetDNSListSet/new", CALL(KOVANetDNSListSet(it.list)), told, made_again},
+        {"KOVANetDNSListSet/change", CALL(KOVANetDNSListSet(it.list)), automatic_resolver, told, made_again},
+        {"KOVANetDNSModeSet/static", CALL(KOVANetDNSModeSet("static")), automatic_resolver, told, made_again},
+        {"KOVANetDNSModeSet/auto", CALL(KOVANetDNSModeSet("auto")), automatic_resolver, told, made_again},
+        {"KOVANetDNSSet", CALL(KOVANetDNSSet("10.0.0.3")), resolver, told, made_again},
+        {"KOVANetDNSUpdate/static", CALL(KOVANetDNSUpdate()), resolver, told, made_again},
+        {"KOVANetDNSUpdate/auto", CALL(KOVANetDNSUpdate()), automatic_resolver, told, made_again},
+        {"KOVANetDefaultGatewayGet", CALL(KOVANetDefaultGatewayGet(it.text, sizeof it.text)), default_route},
+        {"KOVANetDefaultGatewayGetConf", CALL(KOVANetDefaultGatewayGetConf(it.text, sizeof it.text)), gateway_conf},
+        {"KOVANetDefaultGatewayInterfaceGet", CALL(KOVANetDefaultGatewayInterfaceGet(it.text, sizeof it.text)),
+         default_route},
+        {"KOVANetDefaultGatewaySet", CALL(KOVANetDefaultGatewaySet("192.168.1.1")), old_route},
+        {"KOVANetDefaultGatewaySetConf/new", CALL(KOVANetDefaultGatewaySetConf("192.168.1.2"))},
+        {"KOVANetDefaultGatewaySetConf/change", CALL(KOVANetDefaultGatewaySetConf("192.168.1.2")), gateway_conf},
+        {"KOVANetDefaultGatewaySetConf/none", CALL(KOVANetDefaultGatewaySetConf("")), gateway_conf},
         {"KOVANetDnsConfigChangeHook", CALL(KOVANetDnsConfigChangeHook(KLIB_PLUGIN_POST, "eth0", it.list))},
         {"KOVANetEnumCard", CALL(KOVANetEnumCard(2)), cards},
         {"KOVANetFlushIP/ipv4", CALL(KOVANetFlushIP("-4", "eth0"))},
@@ -313,8 +678,10 @@ const std::vector<scenario> &scenarios() {
         {"KOVANetGetCard1", CALL(KOVANetGetCard1(0, nullptr, &it.card)), failure::below_one, cards, protocol},
         {"KOVANetGetCard1/address", CALL(KOVANetGetCard1(0, "192.168.2.10", &it.card)), failure::below_one, cards,
          protocol},
-        {"KOVANetGetCard1Ex/cluster", CALL(KOVANetGetCard1Ex(0, "10.9.0.2", 6, &it.card)), cluster, failure::below_one,
-         cards, protocol},
+        {"KOVANetGetCard1Ex/cluster", CALL(KOVANetGetCard1Ex(0, "10.9.0.2", 0x12, &it.card)), cluster,
+         failure::below_one, cards, protocol},
+        {"KOVANetGetDhcpServerConf", CALL(KOVANetGetDhcpServerConf("office", "eth0", &it.subnet)), dhcp_subnets,
+         failure::zero, dhcp_switch},
         {"KOVANetGetEthInfo", CALL(KOVANetGetEthInfo(&it.ethernet, "eth0"))},
         {"KOVANetGetEthInfo/switch bond", CALL(KOVANetGetEthInfo(&it.ethernet, "ovs_bond0")), virtual_switch,
          switch_ports},
@@ -324,7 +691,7 @@ const std::vector<scenario> &scenarios() {
         {"KOVANetIFGetIPConfig", CALL(KOVANetIFGetIPConfig("eth0", &it.card)), protocol},
         {"KOVANetIFGetIPConfig/dhcp", CALL(KOVANetIFGetIPConfig("eth1", &it.card)), protocol},
         {"KOVANetIFGetInfo", CALL(KOVANetIFGetInfo("eth0", it.records, &it.card)), protocol},
-        {"KOVANetIFGetInfoEx/cluster", CALL(KOVANetIFGetInfoEx("eth0", 6, it.records, &it.card)), cluster, protocol},
+        {"KOVANetIFGetInfoEx/cluster", CALL(KOVANetIFGetInfoEx("eth0", 0x12, it.records, &it.card)), cluster, protocol},
         {"KOVANetIP2If", CALL(KOVANetIP2If("192.168.2.10", it.text, sizeof it.text)), failure::below_one, cards},
         {"KOVANetIPChangePreHook", CALL(KOVANetIPChangePreHook(1, "eth0", "fe80::1", "fe80::2", 64))},
         {"KOVANetIPv6IPAction", CALL(KOVANetIPv6IPAction(0, "eth0", "fe80::2", 64, nullptr)), announced},
@@ -360,12 +727,25 @@ const std::vector<scenario> &scenarios() {
         {"KOVANetSetCard1/static", CALL(KOVANetSetCard1(&it.card, nullptr)), card_to_set, backed_up, announced,
          housekeeping},
         {"KOVANetSetCard1/dhcp", CALL(KOVANetSetCard1(&it.card, nullptr)), dhcp_card_to_set, backed_up, housekeeping},
+        {"KOVANetSetDhcpServerConfigFiles/new", CALL(KOVANetSetDhcpServerConfigFiles(&it.subnet, 1)), subnet_to_set,
+         failure::zero, in_place_tagged},
+        {"KOVANetSetDhcpServerConfigFiles/change", CALL(KOVANetSetDhcpServerConfigFiles(&it.subnet, 1)),
+         subnet_to_change, failure::zero, in_place_tagged},
         {"KOVANetSetIP/ipv4", CALL(KOVANetSetIP("-4", "eth0", "192.168.1.20", 24, "add")), announced},
         {"KOVANetSetIP/ipv4 without link", CALL(KOVANetSetIP("-4", "eth0", "192.168.1.10", 24, "add")), without_link,
          announced, calculator, route_update},
         {"KOVANetSetIP/ipv4 del", CALL(KOVANetSetIP("-4", "eth0", "192.168.1.10", 24, "del"))},
         {"KOVANetSetIP/ipv6", CALL(KOVANetSetIP("-6", "eth0", "2001:db8::1", 64, "add")), announced},
         {"KOVANetSetIfBlock", CALL(KOVANetSetIfBlock("eth0", 1, 1)), block_steps},
+        {"KOVANetStaticDNSListGet", CALL(KOVANetStaticDNSListGet(&it.list)), resolver, server_list},
+        {"NetRoutetableCheck", CALL(NetRoutetableCheck()), two_without_link, cards, protocol, known_kind, route_tools},
+        {"NetRoutetableEdit/add", CALL(NetRoutetableEdit(NET_ROUTE_ADD, "10.0.0.1", "255.0.0.0", "eth0")), route_tools},
+        {"NetRoutetableEdit/delete", CALL(NetRoutetableEdit(NET_ROUTE_DELETE, "10.0.0.1", "255.0.0.0", "eth0")),
+         route_tools},
+        {"NetRoutetableHandler/add", CALL(NetRoutetableHandler(NET_ROUTE_ADD, "eth0")), cards, protocol, known_kind,
+         route_tools},
+        {"NetRoutetableHandler/dhcp", CALL(NetRoutetableHandler(NET_ROUTE_DELETE, "eth1")), cards, protocol, known_kind,
+         route_tools},
         {"cKLIBICalMask", CALL(cKLIBICalMask(kMask)), pure},
         {"cKLIBISepIP", CALL(cKLIBISepIP("10.0.0.1", reinterpret_cast<uint32_t *>(it.text))), pure},
     };

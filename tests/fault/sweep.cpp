@@ -263,6 +263,7 @@ bool says_failure(failure how, long result) {
     case failure::below_zero:
         return result < 0;
     case failure::zero:
+    case failure::like_zero:
         return result == 0;
     case failure::below_one:
         return result < 1;
@@ -273,7 +274,7 @@ bool says_failure(failure how, long result) {
 }
 
 bool is_about(const tolerance &entry, const std::string &point) {
-    return (" > " + point).find(" > " + entry.at) != std::string::npos;
+    return (" > " + point + " ").find(" > " + entry.at) != std::string::npos;
 }
 
 const tolerance *tolerance_of(const scenario &one, const std::string &point) {
@@ -398,6 +399,9 @@ report run(const scenario &one, const fault_plan &plan) {
 
 texts sweep(const scenario &one, const report &clean) {
     texts wrong;
+    if (one.fails_with != failure::like_zero && says_failure(one.fails_with, clean.result)) {
+        wrong.push_back(one.name + " answers " + std::to_string(clean.result) + " although nothing fails");
+    }
     std::set<std::string> begun; // operations, each within its outermost call
     for (size_t number = 0; number < clean.met.size(); ++number) {
         const std::string &point = clean.met[number];

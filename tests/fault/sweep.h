@@ -40,14 +40,24 @@ struct world {
     NETSTAT statistics[32];
     KOVAV6IP addresses[16];
     KOVALINKAGGROPT bond;
+    KLIBSZHASH *map; ///< empty
+    DHCP_TAG_CONF subnet = {};
+    DHCP_PXE_CONF boot = {};
+    DHCP_RANGE *ranges = nullptr;
 };
 
 /** How a function's result says that it failed. */
-enum class failure { below_zero, zero, below_one, not_zero };
+enum class failure {
+    below_zero,
+    zero,
+    below_one,
+    not_zero,
+    like_zero ///< zero, which is the call's answer also when nothing fails
+};
 
 /** A failure that a function gets over by design. */
 struct tolerance {
-    std::string at;               ///< what the point, or a call around it, begins with
+    std::string at;               ///< what the point, or a call around it, begins with; a blank at the end: what it is
     std::string reason;           ///< why, in one line
     std::optional<long> result{}; ///< what the function answers then; without one as when nothing failed
     std::string file{};           ///< file that may be in between, by a part of its path

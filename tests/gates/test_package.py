@@ -63,7 +63,7 @@ def test_readme_example_compiles_as_printed(tmp_path):
     build_with_pkg_config(tmp_path / "example.c", tmp_path / "example")
 
 
-def test_readme_names_what_is_there():
-    text = (ROOT / "README.md").read_text()
-    for target in re.findall(r"\]\(([^)#]+)\)", text):
-        assert (ROOT / target).exists(), f"README.md links to {target}"
+@pytest.mark.parametrize("page", ["README.md", *(str(path.relative_to(ROOT)) for path in ROOT.glob("docs/*.md"))])
+def test_pages_name_what_is_there(page):
+    for target in re.findall(r"\]\(([^)#]+)\)", (ROOT / page).read_text()):
+        assert (ROOT / page).parent.joinpath(target).exists(), f"{page} links to {target}"

@@ -14,6 +14,8 @@ import time
 
 import pytest
 
+# programs start much slower in a guest, so everything may take longer there
+SLOWNESS = 5 if "KOVA_GUEST" in os.environ else 1
 KOVANET = "/usr/bin/kovanet"
 DOCUMENT = pathlib.Path(__file__).resolve().parents[2] / "docs" / "kovanet-json.md"
 DONE, NO, USAGE, NOT_FOUND, CALL_FAILED, NO_PERMISSION = range(6)  # kovanet's exit codes
@@ -22,13 +24,14 @@ OTHER_SIDE = ("ip", "netns", "exec", "net")
 
 
 def pytest_runtest_setup(item):
-    # the tests of the box itself make boxes, from outside
-    if "KOVA_BOX" not in os.environ and item.path.name != "test_box.py":
+    # the tests of the lab itself make boxes, from outside
+    if "KOVA_BOX" not in os.environ and item.path.name not in ("test_box.py", "test_guest.py"):
         pytest.fail("lab tests write to /etc and /sbin: run them inside the box", pytrace=False)
 
 
 def wait_for(condition, limit=10.0, what="the condition"):
     """The first true value of condition(); fails the test when it takes longer than limit seconds."""
+    limit *= SLOWNESS
     end = time.monotonic() + limit
     while True:
         value = condition()
@@ -41,7 +44,7 @@ def wait_for(condition, limit=10.0, what="the condition"):
 
 def run(*command, status=0, **options):
     """Runs a command to its end, captures what it prints and checks its exit status (None: any)."""
-    options = {"capture_output": True, "text": True, "timeout": 30, **options}
+    options = {"capture_output": True, "text": True, "timeout": 30 * SLOWNESS, **options}
     done = subprocess.run([str(word) for word in command], check=False, **options)
     assert status is None or done.returncode == status, f"{command}: {done.returncode}\n{done.stdout}{done.stderr}"
     return done

@@ -7,13 +7,27 @@ class NetInfo(ctypes.Structure):
                 ("abMac", ctypes.c_ubyte * 6), ("szIP", ctypes.c_char * 20), ("szMask", ctypes.c_char * 20)]
 
 
+class DhcpOption(ctypes.Structure):
+    pass  # its fields name it
+
+
+DhcpOption._fields_ = [("number", ctypes.c_int32), ("name", ctypes.c_char * 52), ("value", ctypes.c_char * 1024),
+                       ("items", ctypes.c_void_p), ("next", ctypes.POINTER(DhcpOption))]
+
+
+class DhcpPxeConf(ctypes.Structure):
+    _fields_ = [("enabled", ctypes.c_int32), ("is_remote_tftp", ctypes.c_int32),
+                ("local_bootloader", ctypes.c_char * 4096), ("remote_bootloader", ctypes.c_char * 4096),
+                ("remote_tftp_server_ip", ctypes.c_char * 20)]
+
+
 class DhcpTagConf(ctypes.Structure):
     _fields_ = [("enabled", ctypes.c_int32), ("reserved", ctypes.c_int32), ("lease_time", ctypes.c_int32),
                 ("start_ip", ctypes.c_char * 46), ("end_ip", ctypes.c_char * 46), ("ifname", ctypes.c_char * 16),
                 ("domain", ctypes.c_char * 4096), ("dns1", ctypes.c_char * 46), ("dns2", ctypes.c_char * 46),
                 ("dns_more", ctypes.c_char * 4096), ("netmask", ctypes.c_char * 46), ("router", ctypes.c_char * 46),
                 ("reserved_text", ctypes.c_char * 4096), ("tag", ctypes.c_char * 20), ("v6_mode", ctypes.c_char * 20),
-                ("options", ctypes.c_void_p)]
+                ("options", ctypes.POINTER(DhcpOption))]
 
 
 DHCP, STATIC = 0, 1
@@ -21,6 +35,7 @@ library = ctypes.CDLL("libkovanetsdk.so.6")
 core = ctypes.CDLL("libkovacore.so.6")
 core.KLIBCErrGet.restype = ctypes.c_uint32
 core.KLIBCErrorGetFile.restype = ctypes.c_char_p
+core.KLIBCSzListAlloc.restype = core.KLIBCSzHashAlloc.restype = ctypes.c_void_p
 
 
 def card(source, name, address="", mask=""):
@@ -42,3 +57,43 @@ def get_card(index):
 def register():
     """The error register: code and unit."""
     return core.KLIBCErrGet(), core.KLIBCErrorGetFile().decode()
+
+
+def string_list(texts):
+    """A platform's list, as a pointer; freed with the process."""
+    made = ctypes.c_void_p(core.KLIBCSzListAlloc(len(texts) or 1))
+    for text in texts:
+        assert core.KLIBCSzListPush(ctypes.byref(made), text.encode()) == 0
+    return made
+
+
+def string_map(texts):
+    """A platform's map, as a pointer; freed with the process."""
+    made = ctypes.c_void_p(core.KLIBCSzHashAlloc(len(texts) or 1))
+    for key, value in texts.items():
+        assert core.KLIBCSzHashSetValue(made, key.encode(), value.encode()) == 0
+    return made
+
+
+def dhcp_options(options):
+    """The first record of a list of options, each a number, a name and a text or a list of texts; None without any."""
+    head = None
+    for number, name, value in reversed(options):
+        record = DhcpOption(number=number, name=name.encode())
+        if isinstance(value, str):
+            record.value = value.encode()
+        else:
+            record.items = string_list(value)
+        if head is not None:
+            record.next = ctypes.pointer(head)
+        head = record
+    return head
+
+
+def dhcp_subnet(options=(), **fields):
+    """A DhcpTagConf from texts and numbers."""
+    conf = DhcpTagConf(**{name: value.encode() if isinstance(value, str) else value for name, value in fields.items()})
+    head = dhcp_options(list(options))
+    if head is not None:
+        conf.options = ctypes.pointer(head)
+    return conf

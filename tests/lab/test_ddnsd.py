@@ -9,7 +9,7 @@ import sys
 import time
 
 import pytest
-from conftest import OTHER_SIDE, Daemon, on_other_side, processes, run, wait_for
+from conftest import OTHER_SIDE, SLOWNESS, Daemon, on_other_side, processes, run, wait_for
 
 DDNSD = "/usr/kova/sbin/ddnsd"
 SERVICE = "/usr/kova/service/ddns"
@@ -117,7 +117,7 @@ def test_silent_server_is_not_waited_for_forever(tmp_path):
     with Server(tmp_path, silent=True):
         began = time.monotonic()
         ask(status=1)
-        assert 7 < time.monotonic() - began < 12
+        assert 7 < time.monotonic() - began < 12 * SLOWNESS
     assert not RESULT.exists()
 
 
@@ -188,7 +188,7 @@ def test_reload_does_not_wait_for_the_server(tmp_path):
         wait_for(lambda: server.asked() == 1, what="the first question")
         began = time.monotonic()
         run(SERVICE, "reload")
-        assert time.monotonic() - began < 1
+        assert time.monotonic() - began < 1 * SLOWNESS
         assert is_running()
 
 

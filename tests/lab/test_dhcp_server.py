@@ -4,41 +4,26 @@
 import ctypes
 import os
 import pathlib
-import shutil
 import socket
 import subprocess
-import time
 
 import pytest
-from conftest import OTHER_SIDE, DhcpServer, addresses, is_up, on_other_side, processes, run, wait_for
+from conftest import DhcpServer, addresses, is_up, processes, run, wait_for
+from dhcp_lab import (
+    CLIENT, FILES, LEASES, PID, SERVED, SERVER, V4, bring_up, clean_server, dhclient, served_lines, switch,
+)  # fmt: skip
 from sdk import DhcpTagConf, NetInfo, core, library, register
 
-CLIENT = "/usr/kova/sbin/dhclient"
-SERVER = "dnsmasq --conf-file=/run/kova/dhcp-server/dnsmasq.conf"
-FILES = pathlib.Path("/etc/dhcpd")
-SERVED = pathlib.Path("/run/kova/dhcp-server/dnsmasq.conf")
-PID = pathlib.Path("/run/kova/dhcp-server/dnsmasq.pid")
 LINKS = ("eth0", "kx12")
-V4 = 0
 
 
 @pytest.fixture(autouse=True)
-def clean_server():
-    shutil.rmtree(FILES, ignore_errors=True)
-    yield
-    shutil.rmtree(FILES, ignore_errors=True)
-    run("/etc/rc.network", "nat-restart-dhcp")
-    assert not processes(SERVER)
-    for link in LINKS:
-        run("/sbin/stop", "dhcp-client", f"IFACE={link}")
-        for side in ([], ["-n", "net"]):
-            run("ip", *side, "addr", "flush", "dev", link)
-        pathlib.Path(f"/tmp/dhcpv4.leases.{link}").unlink(missing_ok=True)
-
-
-def switch(name, on=True):
-    FILES.mkdir(exist_ok=True)
-    (FILES / f"{name}.info").write_text(f'enable="{"yes" if on else "no"}"\n')
+def server():
+    with clean_server(*LINKS):
+        yield
+        for link in LINKS:
+            run("/sbin/stop", "dhcp-client", f"IFACE={link}")
+            pathlib.Path(f"/tmp/dhcpv4.leases.{link}").unlink(missing_ok=True)
 
 
 def subnet(link, network, tag="lan", dns=("192.168.60.53", "192.168.60.54"), domain="lab.example"):
@@ -52,34 +37,14 @@ def subnet(link, network, tag="lan", dns=("192.168.60.53", "192.168.60.54"), dom
 
 def configure(link, network, **more):
     """Switches service and interface on, gives the interface its address, and has the library write the subnet."""
-    run("ip", "addr", "replace", f"{network}.1/24", "dev", link)
-    run("ip", "link", "set", link, "up")
-    on_other_side("ip", "link", "set", link, "up")
+    bring_up(link, f"{network}.1/24")
     switch("dhcpd")
     assert library.DHCPInterfaceSetEnabled(link.encode(), V4, 1) == 0
     assert library.KOVANetSetDhcpServerConfigFiles(ctypes.byref(subnet(link, network, **more)), 1) == 1
 
 
-def served_lines():
-    return [line for line in SERVED.read_text().splitlines() if line]
-
-
-def ask(link, folder, status=None):
-    """What a client on the other side is leased, by the names its script sees; nothing when no server answers."""
-    lease, script, conf = folder / "lease", folder / "script", folder / "dhclient.conf"
-    lease.unlink(missing_ok=True)
-    script.write_text(
-        '#!/bin/sh\n[ "$reason" != BOUND ] || { env >"$LEASE.new" && mv "$LEASE.new" "$LEASE" && kill $PPID; }\n'
-    )
-    script.chmod(0o755)
-    conf.write_text(
-        "initial-interval 1;\ntimeout 20;\nrequest subnet-mask, routers, domain-name-servers, domain-search, "
-        "interface-mtu, ntp-servers;\n"
-    )
-    run(*OTHER_SIDE, CLIENT, "-4", "-1", "-d", "-cf", conf, "-lf", folder / f"leases.{time.monotonic_ns()}",
-        "-pf", folder / "pid", "-sf", script, "-e", f"LEASE={lease}", link, status=status, timeout=60)  # fmt: skip
-    lines = lease.read_text().splitlines() if lease.exists() else []
-    return dict(line.removeprefix("new_").split("=", 1) for line in lines if line.startswith("new_"))
+def ask(link, folder):
+    return dhclient(link, folder, request=("subnet-mask", "routers", "domain-name-servers", "domain-search"))
 
 
 def test_client_gets_what_the_library_wrote(tmp_path):
@@ -118,7 +83,7 @@ def test_lease_is_remembered_over_a_restart(tmp_path):
     assert library.DHCPServerRestart() == 0
     leased = ask("eth0", tmp_path)["ip_address"]
     assert library.DHCPServerRestart() == 0
-    assert leased in pathlib.Path("/var/lib/kova/dhcp-server.leases").read_text()
+    assert leased in LEASES.read_text()
 
 
 @pytest.mark.parametrize("name", ["dhcpd", "dhcpd-eth0", "dhcpd-eth0-lan"])
@@ -147,7 +112,7 @@ def test_only_what_is_switched_on_is_served():
         "dhcpd-eth0-static": "dhcp-host=02:00:00:00:00:01,192.168.60.30",
         "dhcpd-kx12-static": "dhcp-host=02:00:00:00:00:02,192.168.61.30",
         "dhcpd-vendor": "dhcp-option=vendor:MSFT,2,1i",
-        "dhcpd-pxe": "dhcp-boot=tag:pxe,pxelinux.0",
+        "dhcpd-pxe": "dhcp-vendorclass=set:pxe,PXEClient",
         "wpad-eth0": "dhcp-option=tag:lan,252,http://192.168.60.1/wpad.dat",
         "wpad-kx12": "dhcp-option=tag:lan,252,http://192.168.61.1/wpad.dat",
         "dhcpd-eth0-subnet0": "interface=eth0\ndhcp-range=set:eth00,192.168.62.10,192.168.62.20,255.255.255.0,600",
@@ -187,7 +152,9 @@ def test_line_that_the_server_refuses_costs_only_itself(tmp_path, system_log):
 
 
 def test_lines_too_long_to_be_read_are_left_out(system_log):
-    configure("eth0", "192.168.60", domain="x" * 2000)
+    configure("eth0", "192.168.60")
+    with (FILES / "dhcpd-eth0-lan.conf").open("a") as fragment:
+        fragment.write(f"dhcp-option=tag:lan,option:domain-search,{'x' * 2000}\n")
     assert library.DHCPServerRestart() == 0
     wait_for(lambda: system_log.holds('": too long'))
     assert processes(SERVER)
@@ -214,6 +181,15 @@ def test_broken_fragment_costs_no_other_its_service(tmp_path, system_log, broken
     wait_for(lambda: system_log.holds("dhcpd-eth0-lan.conf: left out, "), what="the log line")
     assert [line for line in served_lines() if line.startswith("#")] == ["# dhcpd-kx12-lan"]
     assert ask("kx12", tmp_path)["routers"] == "192.168.61.1"
+
+
+def test_broken_fragment_read_last_is_no_failure(system_log):
+    configure("eth0", "192.168.60")
+    configure("kx12", "192.168.61")
+    (FILES / "dhcpd-kx12-lan.conf").write_text("interface=kx12\n")
+    assert library.KLIBNetDHCPServerRestart() == 0
+    wait_for(lambda: system_log.holds("dhcpd-kx12-lan.conf: left out, "))
+    assert [line for line in served_lines() if line.startswith("#")] == ["# dhcpd-eth0-lan"]
 
 
 def test_fragments_that_contradict_each_other_do_not_stop_the_service(system_log):
@@ -251,6 +227,17 @@ def test_missing_server_is_a_failure(keep):
     keep("/usr/sbin/dnsmasq").unlink()
     assert library.DHCPServerRestart() == 1
     assert "cannot run /usr/sbin/dnsmasq" in run("/etc/rc.network", "nat-start-dhcp", status=1).stderr
+
+
+@pytest.mark.parametrize("refuses", ["", 'case "$*" in *--test*) exit 0 ;; esac'], ids=["all", "the start"])
+def test_server_that_refuses_is_a_failure(keep, system_log, refuses):
+    configure("eth0", "192.168.60")
+    keep("/usr/sbin/dnsmasq").write_text(f"#!/bin/sh\n{refuses}\necho out of order >&2\nexit 5\n")
+    assert library.KLIBNetDHCPServerRestart() == -1
+    assert (library.DHCPServerStart(), library.DHCPServerRestart()) == (1, 1)
+    wait_for(lambda: system_log.holds("out of order"))
+    assert not system_log.holds("left out")
+    assert not processes(SERVER)
 
 
 def test_number_of_another_process_is_not_ended():
@@ -304,7 +291,7 @@ def test_network_is_asked_and_the_interface_left_alone(network, was_up):
     assert addresses("eth0") == before == []
     assert is_up("eth0") == was_up
     assert not processes(CLIENT)
-    assert info_file("eth0").read_text() == f"IPADDR={address}\nNETMASK={mask}\n"
+    assert info_file("eth0").read_text() == f"IPADDR={address}\nNETMASK={mask}\nOFFER=yes\n"
     assert not pathlib.Path("/etc/dhclient/ipv4/dhcpcd-eth0.pid").exists()
     assert not pathlib.Path("/etc/iproute2/config/resolv4.conf").exists()
 

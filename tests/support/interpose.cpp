@@ -11,7 +11,6 @@
 #include <dirent.h>
 #include <dlfcn.h>
 #include <fcntl.h>
-#include <glob.h>
 #include <kova/core.h>
 #include <kova/dhmx.h>
 #include <kova/ha.h>
@@ -626,12 +625,6 @@ extern "C" int access(const char *path, int mode) noexcept {
         return -1;
     }
     return real<int (*)(const char *, int)>("access")(meant(path).c_str(), mode);
-}
-
-extern "C" int glob(const char *pattern, int flags, int (*on_error)(const char *, int), glob_t *found) noexcept {
-    static const auto next = real<int (*)(const char *, int, int (*)(const char *, int), glob_t *)>("glob");
-    const fault_point point = path_point("glob", pattern, __builtin_return_address(0));
-    return is_failing(point, 0) ? GLOB_NOSPACE : next(pattern, flags, on_error, found);
 }
 
 extern "C" DIR *opendir(const char *path) {

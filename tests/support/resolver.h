@@ -48,7 +48,7 @@ class resolver_test : public unit_test {
 protected:
     void SetUp() override {
         unit_test::SetUp();
-        for (const std::string &path : {kResolvConf, kStaticConf, kOptionConf, std::string("/etc/iproute2/config")}) {
+        for (const std::string &path : {kResolvConf, kStaticConf, kOptionConf}) {
             std::filesystem::remove_all(path);
         }
     }

@@ -70,8 +70,8 @@ public:
 
     /**
      * Makes the nth next call of an operation fail: one of the platform, whose code is in the register then, or malloc,
-     * calloc, realloc, fopen, open, opendir, glob, access, socket, ioctl, or one of unit/failing_calls.cpp. A name that the
-     * rig does not know fails the test.
+     * calloc, realloc, fopen, open, opendir, access, socket, ioctl, or one of unit/failing_calls.cpp. A name that
+     * the rig does not know fails the test.
      */
     void fail(const std::string &operation, int nth = 1);
     /** The same, and every call after it. */

@@ -5,6 +5,7 @@
 #include <kovanetsdk/dhcp.h>
 
 using namespace kova_test;
+using namespace std::string_literals;
 
 namespace {
 
@@ -615,7 +616,7 @@ TEST_F(dhcp_conf, DHCPTagConfGet_badArguments_leaveTheRecordAlone) {
 TEST_F(dhcp_conf, DHCPTagConfGet_v4WithoutALine_isTold) {
     const std::string failed = "Failed to get DHCP Server config from [eth0, 0]";
     const std::string interface = "Failed to get key interface in " + kConf;
-    const std::string binary("\0\1\2\xff\xfe\n\0\n=\n,,,\n", 16);
+    const std::string binary = "\0\1\2\xff\xfe\n\0\n=\n,,,\n"s;
     for (const std::string &content :
          texts{"", "interface", "\n\n\n", binary, long_text(100000), long_text(5000) + "\n"}) {
         EXPECT_OUTCOME(get_v4(content), failure({interface, failed}));
@@ -724,9 +725,12 @@ TEST_F(dhcp_conf, DHCPTagConfGet_v4_whateverMemoryFails_leavesNothing) {
     }
 }
 
-TEST_F(dhcp_conf, DHCPTagConfGet_v4OptionsThatCannotBeRead_areTold) {
+TEST_F(dhcp_conf, DHCPTagConfGet_v4DomainOrOptionsThatCannotBeRead_areTold) {
     write_file(kConf, kFragment);
     // the fragment is opened for name servers, router, domain, and then for the options
+    rig.fail("fopen", 3);
+    EXPECT_OUTCOME(
+        get(), failure({"Failed to get key option:domain-search", "Failed to get DHCP Server config from [eth0, 0]"}));
     rig.fail("fopen", 4);
     EXPECT_OUTCOME(get(), failure({"Failed to open DHCP config [" + kConf + "] for reading",
                                    "Failed to get DHCP Server config from [eth0, 0]"}));

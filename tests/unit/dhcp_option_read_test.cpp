@@ -100,6 +100,12 @@ TEST_F(dhcp_option_read, overlongLine_isCutToItsRoom) {
     EXPECT_EQ((texts{"17 root-path [" + long_text(1023 - begin.size(), 'p') + "]", "26 mtu [1500]"}), found);
 }
 
+TEST_F(dhcp_option_read, carriageReturns_areDropped) {
+    EXPECT_OUTCOME(read("dhcp-option=tag:eth00,option:mtu,1500\r\ndhcp-option=tag:eth00,option:default-ttl,9\r"),
+                   {.result = 1});
+    EXPECT_EQ((texts{"26 mtu [1500]", "23 default-ttl [9]"}), found);
+}
+
 TEST_F(dhcp_option_read, binaryLines_doNoHarm) {
     const std::string begin = "dhcp-option=tag:eth00,option:root-path,";
     const outcome got = read(begin + std::string("a\0b\n", 4) + begin + "\xff\xfe\n" + std::string(3000, '\0') + "\n");

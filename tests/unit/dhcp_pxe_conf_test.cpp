@@ -130,6 +130,11 @@ TEST_F(dhcp_pxe_conf, DHCPPXEConfGet_keyThatCannotBeRead_isNamed) {
         EXPECT_EQ(-1, got.result);
         EXPECT_EQ((texts{reasons[static_cast<size_t>(key)], not_read}), got.log);
     }
+    rig.fail("KLIBCFileCheckKeyValue", 2); // the first is the switch
+    EXPECT_OUTCOME(get(), {.result = -1,
+                           .code = 0x900,
+                           .unit = "platform",
+                           .log = {"ERR dhcp_pxe_conf:N Failed to get [is_remote_tftp] key", not_read}});
 }
 
 TEST_F(dhcp_pxe_conf, DHCPPXEConfSetEnable_switch_goesToBothFiles) {

@@ -302,15 +302,24 @@ TEST_F(dhcp_range, DHCPIsRangeConflict_badArguments_areRefused) {
 
 TEST_F(dhcp_range, DHCPIsRangeConflict_failedList_fails) {
     serve("eth1", "10.0.0.1", "255.0.0.0");
-    rig.fail("glob");
+    rig.fail("KLIBCFileEnumDir");
     EXPECT_OUTCOME(
         conflict("eth0", "10.0.0.1", "255.0.0.0"),
         {.result = -1,
+         .code = 0x900,
+         .unit = "platform",
          .log = {"ERR dhcp_interface_list_get:N glob() error", "ERR dhcp_range:N Failed to get interface list"}});
     EXPECT_STREQ("", other);
-    rig.fail("KLIBCSzListGet");
+    rig.fail("KLIBCSzListGet", 4); // the first are of the files
     EXPECT_OUTCOME(conflict("eth0", "10.0.0.1", "255.0.0.0"),
                    {.result = -1, .log = {"ERR dhcp_range:N Failed to get interface from interface list"}});
+}
+
+TEST_F(dhcp_range, DHCPIsRangeConflict_nameThatNoInterfaceHas_isPassedOver) {
+    write_file("/etc/dhcpd/dhcpd-my eth.info", "enable=\"yes\"\n");
+    serve("eth1", "10.0.0.1", "255.0.0.0");
+    EXPECT_OUTCOME(conflict("eth0", "192.168.0.1", "255.255.255.0"), {.result = 0});
+    EXPECT_OUTCOME(conflict("eth0", "10.0.0.1", "255.0.0.0"), {.result = 1});
 }
 
 TEST_F(dhcp_range, DHCPIsRangeConflict_otherInterfaceThatCannotBeRead_fails) {

@@ -8,6 +8,7 @@ namespace {
 
 const std::string kFragment = "/etc/dhcpd/dhcpd-vendor.conf";
 const std::string kUnit = "ERR dhcp_vendor_check_opt_num:N ";
+const std::string kWarning = "WARNING dhcp_vendor_check_opt_num:N ";
 const texts kMkdir{"/bin/mkdir -p /etc/dhcpd"};
 const std::string kTwoVendors = "dhcp-option=vendor:MSFT,1,one\n"
                                 "dhcp-option=vendor:PXEClient,43,boot\n"
@@ -141,9 +142,11 @@ TEST_F(dhcp_vendor_check_opt_num, DHCPVendorGetVendor_overlongLine_isCut) {
     EXPECT_EQ((texts{"1=" + long_text(1023 - 26, 'v'), "2=two"}), content());
 }
 
-TEST_F(dhcp_vendor_check_opt_num, DHCPVendorGetVendor_fragmentThatCannotBeOpened_isTold) {
+TEST_F(dhcp_vendor_check_opt_num, DHCPVendorGetVendor_fragmentThatCannotBeRead_isTold) {
     write_file(kFragment, kTwoVendors);
     rig.fail("fopen");
+    EXPECT_OUTCOME(get("MSFT"), {.result = -1, .log = {kUnit + "Failed to read DHCP vendor config"}});
+    rig.redirect(kFragment, "/proc/self/mem"); // opens, and cannot be read at its beginning
     EXPECT_OUTCOME(get("MSFT"), {.result = -1, .log = {kUnit + "Failed to read DHCP vendor config"}});
 }
 
@@ -192,8 +195,10 @@ TEST_F(dhcp_vendor_check_opt_num, DHCPVendorGetVendorOpt_badArguments_areTold) {
         EXPECT_OUTCOME(get_option("MSFT", number), told("MSFT", number));
     }
     EXPECT_OUTCOME(rig.observe([] { return DHCPVendorGetVendorOpt("MSFT", 1, nullptr, 9); }), told("MSFT", 1));
-    EXPECT_OUTCOME(get_option("MSFT", 1, 0),
-                   {.result = -1, .log = {kUnit + "Failed to parse vendor opt line [], parameter error"}});
+    EXPECT_OUTCOME(
+        get_option("MSFT", 1, 0),
+        {.result = -1,
+         .log = {kUnit + "Failed to parse vendor opt line [dhcp-option=vendor:MSFT,1,one], parameter error"}});
     EXPECT_STREQ("untouched", value);
 }
 
@@ -370,9 +375,16 @@ TEST_F(dhcp_vendor_check_opt_num, DHCPVendorEnum_otherLines_arePassedOver) {
 TEST_F(dhcp_vendor_check_opt_num, DHCPVendorEnum_lineWithoutVendor_isToldAndPassedOver) {
     write_file(kFragment, "dhcp-option=vendor:,1,a\ndhcp-option=vendor:\ndhcp-option=vendor:V,1,a\n");
     EXPECT_OUTCOME(enumerate(), {.result = 0,
-                                 .log = {kUnit + "wrong format [dhcp-option=vendor:,1,a] in DHCP vendor config",
-                                         kUnit + "wrong format [dhcp-option=vendor:] in DHCP vendor config"}});
+                                 .log = {kWarning + "wrong format [dhcp-option=vendor:,1,a] in DHCP vendor config",
+                                         kWarning + "wrong format [dhcp-option=vendor:] in DHCP vendor config"}});
     EXPECT_EQ(texts{"V"}, found());
+}
+
+TEST_F(dhcp_vendor_check_opt_num, DHCPVendor_whatIsNoFile_cannotBeRead) {
+    shell("mkdir -p " + std::string(kFragment));
+    const outcome unreadable{.result = -1, .log = {kUnit + "Failed to read DHCP vendor config"}};
+    EXPECT_OUTCOME(enumerate(), unreadable);
+    EXPECT_OUTCOME(get("V"), unreadable);
 }
 
 TEST_F(dhcp_vendor_check_opt_num, DHCPVendorEnum_failures_areTold) {
@@ -384,6 +396,9 @@ TEST_F(dhcp_vendor_check_opt_num, DHCPVendorEnum_failures_areTold) {
     write_file(kFragment, kTwoVendors);
     rig.fail("fopen");
     EXPECT_OUTCOME(enumerate(), {.result = -1, .log = {kUnit + "Failed to read DHCP vendor config"}});
+    rig.redirect(kFragment, "/proc/self/mem"); // opens, and cannot be read at its beginning
+    EXPECT_OUTCOME(enumerate(), {.result = -1, .log = {kUnit + "Failed to read DHCP vendor config"}});
+    rig.redirect(kFragment, kFragment);
     rig.fail("KLIBCSzListPush");
     outcome got = enumerate();
     EXPECT_EQ(-1, got.result);

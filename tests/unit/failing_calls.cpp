@@ -29,8 +29,8 @@ int failure(int error) {
     return -1;
 }
 
-const bool known[] = {can_fail("fsync"), can_fail("fclose"), can_fail("rename"), can_fail("chmod"),
-                      can_fail("sethostname"), can_fail("KLIBCSzListGet")};
+const bool known[] = {can_fail("fsync"), can_fail("fclose"),      can_fail("rename"),
+                      can_fail("chmod"), can_fail("sethostname"), can_fail("KLIBCSzListGet")};
 
 } // namespace
 

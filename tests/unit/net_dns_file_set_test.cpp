@@ -85,6 +85,9 @@ TEST_F(net_dns_file_set, KOVANetDNSFileSet_entryThatIsNoLine_isRefused) {
     list.make_null(0);
     EXPECT_OUTCOME(rig.observe([&] { return KOVANetDNSFileSet(list.get(), nullptr); }),
                    refusal("net_dns_file_set", "are_lines(pServers)"));
+    const text_list servers{two};
+    EXPECT_OUTCOME(rig.observe([&] { return KOVANetDNSFileSet(servers.get(), list.get()); }),
+                   refusal("net_dns_file_set", "are_lines(pExtraLines)"));
     expect_untouched();
 }
 
@@ -92,7 +95,14 @@ TEST_F(net_dns_file_set, KOVANetDNSFileSet_eventThatFails_changesNothingElse) {
     rig.fail_from("KLIBPluginAction");
     const outcome got = set(two);
     EXPECT_EQ(0, got.result);
+    const std::string told = "ERR net_dns_change_hook:N KLIBPluginAction failed";
+    EXPECT_EQ((texts{told, told}), got.log); // before the change and after it
     EXPECT_EQ("nameserver\t10.0.0.1\nnameserver\tfe80::1\n", read_file(kResolvConf));
+}
+
+TEST_F(net_dns_file_set, KOVANetDNSFileSet_overlongServer_isWrittenWhole) {
+    EXPECT_EQ(0, set({long_text(100000)}).result);
+    EXPECT_EQ("nameserver\t" + long_text(100000) + "\n", read_file(kResolvConf));
 }
 
 TEST_F(net_dns_file_set, KOVANetDNSFileSet_noTemporaryFile_fails) {

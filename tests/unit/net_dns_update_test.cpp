@@ -119,6 +119,55 @@ TEST_F(net_dns_update, KOVANetDNSUpdate_tenThousandServers_areAllWritten) {
     EXPECT_EQ(servers, made_of(servers));
 }
 
+TEST_F(net_dns_update, KOVANetDNSUpdate_configuredServers_areReadLikeTheOthers) {
+    using namespace std::string_literals;
+    write_file(kKovaInfoConf, "dns_mode=\"static\"\n");
+    std::string many;
+    for (int i = 0; i < 10000; ++i) {
+        many += "nameserver\t10.2." + std::to_string(i / 250) + "." + std::to_string(i % 250) + "\n";
+    }
+    const std::map<std::string, std::string> made{
+        {many, many},
+        {"nameserver\t10\0.0.0.1\n\xff\xfe\x01\0\n"s, "nameserver\t10\nnameserver\t10\n"},
+        {"nameserver\t" + long_text(1000000), "nameserver\t" + long_text(1012) + "\n"}};
+    for (const auto &[source, expected] : made) {
+        write_file(kStaticConf, source);
+        EXPECT_EQ(0, update().result);
+        EXPECT_EQ(expected, read_file(kResolvConf));
+    }
+}
+
+TEST_F(net_dns_update, KOVANetDNSUpdate_configuredServersThatCannotBeRead_leaveTheFileAsItIs) {
+    write_file(kKovaInfoConf, "dns_mode=\"static\"\n");
+    write_file(kResolvConf, "untouched\n");
+    std::filesystem::create_directory(kStaticConf);
+    EXPECT_OUTCOME(update(), {.result = -1,
+                              .code = 0x900,
+                              .unit = "plain_file",
+                              .log = {"ERR net_dns_update:N Failed to read [" + kStaticConf + "], kovaerr=[0x0900]"},
+                              .locks = kLocked});
+    EXPECT_EQ("untouched\n", read_file(kResolvConf));
+}
+
+TEST_F(net_dns_update, KOVANetDNSUpdate_oddOptions_areHarmless) {
+    using namespace std::string_literals;
+    const std::string server = "nameserver\t10.0.0.1\n";
+    std::string many;
+    for (int i = 0; i < 10000; ++i) {
+        many += "options timeout:" + std::to_string(i) + "\n";
+    }
+    const std::map<std::string, std::string> added{{"\xff\xfe\x01\ndomain\tex\0ample\n"s, "domain\tex\n"},
+                                                   {long_text(1000000) + "\ndomain\tone\n", "domain\tone\n"},
+                                                   {many + "domain\tlast\n", "domain\tlast\n"}};
+    for (const auto &[option, line] : added) {
+        write_file(kOptionConf, option);
+        EXPECT_EQ(server + line, made_of(server));
+    }
+    std::filesystem::remove(kOptionConf);
+    std::filesystem::create_directory(kOptionConf);
+    EXPECT_EQ(server, made_of(server));
+}
+
 TEST_F(net_dns_update, KOVANetDNSUpdate_domainLine_isAddedBehindTheServers) {
     const std::string server = "nameserver\t10.0.0.1\n";
     const std::map<std::string, std::string> added{

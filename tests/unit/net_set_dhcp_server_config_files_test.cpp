@@ -311,6 +311,8 @@ TEST_F(net_set_dhcp_server_config_files, KOVANetGetDhcpServerConf_failedReads_ar
     rig.fail("KLIBCSzListAlloc", 2);
     EXPECT_OUTCOME(get(),
                    {.result = 0, .code = 0x200, .unit = "platform", .log = {kUnit + "Failed to get key dhcp-option"}});
+    rig.fail("fopen", 3); // behind name servers and router
+    EXPECT_OUTCOME(get(), {.result = 0, .log = {kUnit + "Failed to get key option:domain-search"}});
     EXPECT_OUTCOME(get(), {.result = 1});
 }
 

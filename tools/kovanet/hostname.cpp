@@ -1,5 +1,6 @@
 // kovanet hostname: the name of the appliance.
 #include "errors.h"
+#include "interfaces.h"
 #include "objects.h"
 #include "rules.h"
 #include "table.h"
@@ -47,6 +48,7 @@ void show(bool as_json) {
 void set(const std::string &name) {
     require_root();
     require("host name \"" + name + "\"", refuse_new_hostname(name));
+    const config_lock lock{config_lock::kExclusive}; // nobody else sets another name before this one is looked at
     {
         const step_note note{"setting the host name"};
         clear_error();
