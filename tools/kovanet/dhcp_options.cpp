@@ -144,7 +144,8 @@ std::vector<std::string> require_values(const option_kind &kind, const std::vect
     std::vector<std::string> plain;
     for (const std::string &value : values) {
         if (const refusal refused = refuse_value(kind, value, plain.size() % 2 != 0)) {
-            throw failure{kNo, rule + ", not \"" + value + "\"" + (refused->empty() ? "" : ": " + *refused)};
+            const std::string more = refused->empty() ? "" : ": " + *refused;
+            throw failure{kNo, std::string(rule).append(", not \"").append(value).append("\"").append(more)};
         }
         plain.push_back(plain_value(kind, value));
     }

@@ -296,9 +296,35 @@ void require_no_conflict(const DHCP_TAG_CONF &conf, const std::string &ifname) {
     }
 }
 
-void set(const set_words &words) {
-    const subnet_id id = words.id();
-    const given_keys keys = sorted_keys(words.keys, id.type);
+/** The subnet as it is, or a new one that is told all that it needs. */
+subnet subnet_to_change(const subnet_id &id, const given_keys &keys) {
+    subnet one{id, {}, nullptr, {}};
+    const presence found = read_subnet(one);
+    if (found == presence::read) {
+        require_all_known(one);
+        return one;
+    }
+    require_needed(keys, id, found);
+    require_no_gap(id);
+    one.conf.lease_time = kDefaultLease;
+    return one;
+}
+
+void take_keys(const given_keys &keys, subnet &one) {
+    if (one.id.type == kIPv4) {
+        take_v4_keys(keys, one);
+    } else {
+        take_v6_keys(keys, one);
+    }
+    if (keys.contains("dns")) {
+        take_servers(keys.at("dns"), one);
+    }
+    if (keys.contains("lease")) {
+        one.conf.lease_time = lease_of(keys.at("lease")[0]);
+    }
+}
+
+void require_mode(const given_keys &keys) {
     if (keys.contains("mode")) {
         const std::string &mode = keys.at("mode")[0];
         const std::vector<std::string> modes = {"ra-only", "ra-stateless", "stateful"};
@@ -306,29 +332,17 @@ void set(const set_words &words) {
             bad_usage("mode \"" + mode + "\" is not ra-only, ra-stateless or stateful" + suggestion(mode, modes));
         }
     }
+}
+
+void set(const set_words &words) {
+    const subnet_id id = words.id();
+    const given_keys keys = sorted_keys(words.keys, id.type);
+    require_mode(keys);
     require_servable(id.ifname);
     change_server([&] {
         require_interface(id.ifname);
-        subnet one{id, {}, nullptr, {}};
-        const presence found = read_subnet(one);
-        if (found != presence::read) {
-            require_needed(keys, id, found);
-            require_no_gap(id);
-            one.conf.lease_time = kDefaultLease;
-        } else {
-            require_all_known(one);
-        }
-        if (id.type == kIPv4) {
-            take_v4_keys(keys, one);
-        } else {
-            take_v6_keys(keys, one);
-        }
-        if (keys.contains("dns")) {
-            take_servers(keys.at("dns"), one);
-        }
-        if (keys.contains("lease")) {
-            one.conf.lease_time = lease_of(keys.at("lease")[0]);
-        }
+        subnet one = subnet_to_change(id, keys);
+        take_keys(keys, one);
         if (id.type == kIPv4 && !words.force && (keys.contains("range") || keys.contains("mask"))) {
             require_no_conflict(one.conf, id.ifname);
         }
