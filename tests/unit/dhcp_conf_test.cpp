@@ -790,7 +790,7 @@ TEST_F(dhcp_conf, DHCPTagConfGet_v6Range_isTakenByItsFields) {
 
 TEST_F(dhcp_conf, DHCPTagConfGet_v6WithoutALine_isTold) {
     const std::string failed = "Failed to get DHCPv6 Server config from [eth0, 0]";
-    const std::string binary("\0\1\2\xff\xfe\n\0\n=\n,,,\n", 16);
+    const std::string binary = "\0\1\2\xff\xfe\n\0\n=\n,,,\n"s;
     for (const std::string &content : texts{"", "dhcp-range", binary, long_text(100000), kDnsV6}) {
         EXPECT_OUTCOME(get_v6(content), failure({"Failed to get key dhcp-range", failed}));
     }
