@@ -15,6 +15,7 @@
 #include <kovanetsdk/iface.h>
 #include <kovanetsdk/ipv6.h>
 #include <kovanetsdk/link.h>
+#include <kovanetsdk/pppoe.h>
 #include <kovanetsdk/routing.h>
 #include <kovanetsdk/stats.h>
 

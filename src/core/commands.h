@@ -15,6 +15,15 @@ template<typename... Text> [[nodiscard]] int run(const char *program, Text... ar
     return KLIBCExecl(program, kQuietly, arguments..., static_cast<const char *>(nullptr));
 }
 
+/**
+ * Lets the network script stop or start interfaces as their files say. What it answers is not looked at: the files hold
+ * what is wanted, now and at the next boot.
+ */
+void stop_interfaces(const char *const *names, int count);
+void start_interfaces(const char *const *names, int count);
+
+inline constexpr char kPppoeStop[] = "/usr/sbin/pppoe-stop";
+
 /** Starts or stops the DHCP client of an interface; both return before the client has done its work. */
 [[nodiscard]] int start_dhcp_client(const char *szIfname);
 [[nodiscard]] int stop_dhcp_client(const char *szIfname);

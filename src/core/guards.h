@@ -129,6 +129,9 @@ inline string_hash make_hash(int capacity = kContainerCapacity) {
 /** Words of the named locks: the name in the upper bits, shared (5) or exclusive (6) in the lowest byte. */
 inline constexpr uint32_t kConfigShared = 0x105;
 inline constexpr uint32_t kConfigExclusive = 0x106;
+/** The lock of /etc/kovainfo.conf, for calls that look at several of its keys. */
+inline constexpr uint32_t kInfoShared = 0x805;
+inline constexpr uint32_t kInfoExclusive = 0x806;
 /** The name alone, as it is given back. */
 inline constexpr uint32_t kConfigName = 0x100;
 /** Longest wait for a named lock. */
@@ -147,6 +150,11 @@ public:
         }
     }
     [[nodiscard]] bool is_held() const { return result_ != -1; }
+    /** Gives it back before its scope ends. @return what the unlock call answered */
+    [[nodiscard]] int release() {
+        result_ = -1;
+        return KLIBCFileUnlock(word_ & ~0xffU);
+    }
     /** What the lock call answered. */
     [[nodiscard]] int result() const { return result_; }
 

@@ -1,24 +1,29 @@
 #include "core/ifcfg.h"
 
-#include "core/guards.h"
-
 namespace kova {
+
+void key_changes::set(const char *key, const char *value) {
+    is_complete_ = is_complete_ && KLIBCSzHashSetValue(to_set_.get(), key, value) >= 0;
+}
+
+void key_changes::remove(const char *key) {
+    is_complete_ = is_complete_ && KLIBCSzHashSetValue(to_remove_.get(), key, "") >= 0;
+}
+
+int key_changes::apply(const char *path) const {
+    return KLIBCFileSetKeys(path, to_set_.get(), to_remove_.get(), kPlainLine) < 0 ? -1 : 0;
+}
 
 int rewrite_keys(const place &at, const char *path, std::initializer_list<key_value> set,
                  std::initializer_list<const char *> removed) {
-    const string_hash to_set = make_hash();
-    const string_hash to_remove = make_hash();
-    bool is_complete = to_set.is_held() && to_remove.is_held();
+    key_changes changes;
     for (const key_value &line : set) {
-        is_complete = is_complete && KLIBCSzHashSetValue(to_set.get(), line.key, line.value) >= 0;
+        changes.set(line.key, line.value);
     }
     for (const char *key : removed) {
-        is_complete = is_complete && KLIBCSzHashSetValue(to_remove.get(), key, "") >= 0;
+        changes.remove(key);
     }
-    if (!is_complete) {
-        return fail_quietly(at, NET_ERR_OUT_OF_MEMORY, -1);
-    }
-    return KLIBCFileSetKeys(path, to_set.get(), to_remove.get(), kPlainLine) < 0 ? -1 : 0;
+    return changes.is_complete() ? changes.apply(path) : fail_quietly(at, NET_ERR_OUT_OF_MEMORY, -1);
 }
 
 } // namespace kova

@@ -4,6 +4,7 @@
  */
 #pragma once
 
+#include "core/guards.h"
 #include "core/report.h"
 #include "core/text.h"
 
@@ -43,7 +44,30 @@ inline constexpr char kLocalLan[] = "LOCAL_LAN";
 inline constexpr char kSlaveList[] = "SLAVE_LIST";
 inline constexpr char kBondMode[] = "BOND_MODE";
 inline constexpr char kIpv6Init[] = "IPV6INIT";
+inline constexpr char kUserCtl[] = "USERCTL";
+inline constexpr char kBondingOpts[] = "BONDING_OPTS";
+inline constexpr char kType[] = "TYPE";
+inline constexpr char kPrimary[] = "PRIMARY";
+inline constexpr char kBridge[] = "BRIDGE";
 } // namespace key
+
+/** Keys of a file to be set and removed together, in one rewrite, as plain lines. A key in both is set. */
+class key_changes {
+public:
+    void set(const char *key, const char *value);
+    void remove(const char *key);
+    /** Whether there was memory for all of it. */
+    [[nodiscard]] bool is_complete() const { return is_complete_; }
+    /** Keys to set and their values, for calls that add some. */
+    [[nodiscard]] KLIBSZHASH *to_set() const { return to_set_.get(); }
+    /** @return 0; -1 with the code of the rewrite. Nothing is logged. */
+    [[nodiscard]] int apply(const char *path) const;
+
+private:
+    string_hash to_set_ = make_hash();
+    string_hash to_remove_ = make_hash();
+    bool is_complete_ = to_set_.is_held() && to_remove_.is_held();
+};
 
 struct key_value {
     const char *key;

@@ -49,6 +49,16 @@ int ethernet_request(const descriptor &socket, const char *szIfname, void *reque
     return request(socket, SIOCETHTOOL, szIfname, record);
 }
 
+/** Asks about a VLAN; the answer is in the record. */
+int vlan_request(const descriptor &socket, int command, const char *szIfname, vlan_ioctl_args &record) {
+    if (!has_request_name(szIfname)) {
+        return -1;
+    }
+    record.cmd = command;
+    memcpy(record.device1, szIfname, strlen(szIfname) + 1);
+    return ioctl(socket.get(), SIOCGIFVLAN, &record) < 0 ? -1 : 0;
+}
+
 } // namespace
 
 interface_socket::interface_socket() : socket_(socket(AF_INET, SOCK_DGRAM | SOCK_CLOEXEC, 0)) {}
@@ -94,6 +104,12 @@ int interface_socket::mtu(const char *szIfname, int &mtu) const {
     return 0;
 }
 
+int interface_socket::set_mtu(const char *szIfname, int mtu) const {
+    ifreq record = {};
+    record.ifr_mtu = mtu;
+    return request(socket_, SIOCSIFMTU, szIfname, record);
+}
+
 int interface_socket::rename(const char *szOld, const char *szNew) const {
     ifreq record = {};
     if (!has_request_name(szNew)) {
@@ -105,16 +121,20 @@ int interface_socket::rename(const char *szOld, const char *szNew) const {
 
 int interface_socket::vlan_row_device(const char *szIfname, char (&device)[IFNAMSIZ]) const {
     vlan_ioctl_args record = {};
-    if (!has_request_name(szIfname)) {
-        return -1;
-    }
-    record.cmd = GET_VLAN_REALDEV_NAME_CMD;
-    memcpy(record.device1, szIfname, strlen(szIfname) + 1);
-    if (ioctl(socket_.get(), SIOCGIFVLAN, &record) < 0) {
+    if (vlan_request(socket_, GET_VLAN_REALDEV_NAME_CMD, szIfname, record) < 0) {
         return -1;
     }
     memcpy(device, record.u.device2, sizeof device);
     device[sizeof device - 1] = '\0';
+    return 0;
+}
+
+int interface_socket::vlan_id(const char *szIfname, uint32_t &id) const {
+    vlan_ioctl_args record = {};
+    if (vlan_request(socket_, GET_VLAN_VID_CMD, szIfname, record) < 0) {
+        return -1;
+    }
+    id = static_cast<uint32_t>(record.u.VID);
     return 0;
 }
 

@@ -36,9 +36,11 @@ public:
     [[nodiscard]] int netmask(const char *szIfname, uint32_t &netmask) const;
     [[nodiscard]] int hardware_address(const char *szIfname, unsigned char (&mac)[6]) const;
     [[nodiscard]] int mtu(const char *szIfname, int &mtu) const;
+    [[nodiscard]] int set_mtu(const char *szIfname, int mtu) const;
     [[nodiscard]] int rename(const char *szOld, const char *szNew) const;
     /** The interface below a VLAN; fails for what is no VLAN. */
     [[nodiscard]] int vlan_row_device(const char *szIfname, char (&device)[IFNAMSIZ]) const;
+    [[nodiscard]] int vlan_id(const char *szIfname, uint32_t &id) const;
     [[nodiscard]] int ethernet_settings(const char *szIfname, link_settings &settings) const;
     [[nodiscard]] int ethernet_link(const char *szIfname, bool &has_link) const;
 

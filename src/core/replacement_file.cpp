@@ -24,6 +24,13 @@ replacement_file::replacement_file(const char *target) : target_(target) {
     is_temporary_ = stream_.is_held();
 }
 
+replacement_file::replacement_file(const char *target, const char *path_template) : target_(target) {
+    if (copy_whole(path_, sizeof path_, path_template)) {
+        *stream_.out() = KLIBCFileTempFileOpen(path_);
+    }
+    is_temporary_ = stream_.is_held();
+}
+
 replacement_file::~replacement_file() {
     if (is_temporary_) {
         const errno_keeper keep;

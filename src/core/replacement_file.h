@@ -14,6 +14,8 @@ namespace kova {
 class replacement_file {
 public:
     explicit replacement_file(const char *target);
+    /** Written under a name of its own in the target's directory, made from a template that ends in "XXXXXX". */
+    replacement_file(const char *target, const char *path_template);
     replacement_file(const replacement_file &) = delete;
     replacement_file &operator=(const replacement_file &) = delete;
     ~replacement_file();

@@ -57,6 +57,9 @@ struct place {
         KOVA_UNIT, name, __LINE__, ::kova::lead::function                                                              \
     }
 
+// What the register says, for log texts that end in "[0x%04X %s:%d]".
+#define REGISTER KLIBCErrGet(), KLIBCErrorGetFile(), KLIBCErrorGetLine()
+
 /** Writes one log line. */
 [[gnu::format(printf, 2, 3)]] void log_err(const place &at, const char *format, ...);
 [[gnu::format(printf, 2, 3)]] void log_warning(const place &at, const char *format, ...);

@@ -25,6 +25,12 @@ std::string named(const char *path) {
     return path != nullptr ? path : "nothing";
 }
 
+/** The path that is opened wherever this one is meant. */
+std::string meant(const char *path) {
+    const rig_at_work guard;
+    return current_rig != nullptr && current_rig->is_observing ? current_rig->redirected(path) : named(path);
+}
+
 std::string between(const char *from, const char *to) {
     return named(from) + " " + named(to);
 }
@@ -35,7 +41,7 @@ std::string between(const char *from, const char *to) {
 
 // ---- files by path
 
-FAULT_IN_FRONT(int, stat, (const char *path, struct stat *out), (path, out), named(path), -1, EACCES)
+FAULT_IN_FRONT(int, stat, (const char *path, struct stat *out), (meant(path).c_str(), out), named(path), -1, EACCES)
 FAULT_IN_FRONT(int, fstatat, (int fd, const char *path, struct stat *out, int flags), (fd, path, out, flags),
                named(path), -1, EACCES)
 FAULT_IN_FRONT(int, chmod, (const char *path, mode_t mode), (path, mode), named(path), -1, EPERM)

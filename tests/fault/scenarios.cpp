@@ -329,7 +329,165 @@ void lease_to_ask_for(world &it) {
     write_file("/etc/dhclient/dhclient-script", "#!/bin/sh\n");
 }
 
+// ---- the same for VLANs, bonds, MTU, bridges and the PPPoE client
+
+/** The VLAN eth0.10, as kernel and file have it. */
+void vlan(world &it) {
+    it.kernel.load_vlan_module();
+    it.kernel.add("eth0.10", {.row_device = "eth0", .vlan_id = 10});
+    it.rig.replace_file("/proc/net/vlan/config", "VLAN Dev name    | VLAN ID\nName-Type: VLAN_NAME_TYPE_RAW_PLUS_VID\n"
+                                                 "eth0.10        | 10  | eth0\n");
+    write_file(ifcfg("eth0"), "DEVICE=eth0\nONBOOT=yes\nBOOTPROTO=none\nIPV6INIT=off\n");
+    write_file(ifcfg("eth0.10"), "DEVICE=eth0.10\nVLAN_ROW_DEVICE=eth0\nVLAN_ID=10\nONBOOT=yes\nBOOTPROTO=static\n"
+                                 "IPADDR=192.168.1.10\nNETMASK=255.255.255.0\nIPV6INIT=auto\n");
+    write_file("/etc/kovainfo.conf", "eth0_mtu=\"9000\"\neth0.10_mtu=\"9000\"\n");
+}
+
+/** A card with settings of both families, a stored MTU, and no VLAN. */
+void vlan_to_make(world &it) {
+    it.kernel.load_vlan_module();
+    it.rig.replace_file("/proc/net/vlan/config",
+                        "VLAN Dev name    | VLAN ID\nName-Type: VLAN_NAME_TYPE_RAW_PLUS_VID\n");
+    write_file(ifcfg("eth0"), "DEVICE=eth0\nONBOOT=yes\nBOOTPROTO=static\nIPADDR=192.168.1.10\nNETMASK=255.255.255.0\n"
+                              "IPV6INIT=static\nIPV6ADDR=2001:db8::1\nIPV6PREFIXLENG=64\nIPV6DNS=2001:db8::53\n");
+    write_file("/etc/kovainfo.conf", "eth0_mtu=\"9000\"\n");
+    it.card = {.nIPSource = 1, .szIP = "192.168.1.10", .szMask = "255.255.255.0"};
+}
+
+void stored_mtu(world &) {
+    write_file("/etc/kovainfo.conf", "eth0_mtu=\"1400\"\neth1_mtu=\"1400\"\n");
+}
+
+void mtu_of_switch(world &it) {
+    virtual_switch(it);
+    stored_mtu(it);
+}
+
+void bonds(world &it) {
+    it.rig.replace_file("/sys/class/net/bonding_masters", "bond0\n");
+}
+
+/** A bond of both cards, as it would be asked for. */
+void wanted_bond(world &it, const char *name, int mode) {
+    it.bond = {};
+    strcpy(it.bond.szName, name);
+    it.bond.mode = mode;
+    it.bond.cSlaves = 2;
+    strcpy(it.bond.aszSlaves[0], "eth0");
+    strcpy(it.bond.aszSlaves[1], "eth1");
+}
+
+/** Cards of no bond, the first with a lease, and a bond to be made of them. */
+void bond_to_make(world &it) {
+    wanted_bond(it, "bond1", KOVA_LINK_AGGR_8023AD);
+    write_file(ifcfg("eth0"),
+               "DEVICE=eth0\nONBOOT=yes\nBOOTPROTO=static\nIPADDR=192.168.1.10\nNETMASK=255.255.255.0\n");
+    write_file("/tmp/dhcpv4.leases.eth0", "lease { interface \"eth0\"; }\n");
+}
+
+/** The files of bond0, and a request for another mode of it. */
+void bond_to_change(world &it) {
+    wanted_bond(it, "bond0", KOVA_LINK_AGGR_BALANCE_RR);
+    const std::string member = "USERCTL=no\nMASTER=bond0\nSLAVE=yes\n";
+    const std::string address = "BOOTPROTO=static\nONBOOT=yes\nIPADDR=192.168.1.10\nNETMASK=255.255.255.0\n";
+    write_file(ifcfg("bond0"), "DEVICE=bond0\n" + address + "USERCTL=no\nBONDING_OPTS=\"mode=4\"\n");
+    write_file(ifcfg("eth0"), "DEVICE=eth0\n" + address + member);
+    write_file(ifcfg("eth1"), "DEVICE=eth1\n" + address + member);
+}
+
+void bond_to_delete(world &it) {
+    bond_to_change(it);
+    it.bond.mode = KOVA_LINK_AGGR_UNKNOWN;
+}
+
+/** A bridge over eth0, in the kernel and in the files. */
+void bridge(world &it) {
+    it.kernel.add("br0", {.ip = "192.168.3.10", .mask = "255.255.255.0"});
+    write_file("/tmp/fault-br0/flags", "0x1003\n");
+    write_file("/tmp/fault-br0/bridge/state", "");
+    write_file("/tmp/fault-br0/brif/eth0", "");
+    it.rig.redirect("/sys/class/net/br0", "/tmp/fault-br0");
+    bridge_port(it);
+    write_file(ifcfg("br0"), "DEVICE=br0\nTYPE=bridge\nPRIMARY=eth0\nONBOOT=yes\nBOOTPROTO=static\n"
+                             "IPADDR=192.168.3.10\nNETMASK=255.255.255.0\n");
+    write_file(ifcfg("eth0"), "DEVICE=eth0\nBRIDGE=br0\nONBOOT=yes\n");
+    it.card = {.nIPSource = 1, .blLinkUp = 1, .szIfname = "eth0", .szIP = "192.168.1.20", .szMask = "255.255.255.0"};
+}
+
+void local_lan_bridge(world &it) {
+    bridge(it);
+    KLIBCFileSetKeyValue(ifcfg("br0").c_str(), "LOCAL_LAN", "yes", "%s=%s\n");
+}
+
+/** A card that becomes the port of a bridge. */
+void port_to_set(world &it) {
+    it.card = {.blLinkUp = 1, .szIfname = "eth0"};
+    it.bridge = {KLIB_BRIDGE_SLAVE, "eth0", "br0"};
+}
+
+void bridge_to_set(world &it) {
+    it.card = {.nIPSource = 1, .blLinkUp = 1, .szIP = "192.168.3.10", .szMask = "255.255.255.0"};
+    it.bridge = {KLIB_BRIDGE_LOCAL_LAN, "br0", "eth0"};
+}
+
+void dial_to_set(world &it) {
+    it.dial = {"eth0", "alice", "secret", "1492", 1};
+}
+
+/** Other settings of the connection, which is switched off. */
+void dial_settings(world &) {
+    write_file("/etc/ppp/pppoe.conf", "ETH=eth0\nDEFAULTROUTE=yes\nUSER='bob'\nMTU=1400\n");
+    write_file("/etc/ppp/pap-secrets", "'bob'\t*\tpassword\n");
+    write_file("/etc/kovainfo.conf", "pppoe_enable=\"no\"\n");
+}
+
+void dial_to_change(world &it) {
+    dial_settings(it);
+    dial_to_set(it);
+}
+
+void dial_enabled(world &it) {
+    dial_settings(it);
+    write_file("/etc/kovainfo.conf", "pppoe_enable=\"yes\"\n");
+    it.rig.redirect("/proc", "/tmp/fault-processes"); // nobody runs
+    write_file("/tmp/fault-processes/version", "");
+}
+
+/** The connection's process is the only one. */
+void run_connection(world &it) {
+    it.rig.redirect("/proc", "/tmp/fault-connection");
+    write_file("/tmp/fault-connection/4242/stat", "4242 (pppoe-connect) S 1\n");
+    write_file("/tmp/fault-connection/4242/cmdline", std::string("pppoe-connect\0", 14));
+}
+
+void dialled(world &it) {
+    dial_enabled(it);
+    run_connection(it);
+}
+
+void dialled_but_off(world &it) {
+    dial_settings(it);
+    run_connection(it);
+}
+
+void connection_interface(world &it) {
+    it.kernel.add("ppp0", {.ip = "10.64.0.7", .mask = "255.255.255.255"});
+    it.rig.answer("/usr/sbin/pppoe-status", 0, "  ppp0      Link encap:Point-to-Point Protocol\n");
+}
+
+void noted_connection_interface(world &it) {
+    connection_interface(it);
+    write_file("/tmp/kovapppoe.intf", "ppp0");
+}
+
 // ---- calls that are more than an expression
+
+long list_vlans(world &it) {
+    VLANINFO *found = nullptr;
+    const long result = KLIBNetVlanEnum(&found, &it.number);
+    free(found);
+    return result;
+}
 
 /** The lock is given back even where it could not be had; there is nobody else's that could be lost by it. */
 long give_back_a_lock(world &it, long result) {
@@ -523,6 +681,117 @@ const tolerances vendor_steps{
     {"KLIBCFileAddLine", "the old lines go before the new ones are added, each whole", -1, "dhcpd-vendor.conf"},
 };
 
+const tolerances vlan_question{
+    {"ioctl 0x8982 ", "the kernel's word for what is no VLAN"},
+};
+const tolerances mtu_question{
+    {"ioctl 0x8982 ", "the kernel's word for what is no VLAN", std::nullopt, "/etc/kovainfo.conf"},
+    {"socket", "what cannot be asked about has no setting to keep", std::nullopt, "/etc/kovainfo.conf"},
+    {"access /sys/devices/virtual/net/ovs_", "what is not known as the switch's is taken for itself", kAnyResult,
+     "/etc/kovainfo.conf"},
+    {"KLIBCFileSetKeyValue /etc/kovainfo.conf", "the settings of a VLAN and of the interface below it are two keys", -1,
+     "/etc/kovainfo.conf"},
+};
+const tolerances switch_members{
+    {"ioctl 0x8913 ", "a member that the kernel does not describe is left out", std::nullopt, "/etc/kovainfo.conf"},
+    {"ioctl 0x8946 ", "a member that the kernel does not describe is left out", std::nullopt, "/etc/kovainfo.conf"},
+};
+const tolerances one_by_one{
+    {"", "members are set one after the other, until one fails", -1, "/etc/kovainfo.conf"},
+};
+const tolerances link_state{
+    {"ioctl 0x8946 ", "a link of unknown speed keeps its MTU"},
+};
+const tolerances bond_files{
+    {"KLIBCExec /bin/cp -f /etc/sysconfig/network-scripts/ifcfg-eth", "not looked at: what to begin with or go back to",
+     std::nullopt, "/etc/sysconfig/network-scripts/"},
+    {"KLIBCFileGetKeyValue /etc/sysconfig/network-scripts/ifcfg-", "a key that cannot be read counts as absent",
+     kAnyResult, "/etc/sysconfig/network-scripts/"},
+    {"KLIBCFileLock 0x105", "an address that cannot be read counts as absent", kAnyResult,
+     "/etc/sysconfig/network-scripts/"},
+    {"unlink /etc/sysconfig/network-scripts/ifcfg-eth", "logged; an old copy is written over, a new one stays",
+     std::nullopt, "/etc/sysconfig/network-scripts/"},
+    {"", "what fails is put back from the copies that are there", -1, "/etc/sysconfig/network-scripts/"},
+};
+const tolerances end_of_old_bond{
+    {"", "how the old bond ends is not looked at: the new one's files count", kAnyResult,
+     "/etc/sysconfig/network-scripts/"},
+};
+const tolerances vlan_steps{
+    {"ioctl 0x8982 ", "the kernel's word for what is no VLAN", std::nullopt, "/etc/kovainfo.conf"},
+    {"socket", "what cannot be asked about has no MTU to keep"},
+    {"KLIBCExecv /etc/rc.network", "the files hold what is wanted, whatever the script answers"},
+    {"KLIBCINFORemoveKey", "a setting of what is gone does no harm", std::nullopt, "/etc/kovainfo.conf"},
+    {"unlink /etc/sysconfig/network-scripts/ifcfg-eth0.10", "not looked at: the interface is stopped", std::nullopt,
+     "ifcfg-eth0.10"},
+    {"open /etc/sysconfig/network-scripts/ ",
+     "the file is in its place; its name may be lost with the machine's power"},
+    {"fsync /etc/sysconfig/network-scripts ",
+     "the file is in its place; its name may be lost with the machine's power"},
+    {"fclose written /etc/sysconfig/network-scripts/", "what was written is on the disk already"},
+};
+const tolerances bond_steps{
+    {"fopen /sys/class/net/bond1/bonding/slaves", "a bond whose members cannot be read is none"},
+    {"KLIBCExecv /etc/rc.network", "the files hold what is wanted, whatever the script answers"},
+    {"KLIBCExec /bin/cp -f /tmp/dhcpv4.leases.", "without the lease the client asks for one", std::nullopt,
+     "/tmp/dhcpv4.leases."},
+    {"KLIBCFileReplaceSubStr /tmp/dhcpv4.leases.", "without the lease the client asks for one", std::nullopt,
+     "/tmp/dhcpv4.leases."},
+};
+const tolerances member_copies{
+    {"KLIBCExec /bin/cp", "the copy is to go back to; not looked at", std::nullopt, ".saved"},
+};
+const tolerances own_copy{
+    {"KLIBCExec /bin/cp", "the copy is for people; not looked at", std::nullopt, ".saved"},
+};
+const tolerances boot_protocol{
+    {"KLIBCFileGetKeyValue", "a protocol that cannot be read counts as absent", std::nullopt, "ifcfg-eth0"},
+};
+const tolerances some_bonds{
+    {"fopen /sys/class/net/bond0/bonding/slaves", "a bond whose members cannot be read is counted, not listed"},
+    {"fread /sys/class/net/bond0/bonding/slaves", "a bond whose members cannot be read is counted, not listed"},
+    {"KLIBCSzListPush eth", "a bond whose members cannot be read is counted, not listed"},
+    {"malloc", "a bond whose members cannot be read is counted, not listed"},
+};
+const tolerances up_and_down{
+    {"ioctl 0x8913 ", "taking it down and bringing it up are tried; the result is what the kernel says to the MTU"},
+    {"ioctl 0x8914 ", "taking it down and bringing it up are tried; the result is what the kernel says to the MTU"},
+    {"socket", "taking it down and bringing it up are tried; the result is what the kernel says to the MTU"},
+};
+const tolerances bridge_keys{
+    {"KLIBCFileGetKeyValue", "logged; a key that cannot be read is empty"},
+    {"KLIBCFileCheckKeyValue", "a switch that cannot be read is off"},
+};
+const tolerances dial_steps{
+    {"KLIBCFileSetKeyValue /etc/ppp/pppoe.conf", "the settings are several keys; each is written whole", -1,
+     "/etc/ppp/pppoe.conf"},
+    {"unlink /etc/ppp/pap-secrets.tmp", "none is in the way; the open would tell of one"},
+};
+const tolerances dial_switch{
+    {"KLIBCFileCheckKeyValue /etc/ppp/pppoe.conf DEFAULTROUTE", "a switch that cannot be read is off"},
+};
+const tolerances dial_stop{
+    {"KLIBCExecl /usr/sbin/pppoe-stop", "the switch is off, whatever the script answers"},
+};
+const tolerances processes{
+    {"KLIBCPs pppoe-connect > open /", "a process that cannot be looked at is gone", kAnyResult, "/etc/kovainfo.conf"},
+    {"KLIBCPs pppoe-connect > fstat ", "a process that cannot be looked at is gone", kAnyResult, "/etc/kovainfo.conf"},
+    {"KLIBCPs pppoe-connect > read ", "a process that cannot be looked at is gone", kAnyResult, "/etc/kovainfo.conf"},
+    {"KLIBCPs pppoe-connect > readdir ", "the list ends where it cannot be read on", kAnyResult, "/etc/kovainfo.conf"},
+};
+const tolerances unknown_process{
+    {"KLIBCPs pppoe-connect", "what cannot be found is not stopped"},
+};
+const tolerances noted_name{
+    {"open /tmp/kovapppoe.intf", "a name that is not noted is asked for again", std::nullopt, "/tmp/kovapppoe.intf"},
+    {"fread /tmp/kovapppoe.intf", "the end of the file: the name is read"},
+    {"fstat /tmp/kovapppoe.intf", "a name that is not noted is asked for again"},
+    {"fdopen /tmp/kovapppoe.intf", "a name that is not noted is asked for again"},
+    {"unlink /tmp/kovapppoe.intf", "what is in the way shows at the open"},
+    {"write /tmp/kovapppoe.intf", "a name that is not noted is asked for again"},
+    {"KLIBCPclose", "the answer is read"},
+};
+
 const char *const kOld[] = {"eth0"};
 const char *const kNew[] = {"bond0"};
 const uint32_t kMask[] = {255, 255, 0, 0};
@@ -596,9 +865,21 @@ const std::vector<scenario> &scenarios() {
         {"ErrKLIBIpMaskToSubnet", CALL(ErrKLIBIpMaskToSubnet(strcpy(it.text, "10.0.0.1/255.0.0.0"), it.names[0])),
          pure},
         {"ErrKLIBSubnetToIpMask", CALL(ErrKLIBSubnetToIpMask(strcpy(it.text, "10.0.0.1/8"), nullptr)), pure},
+        {"KLIBDisablePPPoEOnIf", CALL(KLIBDisablePPPoEOnIf("eth0")), dialled, processes, dial_switch, dial_stop},
         {"KLIBIsIpInRange", CALL(KLIBIsIpInRange("10.0.0.2", "10.0.0.1", "10.0.0.3", 2)), pure},
+        {"KLIBNETGetBridgeInfo/bridge", CALL(KLIBNETGetBridgeInfo("br0", &it.bridge)), bridge, failure::below_one,
+         bridge_keys},
+        {"KLIBNETGetBridgeInfo/port", CALL(KLIBNETGetBridgeInfo("eth0", &it.bridge)), bridge, failure::below_one,
+         bridge_keys},
+        {"KLIBNETGetBridgeInfoByTopology", CALL(KLIBNETGetBridgeInfoByTopology("br0", &it.bridge, 2)), pure},
+        {"KLIBNetBridgeIfIsMaster", CALL(KLIBNetBridgeIfIsMaster("br0")), bridge, failure::zero},
         {"KLIBNetBridgeIfIsSlave", CALL(KLIBNetBridgeIfIsSlave("eth0")), bridge_port, failure::zero},
+        {"KLIBNetBridgeSlaveEnum", CALL(KLIBNetBridgeSlaveEnum("br0", it.list)), bridge, failure::below_one},
         {"KLIBNetDHCPServerRestart", CALL(KLIBNetDHCPServerRestart())},
+        {"KLIBNetEnumBridge/bridges", CALL(KLIBNetEnumBridge(it.list, KLIB_BRIDGE_MASTER)), bridge, failure::below_one,
+         bridge_keys},
+        {"KLIBNetEnumBridge/local LAN", CALL(KLIBNetEnumBridge(it.list, KLIB_BRIDGE_LOCAL_LAN)), local_lan_bridge,
+         failure::below_one},
         {"KLIBNetGetIfCfg", CALL(KLIBNetGetIfCfg("eth0", "IPADDR", it.text, sizeof it.text))},
         {"KLIBNetGetInterfaceInfo", CALL(KLIBNetGetInterfaceInfo(it.records, 32, 2)), two_vlans, cards},
         {"KLIBNetGetInterfaceInfo/cluster", CALL(KLIBNetGetInterfaceInfo(it.records, 32, 5)), cluster, cards},
@@ -630,8 +911,21 @@ const std::vector<scenario> &scenarios() {
              return records != nullptr;
          },
          failure::zero},
+        {"KLIBNetVlanCreate", CALL(KLIBNetVlanCreate("eth0", 10, &it.card)), vlan_to_make, vlan_steps, dispatch},
+        {"KLIBNetVlanEnum", list_vlans, vlan},
+        {"KLIBNetVlanExist", CALL(KLIBNetVlanExist(nullptr)), vlan, failure::zero},
+        {"KLIBNetVlanGet", CALL(KLIBNetVlanGet("eth0.10", &it.vlan)), vlan, failure::below_one},
+        {"KLIBNetVlanGetByRowDev", CALL(KLIBNetVlanGetByRowDev("eth0", 10, &it.vlan)), vlan, failure::below_one},
+        {"KLIBNetVlanRemove", CALL(KLIBNetVlanRemove("eth0.10")), vlan, vlan_steps, dispatch},
+        {"KLIBNetVlanValidId", CALL(KLIBNetVlanValidId(10)), pure},
         {"KLIBServicePlugin", CALL(KLIBServicePlugin(1, KLIB_SERVICE_IP_CHANGE)), dispatch},
         {"KLIBServiceStopBeforeIPChange", CALL(KLIBServiceStopBeforeIPChange())},
+        {"KOVAConfGetMTUValue", CALL(KOVAConfGetMTUValue("eth0", it.text, sizeof it.text)), stored_mtu},
+        {"KOVAConfGetMTUValue/switch port", CALL(KOVAConfGetMTUValue("ovs_eth0", it.text, sizeof it.text)),
+         mtu_of_switch},
+        {"KOVAConfSetMTUValue", CALL(KOVAConfSetMTUValue("9000", "eth0")), stored_mtu, mtu_question},
+        {"KOVAConfSetMTUValue/VLAN", CALL(KOVAConfSetMTUValue("1400", "eth0.10")), vlan, mtu_question},
+        {"KOVAConfSetMTUValue/switch port", CALL(KOVAConfSetMTUValue("9000", "ovs_eth0")), mtu_of_switch, mtu_question},
         {"KOVAExternalIPGet", CALL(KOVAExternalIPGet(it.text, sizeof it.text))},
         {"KOVAGetMTU", CALL(KOVAGetMTU("eth0")), failure::below_one},
         {"KOVAGetMTUSetting", CALL(KOVAGetMTUSetting("eth0")), failure::below_one},
@@ -671,12 +965,17 @@ const std::vector<scenario> &scenarios() {
         {"KOVANetDefaultGatewaySetConf/change", CALL(KOVANetDefaultGatewaySetConf("192.168.1.2")), gateway_conf},
         {"KOVANetDefaultGatewaySetConf/none", CALL(KOVANetDefaultGatewaySetConf("")), gateway_conf},
         {"KOVANetDnsConfigChangeHook", CALL(KOVANetDnsConfigChangeHook(KLIB_PLUGIN_POST, "eth0", it.list))},
+        {"KOVANetDisableBridgeSlave", CALL(KOVANetDisableBridgeSlave(&it.card)), bridge, own_copy},
         {"KOVANetEnumCard", CALL(KOVANetEnumCard(2)), cards},
         {"KOVANetFlushIP/ipv4", CALL(KOVANetFlushIP("-4", "eth0"))},
         {"KOVANetFlushIP/ipv6", CALL(KOVANetFlushIP("-6", "eth0")), off_and_on},
         {"KOVANetGatewayConfigChangeHook",
          CALL(KOVANetGatewayConfigChangeHook(KLIB_PLUGIN_POST, "ipv4", "eth0", "10.0.0.1", "10.0.0.2"))},
         {"KOVANetGetAddrType", CALL(KOVANetGetAddrType("fe80::1")), pure},
+        {"KOVANetGetBridgeConfig/bridge", CALL(KOVANetGetBridgeConfig("br0", &it.card, &it.bridge)), bridge,
+         bridge_keys},
+        {"KOVANetGetBridgeConfig/port", CALL(KOVANetGetBridgeConfig("eth0", &it.card, &it.bridge)), bridge,
+         bridge_keys},
         {"KOVANetGetCard1", CALL(KOVANetGetCard1(0, nullptr, &it.card)), failure::below_one, cards, protocol},
         {"KOVANetGetCard1/address", CALL(KOVANetGetCard1(0, "192.168.2.10", &it.card)), failure::below_one, cards,
          protocol},
@@ -714,18 +1013,37 @@ const std::vector<scenario> &scenarios() {
         {"KOVANetInternalLanNumGet", CALL(KOVANetInternalLanNumGet()), port_count},
         {"KOVANetIsDevTypeMatch", CALL(KOVANetIsDevTypeMatch("eth0", 2)), failure::zero, cards},
         {"KOVANetIsIFUp", CALL(KOVANetIsIFUp("eth0")), failure::zero},
+        {"KOVANetIsIfBridgeType", CALL(KOVANetIsIfBridgeType("br0", KLIB_BRIDGE_MASTER)), bridge, failure::zero,
+         bridge_keys},
         {"KOVANetIsPrivateIP", CALL(KOVANetIsPrivateIP("10.0.0.1")), pure},
         {"KOVANetIsSameSubnet", CALL(KOVANetIsSameSubnet("10.0.0.1", "10.0.0.2", "255.0.0.0")), pure},
+        {"KOVANetLinkAggrConfDel", CALL(KOVANetLinkAggrConfDel(&it.bond)), bond_to_delete, bond_files},
+        {"KOVANetLinkAggrConfSetSlave/join", CALL(KOVANetLinkAggrConfSetSlave("eth0", 1, &it.bond)), bond_to_make,
+         member_copies},
+        {"KOVANetLinkAggrConfSetSlave/leave", CALL(KOVANetLinkAggrConfSetSlave("eth0", 0, nullptr)), bond_to_change,
+         member_copies, boot_protocol},
+        {"KOVANetLinkAggrConfUpdateBootProto",
+         CALL(KOVANetLinkAggrConfUpdateBootProto("/etc/sysconfig/network-scripts/ifcfg-eth1", it.map)), boot_protocol},
+        {"KOVANetLinkAggrEnum", CALL(KOVANetLinkAggrEnum(it.list)), bonds, failure::below_one, some_bonds},
+        {"KOVANetLinkAggrExist", CALL(KOVANetLinkAggrExist()), bonds, failure::below_one},
         {"KOVANetLinkAggrGet", CALL(KOVANetLinkAggrGet("bond0", &it.bond)), kernel_bond},
         {"KOVANetLinkAggrGet/switch", CALL(KOVANetLinkAggrGet("ovs_bond0", &it.bond)), virtual_switch,
          failure::not_zero, switch_ports},
+        {"KOVANetLinkAggrModeToString", CALL(KOVANetLinkAggrModeToString(KOVA_LINK_AGGR_8023AD) != nullptr), pure},
         {"KOVANetLinkAggrOptSlsaveAdd", CALL(KOVANetLinkAggrOptSlsaveAdd(&it.bond, "eth0")), member_to_add, pure},
         {"KOVANetLinkAggrPhyGet", CALL(KOVANetLinkAggrPhyGet("bond0", it.list))},
+        {"KOVANetLinkAggrSet/make", CALL(KOVANetLinkAggrSet(&it.bond)), bond_to_make, bond_steps, dispatch, bond_files},
+        {"KOVANetLinkAggrSet/change", CALL(KOVANetLinkAggrSet(&it.bond)), bond_to_change, bond_steps, kernel_bond,
+         end_of_old_bond},
+        {"KOVANetLinkAggrSet/delete", CALL(KOVANetLinkAggrSet(&it.bond)), bond_to_delete, bond_steps, dispatch,
+         kernel_bond, bond_files},
         {"KOVANetLinkAggrStringToMode", CALL(KOVANetLinkAggrStringToMode("balance-rr")), pure},
         {"KOVANetMTUChangeHook", CALL(KOVANetMTUChangeHook("eth0", "9000"))},
         {"KOVANetNetmaskToPrefix", CALL(KOVANetNetmaskToPrefix("255.0.0.0")), pure},
         {"KOVANetNtoa", CALL(KOVANetNtoa(1) != nullptr), pure},
         {"KOVANetRenameEth", CALL(KOVANetRenameEth("eth0", "lan0")), down, interface_state},
+        {"KOVANetSetBridgeConfig/port", CALL(KOVANetSetBridgeConfig(&it.card, &it.bridge)), port_to_set, own_copy},
+        {"KOVANetSetBridgeConfig/bridge", CALL(KOVANetSetBridgeConfig(&it.card, &it.bridge)), bridge_to_set, own_copy},
         {"KOVANetSetCard1/static", CALL(KOVANetSetCard1(&it.card, nullptr)), card_to_set, backed_up, announced,
          housekeeping},
         {"KOVANetSetCard1/dhcp", CALL(KOVANetSetCard1(&it.card, nullptr)), dhcp_card_to_set, backed_up, housekeeping},
@@ -739,7 +1057,29 @@ const std::vector<scenario> &scenarios() {
         {"KOVANetSetIP/ipv4 del", CALL(KOVANetSetIP("-4", "eth0", "192.168.1.10", 24, "del"))},
         {"KOVANetSetIP/ipv6", CALL(KOVANetSetIP("-6", "eth0", "2001:db8::1", 64, "add")), announced},
         {"KOVANetSetIfBlock", CALL(KOVANetSetIfBlock("eth0", 1, 1)), block_steps},
+        {"KOVANetSetMTUEth", CALL(KOVANetSetMTUEth("9000", "eth0")), vlan_question, up_and_down},
+        {"KOVANetSetMTUEth/VLAN", CALL(KOVANetSetMTUEth("9000", "eth0.10")), vlan, vlan_question, up_and_down},
+        {"KOVANetSetMTUEth/switch bond", CALL(KOVANetSetMTUEth("9000", "ovs_bond0")), virtual_switch, vlan_question,
+         up_and_down, switch_members},
+        {"KOVANetSetMTUEth/switch port", CALL(KOVANetSetMTUEth("9000", "ovs_eth0")), virtual_switch, vlan_question,
+         up_and_down},
+        {"KOVANetSetMTUValue", CALL(KOVANetSetMTUValue("9000", "eth0")), stored_mtu, mtu_question, up_and_down,
+         link_state, announced},
+        {"KOVANetSetMTUValue/switch bond", CALL(KOVANetSetMTUValue("9000", "ovs_bond0")), mtu_of_switch, mtu_question,
+         up_and_down, switch_members, announced, one_by_one},
+        {"KOVANetSetMTUValue/switch port", CALL(KOVANetSetMTUValue("9000", "ovs_eth0")), mtu_of_switch, mtu_question,
+         up_and_down, link_state, announced},
         {"KOVANetStaticDNSListGet", CALL(KOVANetStaticDNSListGet(&it.list)), resolver, server_list},
+        {"KOVAPPPoECheckStatus/up", CALL(KOVAPPPoECheckStatus(1)), dialled, failure::below_one, processes},
+        {"KOVAPPPoECheckStatus/down", CALL(KOVAPPPoECheckStatus(1)), dial_enabled, processes},
+        {"KOVAPPPoECheckStatus/off", CALL(KOVAPPPoECheckStatus(0)), dialled_but_off, unknown_process, dial_stop},
+        {"KOVAPPPoEService/start", CALL(KOVAPPPoEService(1)), dial_settings},
+        {"KOVAPPPoEService/stop", CALL(KOVAPPPoEService(0)), dial_enabled, dial_stop},
+        {"KOVAPPPoeIntfGet", CALL(KOVAPPPoeIntfGet(it.text, sizeof it.text)), connection_interface, noted_name},
+        {"KOVAPPPoeIntfGet/noted", CALL(KOVAPPPoeIntfGet(it.text, sizeof it.text)), noted_connection_interface,
+         noted_name},
+        {"KOVAPPPoeNetInfoGet", CALL(KOVAPPPoeNetInfoGet(it.text, sizeof it.text, it.names[0], sizeof it.names[0])),
+         connection_interface, noted_name},
         {"NetRoutetableCheck", CALL(NetRoutetableCheck()), two_without_link, cards, protocol, known_kind, route_tools},
         {"NetRoutetableEdit/add", CALL(NetRoutetableEdit(NET_ROUTE_ADD, "10.0.0.1", "255.0.0.0", "eth0")), route_tools},
         {"NetRoutetableEdit/delete", CALL(NetRoutetableEdit(NET_ROUTE_DELETE, "10.0.0.1", "255.0.0.0", "eth0")),
@@ -748,6 +1088,9 @@ const std::vector<scenario> &scenarios() {
          route_tools},
         {"NetRoutetableHandler/dhcp", CALL(NetRoutetableHandler(NET_ROUTE_DELETE, "eth1")), cards, protocol, known_kind,
          route_tools},
+        {"PPPoEConfigGet", CALL(PPPoEConfigGet(&it.dial)), dial_settings, dial_switch},
+        {"PPPoEConfigSet/new", CALL(PPPoEConfigSet(&it.dial)), dial_to_set, dial_steps},
+        {"PPPoEConfigSet/change", CALL(PPPoEConfigSet(&it.dial)), dial_to_change, dial_steps},
         {"cKLIBICalMask", CALL(cKLIBICalMask(kMask)), pure},
         {"cKLIBISepIP", CALL(cKLIBISepIP("10.0.0.1", reinterpret_cast<uint32_t *>(it.text))), pure},
     };

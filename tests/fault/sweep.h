@@ -44,6 +44,9 @@ struct world {
     DHCP_TAG_CONF subnet = {};
     DHCP_PXE_CONF boot = {};
     DHCP_RANGE *ranges = nullptr;
+    VLANINFO vlan = {};
+    BRIDGEINFO bridge = {};
+    PPPOE_CONF dial = {};
 };
 
 /** How a function's result says that it failed. */

@@ -89,5 +89,27 @@ AT(DHCP_PXE_CONF, remote_bootloader, 4104);
 AT(DHCP_PXE_CONF, remote_tftp_server_ip, 8200);
 SIZE(DHCP_PXE_CONF, 8220);
 
+AT(BRIDGEINFO, nType, 0);
+AT(BRIDGEINFO, szIfname, 4);
+AT(BRIDGEINFO, szPeer, 20);
+SIZE(BRIDGEINFO, 36);
+
+AT(VLANINFO, szIfname, 0);
+AT(VLANINFO, szRowDevice, 16);
+AT(VLANINFO, vlanId, 32);
+SIZE(VLANINFO, 36);
+
+AT(PPPOE_CONF, szIfname, 0);
+AT(PPPOE_CONF, szUser, 16);
+AT(PPPOE_CONF, szPassword, 272);
+AT(PPPOE_CONF, szMTU, 304);
+AT(PPPOE_CONF, blDefaultRoute, 312);
+SIZE(PPPOE_CONF, 316);
+
+AT(KOVABONDDESC, szKernelMode, 0);
+AT(KOVABONDDESC, szName, 8);
+AT(KOVABONDDESC, szOptions, 16);
+SIZE(KOVABONDDESC, 24);
+
 AT(KLIBSZLIST, nCapacity, 0);
 AT(KLIBSZLIST, nItem, 4);

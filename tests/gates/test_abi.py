@@ -12,7 +12,7 @@ C_LIBRARY = {"libc.so.6", "ld-linux-x86-64.so.2", "ld-linux-aarch64.so.1"}
 OBJECTS = ["kovanetsdk", "kovacore", "kovasdk", "kovahacore", "kovadhmxcore"]
 HEADERS = sorted(path for path in (ROOT / "include" / "kovanetsdk").glob("*.h") if path.name != "net_int.h")
 PLATFORM_HEADERS = sorted((ROOT / "platform" / "include" / "kova").glob("*.h"))
-DECLARATION = re.compile(r"^(?:[A-Za-z_][\w ]*[ *])(\w+)\(", re.MULTILINE)
+DECLARATION = re.compile(r"^(?:[A-Za-z_][\w ]*[ *])(\w+)[(\[]", re.MULTILINE)  # functions and tables
 
 
 def shared_object(name):

@@ -56,13 +56,22 @@ fake_kernel::fake_kernel(test_rig &rig) : rig_(rig) {
 
 fake_interface &fake_kernel::add(const std::string &name, const fake_interface &device) {
     devices_[name] = device;
+    list_devices();
+    return devices_[name];
+}
+
+void fake_kernel::remove(const std::string &name) {
+    devices_.erase(name);
+    list_devices();
+}
+
+void fake_kernel::list_devices() {
     std::string list = "Inter-|   Receive                                                |  Transmit\n"
                        " face |bytes    packets errs drop fifo frame compressed multicast|bytes    packets errs\n";
     for (const auto &[known, unused] : devices_) {
         list += known + ": 1 2 0 0 0 0 0 0 3 4 0 0 0 0 0 0\n";
     }
     rig_.replace_file("/proc/net/dev", list);
-    return devices_[name];
 }
 
 void fake_kernel::load_vlan_module() {
@@ -71,14 +80,7 @@ void fake_kernel::load_vlan_module() {
 
 std::optional<int> fake_kernel::answer(unsigned long request, void *argument) {
     if (request == SIOCGIFVLAN) {
-        auto &vlan = *static_cast<vlan_ioctl_args *>(argument);
-        EXPECT_EQ(GET_VLAN_REALDEV_NAME_CMD, vlan.cmd);
-        const auto found = devices_.find(vlan.device1);
-        if (found == devices_.end() || found->second.row_device.empty()) {
-            return failed(found == devices_.end() ? ENODEV : EINVAL);
-        }
-        snprintf(vlan.u.device2, sizeof vlan.u.device2, "%s", found->second.row_device.c_str());
-        return 0;
+        return answer_vlan(*static_cast<vlan_ioctl_args *>(argument));
     }
     if (request < 0x8900 || request > 0x89ff) {
         return std::nullopt; // no interface request
@@ -94,6 +96,20 @@ std::optional<int> fake_kernel::answer(unsigned long request, void *argument) {
     return answer_about(found->second, request, record);
 }
 
+int fake_kernel::answer_vlan(vlan_ioctl_args &vlan) const {
+    const auto found = devices_.find(vlan.device1);
+    if (found == devices_.end() || found->second.row_device.empty()) {
+        return failed(found == devices_.end() ? ENODEV : EINVAL);
+    }
+    if (vlan.cmd == GET_VLAN_VID_CMD) {
+        vlan.u.VID = found->second.vlan_id;
+        return found->second.vlan_id < 0 ? failed(EINVAL) : 0;
+    }
+    EXPECT_EQ(GET_VLAN_REALDEV_NAME_CMD, vlan.cmd);
+    snprintf(vlan.u.device2, sizeof vlan.u.device2, "%s", found->second.row_device.c_str());
+    return 0;
+}
+
 int fake_kernel::answer_about(fake_interface &device, unsigned long request, ifreq &record) {
     switch (request) {
     case SIOCGIFFLAGS:
@@ -101,6 +117,11 @@ int fake_kernel::answer_about(fake_interface &device, unsigned long request, ifr
         return 0;
     case SIOCSIFFLAGS:
         device.flags = static_cast<unsigned short>(record.ifr_flags);
+        changes.push_back(std::string(record.ifr_name) + ((device.flags & IFF_UP) != 0 ? " up" : " down"));
+        return 0;
+    case SIOCSIFMTU:
+        device.mtu = record.ifr_mtu;
+        changes.push_back(std::string(record.ifr_name) + " mtu " + std::to_string(record.ifr_mtu));
         return 0;
     case SIOCSIFNAME:
         return 0;

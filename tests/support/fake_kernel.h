@@ -17,6 +17,7 @@ struct fake_interface {
     std::string ip{};
     std::string mask{};
     std::string row_device{}; ///< of a VLAN
+    int vlan_id = -1;         ///< -1 cannot be asked for
     int mtu = 1500;
     unsigned char last_mac_byte = 1; ///< of 02:00:00:00:00:xx
     unsigned supported = 0;          ///< link modes
@@ -34,9 +35,18 @@ public:
     /** Makes the module of the VLANs loaded. */
     void load_vlan_module();
 
+    /** Takes an interface away. */
+    void remove(const std::string &name);
+    /** The interface of a name, with what was set by requests. */
+    const fake_interface &at(const std::string &name) const { return devices_.at(name); }
+
+    texts changes; ///< what requests set, in order: "eth0 down", "eth0 mtu 9000", "eth0 up"
+
 private:
     std::optional<int> answer(unsigned long request, void *argument);
     int answer_about(fake_interface &device, unsigned long request, ifreq &record);
+    int answer_vlan(vlan_ioctl_args &vlan) const;
+    void list_devices();
 
     test_rig &rig_;
     std::map<std::string, fake_interface> devices_;

@@ -219,7 +219,8 @@ bool test_rig::is_failing(const std::string &operation) {
 
 std::string test_rig::redirected(const char *path) const {
     const std::string asked = path;
-    for (const auto &[from, to] : redirects_) {
+    for (auto known = redirects_.rbegin(); known != redirects_.rend(); ++known) { // the longest path first
+        const auto &[from, to] = *known;
         if (asked.rfind(from, 0) == 0 && (asked.size() == from.size() || asked[from.size()] == '/')) {
             return to + asked.substr(from.size());
         }

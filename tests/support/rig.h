@@ -83,7 +83,8 @@ public:
     void answer_ioctl(ioctl_answer answer);
     /** Stands in for gethostname. */
     void answer_gethostname(std::function<int(char *name, size_t size)> answer);
-    /** Opens, accesses and lists another path wherever this one, or something below it, is meant. */
+    /** Opens, accesses and lists another path wherever this one, or something below it, is meant; the longest counts.
+     */
     void redirect(const std::string &path, const std::string &other);
     /** The same with a file that holds this content. */
     void replace_file(const std::string &path, const std::string &content);

@@ -54,6 +54,11 @@ extern "C" int chmod(const char *path, mode_t mode) noexcept {
     return is_failing("chmod") ? failure(EPERM) : real<int(const char *, mode_t)>("chmod")(path, mode);
 }
 
+extern "C" int stat(const char *path, struct stat *status) noexcept {
+    const auto next = real<int(const char *, struct stat *)>("stat");
+    return current_rig == nullptr ? next(path, status) : next(current_rig->redirected(path).c_str(), status);
+}
+
 extern "C" const char *KLIBCSzListGet(const KLIBSZLIST *list, int index) {
     static const auto next = real<const char *(const KLIBSZLIST *, int)>("KLIBCSzListGet");
     return is_failing("KLIBCSzListGet") ? nullptr : next(list, index);

@@ -1,0 +1,300 @@
+#include "support/rig.h"
+
+#include <cstring>
+#include <kovanetsdk/pppoe.h>
+#include <sys/stat.h>
+
+using namespace kova_test;
+
+namespace {
+
+const std::string kUnit = "pppoe_config_set";
+const std::string kConf = "/etc/ppp/pppoe.conf";
+const std::string kSecrets = "/etc/ppp/pap-secrets";
+const std::string kNewSecrets = kSecrets + ".tmp";
+
+PPPOE_CONF settings(const std::string &user, const std::string &password, const std::string &ifname = "eth0",
+                    const std::string &mtu = "1492", uint32_t is_default = 1) {
+    PPPOE_CONF conf = {};
+    memcpy(conf.szIfname, ifname.data(), std::min(ifname.size(), sizeof conf.szIfname));
+    memcpy(conf.szUser, user.data(), std::min(user.size(), sizeof conf.szUser));
+    memcpy(conf.szPassword, password.data(), std::min(password.size(), sizeof conf.szPassword));
+    memcpy(conf.szMTU, mtu.data(), std::min(mtu.size(), sizeof conf.szMTU));
+    conf.blDefaultRoute = is_default;
+    return conf;
+}
+
+mode_t mode_of(const std::string &path) {
+    struct stat status = {};
+    return stat(path.c_str(), &status) == 0 ? status.st_mode & 07777U : 0;
+}
+
+} // namespace
+
+class pppoe_config_set : public unit_test {
+protected:
+    outcome set(const PPPOE_CONF &conf) {
+        return rig.observe([&] { return PPPoEConfigSet(&conf); });
+    }
+    outcome get() {
+        memset(&read, 'u', sizeof read);
+        return rig.observe([this] { return PPPoEConfigGet(&read); });
+    }
+    void expect_read(const PPPOE_CONF &expected) const {
+        EXPECT_STREQ(expected.szIfname, read.szIfname);
+        EXPECT_STREQ(expected.szUser, read.szUser);
+        EXPECT_STREQ(expected.szPassword, read.szPassword);
+        EXPECT_STREQ(expected.szMTU, read.szMTU);
+        EXPECT_EQ(expected.blDefaultRoute != 0 ? 1U : 0U, read.blDefaultRoute);
+    }
+
+    PPPOE_CONF read;
+};
+
+// ---- storing
+
+TEST_F(pppoe_config_set, PPPoEConfigSet_settings_areInBothFiles) {
+    EXPECT_OUTCOME(set(settings("a'b", "secret")), {.result = 0});
+    EXPECT_EQ("ETH=eth0\nDEFAULTROUTE=yes\nUSER='a'\"'\"'b'\nMTU=1492\n", read_file(kConf));
+    EXPECT_EQ("'a'\"'\"'b'\t*\tsecret\n", read_file(kSecrets));
+    EXPECT_EQ((texts{"pap-secrets", "pppoe.conf"}), list_dir("/etc/ppp"));
+    EXPECT_EQ(0600U, mode_of(kSecrets));
+}
+
+TEST_F(pppoe_config_set, PPPoEConfigSet_otherKeysStay_otherSecretsGo) {
+    write_file(kConf, "# mine\nMTU=1\nDEMAND=no\nETH=eth1");
+    write_file(kSecrets, "'other'\t*\tpassword\n");
+    EXPECT_OUTCOME(set(settings("user", "secret", "eth0", "1492", 0)), {.result = 0});
+    EXPECT_EQ("# mine\nMTU=1492\nDEMAND=no\nETH=eth0\nDEFAULTROUTE=no\nUSER='user'\n", read_file(kConf));
+    EXPECT_EQ("'user'\t*\tsecret\n", read_file(kSecrets));
+}
+
+TEST_F(pppoe_config_set, PPPoEConfigSet_userThatIsTooLongWithItsQuotes_isCut) {
+    const std::string quote = "'\"'\"'";
+    std::string hundred_and_one;
+    for (int i = 0; i < 101; ++i) {
+        hundred_and_one += quote;
+    }
+    EXPECT_EQ(0, set(settings(long_text(255, '\''), "p")).result);
+    EXPECT_EQ("'" + hundred_and_one + "'\t*\tp\n", read_file(kSecrets));
+    // 100 quotes and the opening one make 501; nine bytes more reach 510, where only the closing one has room
+    std::string hundred;
+    for (int i = 0; i < 100; ++i) {
+        hundred += quote;
+    }
+    EXPECT_EQ(0, set(settings(long_text(100, '\'') + long_text(20, 'x'), "p")).result);
+    EXPECT_EQ("'" + hundred + long_text(9, 'x') + "'\t*\tp\n", read_file(kSecrets));
+    EXPECT_EQ(0, set(settings(long_text(100, '\'') + "xxxx'y", "p")).result);
+    EXPECT_EQ("'" + hundred + "xxxx" + quote + "'\t*\tp\n", read_file(kSecrets));
+    EXPECT_EQ(0, set(settings(long_text(100, '\'') + "xxxxx'y", "p")).result);
+    EXPECT_EQ("'" + hundred + "xxxxx'\t*\tp\n", read_file(kSecrets)) << "cut there, not picked over";
+}
+
+TEST_F(pppoe_config_set, PPPoEConfigSet_secret_isNobodyElsesFromTheBeginning) {
+    ASSERT_EQ(0, set(settings("user", "secret")).result);
+    shell("rm " + kSecrets);
+    const mode_t old = umask(0);
+    rig.fail("chmod");
+    EXPECT_OUTCOME(set(settings("user", "secret")),
+                   {.result = -1, .log = {"ERR pppoe_config_set:N chmod /etc/ppp/pap-secrets failed"}});
+    EXPECT_EQ(0600U, mode_of(kSecrets)) << "the mode it was made with";
+    umask(old);
+    shell("chmod 666 " + kSecrets);
+    EXPECT_EQ(0, set(settings("user", "secret")).result);
+    EXPECT_EQ(0600U, mode_of(kSecrets));
+}
+
+TEST_F(pppoe_config_set, PPPoEConfigSet_temporaryThatIsThere_isNotWrittenInto) {
+    write_file("/tmp/bait", "bait\n");
+    shell("ln -s /tmp/bait " + kNewSecrets);
+    EXPECT_EQ(0, set(settings("user", "secret")).result);
+    EXPECT_EQ("bait\n", read_file("/tmp/bait"));
+    write_file(kNewSecrets, "left by a killed one\n");
+    shell("chmod 666 " + kNewSecrets + " && ln " + kNewSecrets + " /etc/ppp/still-open");
+    EXPECT_EQ(0, set(settings("user", "secret")).result);
+    EXPECT_EQ("left by a killed one\n", read_file("/etc/ppp/still-open"));
+    EXPECT_EQ(0600U, mode_of(kSecrets));
+    shell("rm /etc/ppp/still-open /tmp/bait");
+}
+
+TEST_F(pppoe_config_set, PPPoEConfigSet_keyThatCannotBeWritten_stopsThere) {
+    const texts kept{"<absent>", "ETH=eth0\n", "ETH=eth0\nDEFAULTROUTE=yes\n",
+                     "ETH=eth0\nDEFAULTROUTE=yes\nUSER='u'\n"};
+    for (int nth = 1; nth <= 4; ++nth) {
+        shell("rm -f " + kConf);
+        rig.fail("KLIBCFileSetKeyValue", nth);
+        EXPECT_OUTCOME(set(settings("u", "secret")),
+                       {.result = -1,
+                        .code = 0xB00,
+                        .unit = "platform",
+                        .log = {"ERR pppoe_config_set (N) Failed to edit /etc/ppp/pppoe.conf"}});
+        EXPECT_EQ(kept[static_cast<size_t>(nth) - 1], read_file(kConf));
+        EXPECT_EQ("<absent>", read_file(kSecrets));
+    }
+}
+
+TEST_F(pppoe_config_set, PPPoEConfigSet_secretThatCannotBeStored_leavesTheOldOne) {
+    ASSERT_EQ(0, set(settings("user", "old")).result);
+    rig.fail("fsync"); // the other file stays as it is and is not written
+    EXPECT_OUTCOME(
+        set(settings("user", "new")),
+        {.result = -1, .log = {"ERR pppoe_config_set (N) Failed to fflush PPPoE setting.(Input/output error)"}});
+    EXPECT_EQ("'user'\t*\told\n", read_file(kSecrets));
+    EXPECT_EQ((texts{"pap-secrets", "pppoe.conf"}), list_dir("/etc/ppp")) << "no secret is left lying about";
+    shell("mkdir " + kNewSecrets);
+    EXPECT_OUTCOME(set(settings("user", "new")),
+                   {.result = -1,
+                    .log = {"ERR pppoe_config_set (N) Failed to open tmp file to write PPPoE setting (File exists)"}});
+    EXPECT_EQ("'user'\t*\told\n", read_file(kSecrets));
+    shell("rmdir " + kNewSecrets + " && rm " + kSecrets + " && mkdir " + kSecrets);
+    EXPECT_OUTCOME(set(settings("user", "new")),
+                   {.result = -1,
+                    .log = {"ERR pppoe_config_set:N rename /etc/ppp/pap-secrets to /etc/ppp/pap-secrets.tmp failed"}});
+    EXPECT_EQ("<absent>", read_file(kNewSecrets));
+}
+
+TEST_F(pppoe_config_set, PPPoEConfigSet_badArguments_areRefusedBeforeAnythingIsWritten) {
+    EXPECT_OUTCOME(rig.observe([] { return PPPoEConfigSet(nullptr); }), refusal(kUnit, "NULL != pConf"));
+    EXPECT_OUTCOME(set(settings("u", "p", long_text(16))), refusal(kUnit, "is_one_line(pConf->szIfname)"));
+    EXPECT_OUTCOME(set(settings(long_text(256), "p")), refusal(kUnit, "is_one_line(pConf->szUser)"));
+    EXPECT_OUTCOME(set(settings("u", long_text(32))), refusal(kUnit, "is_one_line(pConf->szPassword)"));
+    EXPECT_OUTCOME(set(settings("u", "p", "eth0", long_text(8))), refusal(kUnit, "is_one_line(pConf->szMTU)"));
+    for (const char *end : {"\n", "\r"}) {
+        EXPECT_OUTCOME(set(settings("u", "p", std::string("eth0") + end)),
+                       refusal(kUnit, "is_one_line(pConf->szIfname)"));
+        EXPECT_OUTCOME(set(settings(std::string("u") + end + "'root'", "p")),
+                       refusal(kUnit, "is_one_line(pConf->szUser)"));
+        EXPECT_OUTCOME(set(settings("u", std::string("p") + end + "'root'\t*\tp")),
+                       refusal(kUnit, "is_one_line(pConf->szPassword)"));
+        EXPECT_OUTCOME(set(settings("u", "p", "eth0", end)), refusal(kUnit, "is_one_line(pConf->szMTU)"));
+    }
+    EXPECT_EQ(texts{}, list_dir("/etc/ppp"));
+}
+
+// ---- reading
+
+TEST_F(pppoe_config_set, PPPoEConfigGet_whatWasStored_isReadAndStoringItChangesNothing) {
+    const texts users{"",
+                      "u",
+                      "a'b",
+                      "''",
+                      "user@isp.example",
+                      " blanks around ",
+                      "tab\tin",
+                      "a*b",
+                      "*",
+                      "\"x\"",
+                      "'\"'",
+                      "#hash",
+                      "back\\slash",
+                      "a=b",
+                      "%s%n",
+                      "\x01\x7f",
+                      "\xc3\xbc",
+                      long_text(254),
+                      long_text(255),
+                      long_text(101, '\'')};
+    const texts passwords{"",      "p",       "a*b", "*",    "in side", "'quoted'",    "\"q\"",
+                          "#hash", "a\\nb\\", "%s",  "\x01", "a\tb",    long_text(30), long_text(31)};
+    for (const std::string &user : users) {
+        for (const std::string &password : passwords) {
+            SCOPED_TRACE(user + " " + password);
+            const PPPOE_CONF stored = settings(user, password);
+            ASSERT_EQ(0, set(stored).result);
+            EXPECT_OUTCOME(get(), {.result = 0});
+            expect_read(stored);
+            const std::string files = read_file(kConf) + read_file(kSecrets);
+            EXPECT_EQ(0, set(read).result);
+            EXPECT_EQ(files, read_file(kConf) + read_file(kSecrets));
+        }
+    }
+}
+
+TEST_F(pppoe_config_set, PPPoEConfigGet_cutUser_isReadAsCut) {
+    ASSERT_EQ(0, set(settings(long_text(255, '\''), "p")).result);
+    EXPECT_EQ(0, get().result);
+    expect_read(settings(long_text(101, '\''), "p"));
+}
+
+TEST_F(pppoe_config_set, PPPoEConfigGet_fieldsOfAllLengths_areWholeOrCut) {
+    ASSERT_EQ(0, set(settings("u", "p", long_text(15), "1234567", 7)).result);
+    EXPECT_EQ(0, get().result);
+    expect_read(settings("u", "p", long_text(15), "1234567"));
+    write_file(kConf, "ETH=" + long_text(40) + "\nUSER=" + long_text(300, 'u') + "\nMTU=" + long_text(40, '1') + "\n");
+    write_file(kSecrets, long_text(300, 'u') + " * " + long_text(40, 'p') + "\n");
+    EXPECT_EQ(0, get().result);
+    expect_read(settings(long_text(255, 'u'), long_text(31, 'p'), long_text(15), long_text(7, '1'), 0));
+}
+
+TEST_F(pppoe_config_set, PPPoEConfigGet_linesOfOthers_arePassedOver) {
+    write_file(kConf, "ETH=eth0\nUSER='me'\nMTU=1492\n");
+    const texts lines{"'me'\t*\tp\n",
+                      "me * p\n",
+                      "\"me\"*p",
+                      "  me \t*\t p \t\r\n",
+                      "# me * comment\n\n'you'\t*\tq\nmeme * q\nm * q\n'me' q\nme\n*\n* me *\n'me'\t*\tp\n",
+                      "'me\t*\tq\n'me'\t*\tp\n",
+                      "'m'e * p\n'me'\t*\tsecond\n",
+                      long_text(100000) + "\nme * p\n",
+                      std::string("\0\xff\n", 3) + "me * p\n"};
+    for (const std::string &content : lines) {
+        write_file(kSecrets, content);
+        EXPECT_OUTCOME(get(), {.result = 0});
+        EXPECT_STREQ("p", read.szPassword) << content.substr(0, 100);
+    }
+}
+
+TEST_F(pppoe_config_set, PPPoEConfigGet_noLineForTheUser_isAnEmptyPassword) {
+    write_file(kConf, "ETH=eth0\nUSER='me'\nMTU=1492\n");
+    for (const char *content : {"", "\n", "'you'\t*\tq\n", "'me'\tq\n", "'ME'\t*\tq\n"}) {
+        write_file(kSecrets, content);
+        EXPECT_OUTCOME(get(), {.result = 0});
+        expect_read(settings("me", "", "eth0", "1492", 0));
+    }
+}
+
+TEST_F(pppoe_config_set, PPPoEConfigGet_noUser_isTheEndOfIt) {
+    write_file(kConf, "ETH=eth0\nDEFAULTROUTE=yes\nMTU=1492\n");
+    EXPECT_OUTCOME(get(), {.result = 0});
+    expect_read(settings("", "", "eth0", ""));
+    write_file(kConf, "");
+    EXPECT_OUTCOME(get(), {.result = 0});
+    expect_read(settings("", "", "", "", 0));
+}
+
+TEST_F(pppoe_config_set, PPPoEConfigGet_defaultRoute_isExactlyYes) {
+    for (const char *value : {"no", "YES", "", "yes ", "1"}) {
+        write_file(kConf, std::string("DEFAULTROUTE=") + value + "\n");
+        EXPECT_EQ(0, get().result);
+        EXPECT_EQ(0U, read.blDefaultRoute) << value;
+    }
+    write_file(kConf, "DEFAULTROUTE=\"yes\"\n");
+    EXPECT_EQ(0, get().result);
+    EXPECT_EQ(1U, read.blDefaultRoute);
+}
+
+TEST_F(pppoe_config_set, PPPoEConfigGet_fileThatCannotBeRead_fails) {
+    EXPECT_OUTCOME(get(), {.result = -1,
+                           .code = 0x900,
+                           .unit = "key_value",
+                           .log = {"ERR pppoe_config_set:N Failed to get PPPoE ETH setting.[0x0900 key_value:N]"}});
+    write_file(kConf, "ETH=eth0\nUSER='me'\nMTU=1492\n");
+    rig.fail("KLIBCFileGetKeyValue", 3);
+    EXPECT_OUTCOME(get(), {.result = -1,
+                           .code = 0x900,
+                           .unit = "platform",
+                           .log = {"ERR pppoe_config_set:N Failed to get PPPoE MTU setting."}});
+    EXPECT_OUTCOME(get(), {.result = -1, .log = {"ERR pppoe_config_set (N) Failed to open /etc/ppp/pap-secrets"}});
+    rig.fail("KLIBCFileGetKeyValue", 2);
+    EXPECT_OUTCOME(get(), {.result = -1,
+                           .code = 0x900,
+                           .unit = "platform",
+                           .log = {"ERR pppoe_config_set:N Failed to get PPPoE USER setting."}});
+    shell("mkdir " + kSecrets); // opens, and cannot be read
+    EXPECT_OUTCOME(get(), {.result = -1, .log = {"ERR pppoe_config_set (N) Failed to read /etc/ppp/pap-secrets"}});
+}
+
+TEST_F(pppoe_config_set, PPPoEConfigGet_noRecord_isLogged) {
+    EXPECT_OUTCOME(rig.observe([] { return PPPoEConfigGet(nullptr); }),
+                   {.result = -1, .log = {"ERR pppoe_config_set (N) bad parameter PPPoEConf"}});
+}
