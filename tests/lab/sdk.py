@@ -30,6 +30,22 @@ class DhcpTagConf(ctypes.Structure):
                 ("options", ctypes.POINTER(DhcpOption))]
 
 
+class VlanInfo(ctypes.Structure):
+    _fields_ = [("szIfname", ctypes.c_char * 16), ("szRowDevice", ctypes.c_char * 16), ("vlanId", ctypes.c_uint32)]
+
+
+class Bond(ctypes.Structure):
+    _fields_ = [("szName", ctypes.c_char * 16), ("mode", ctypes.c_int32), ("blNoPartner", ctypes.c_int32),
+                ("cSlaves", ctypes.c_int32), ("aszSlaves", ctypes.c_char * 16 * 32)]
+
+    def members(self):
+        return [self.aszSlaves[i].value.decode() for i in range(self.cSlaves)]
+
+
+class BridgeInfo(ctypes.Structure):
+    _fields_ = [("nType", ctypes.c_int32), ("szIfname", ctypes.c_char * 16), ("szPeer", ctypes.c_char * 16)]
+
+
 DHCP, STATIC = 0, 1
 library = ctypes.CDLL("libkovanetsdk.so.6")
 core = ctypes.CDLL("libkovacore.so.6")

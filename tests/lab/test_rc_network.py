@@ -157,6 +157,26 @@ def test_ipv6_switch_follows_the_file(mode, disabled):
     assert switch.read_text().strip() == disabled
 
 
+def test_static_ipv6_address_and_router():
+    configure("eth0", "BOOTPROTO=none\nIPV6INIT=static\nIPV6ADDR=2001:db8:77::5\nIPV6PREFIXLENG=64\n"
+                      "IPV6_DEFAULTGW=2001:db8:77::1\n")  # fmt: skip
+    for _ in range(2):
+        network("start", "eth0")
+        assert "inet6 2001:db8:77::5/64 scope global" in run("ip", "-6", "addr", "show", "dev", "eth0").stdout
+        assert "via 2001:db8:77::1 dev eth0" in run("ip", "-6", "route", "show", "default").stdout
+        network("stop", "eth0")
+        assert "2001:db8" not in run("ip", "-6", "addr", "show", "dev", "eth0").stdout
+
+
+@pytest.mark.parametrize(("address", "length"), [("", "64"), ("2001:db8::5", ""), ("::1 dev lo", "64"), ("fe80", "64"),
+                                                 ("2001:db8::5", "129"), ("2001:db8::5", "64/7")])  # fmt: skip
+def test_bad_static_ipv6_address_is_told_and_costs_no_ipv4(address, length):
+    configure("eth0", STATIC.format("192.168.77.5") +
+              f"IPV6INIT=static\nIPV6ADDR={address}\nIPV6PREFIXLENG={length}\n")  # fmt: skip
+    assert f"{address}/{length}" in network("start", "eth0", status=1).stderr
+    assert addresses("eth0") == ["192.168.77.5/24"]
+
+
 def test_stop_takes_addresses_and_link_down():
     configure("eth0", STATIC.format("192.168.77.5"))
     network("start", "eth0")
@@ -228,25 +248,54 @@ def test_interface_that_is_not_there_is_reported(keep):
 
 
 @pytest.mark.parametrize(
-    ("name", "text", "kind"),
-    [
-        ("eth0.10", "VLAN_ROW_DEVICE=eth0\nVLAN_ID=10\n", "VLAN"),
-        ("bond0", 'BONDING_OPTS="mode=1 miimon=100"\n', "bond"),
-        ("bond1", "BONDING_OPTS=\n", "bond"),
-        ("ovs_bond0", "SLAVE_LIST=eth0 kx12\nBOND_MODE=balance-slb\n", "bond"),
-        ("kx12", "MASTER=bond0\nSLAVE=yes\nBOOTPROTO=none\n", "bond member"),
-        ("lbr0", "TYPE=bridge\n", "bridge"),
-        ("kx12", "BRIDGE=lbr0\n", "bridge member"),
-    ],
+    ("name", "text"), [("bond1", "BONDING_OPTS=\n"), ("ovs_bond0", "SLAVE_LIST=eth0 kx12\nBOND_MODE=balance-slb\n")]
 )
 @pytest.mark.parametrize("verb", ["start", "stop"])
-def test_what_is_no_ethernet_interface_is_refused(name, text, kind, verb, keep, system_log):
+def test_bond_of_the_virtual_switch_is_refused(name, text, verb, keep, system_log):
     configure("eth0", STATIC.format("192.168.77.5"))
     keep(SCRIPTS / f"ifcfg-{name}").write_text("ONBOOT=yes\n" + text)
-    message = f"{name}: this is a {kind}, which"
+    message = f"{name}: this is a bond of the virtual switch, which"
     assert message in network(verb, name, "eth0", status=1).stderr
     assert addresses("eth0") == (["192.168.77.5/24"] if verb == "start" else [])
     wait_for(lambda: system_log.holds(message), what="the message in the system log")
+
+
+@pytest.mark.parametrize(
+    ("name", "text", "message"),
+    [
+        ("kx12", "MASTER=bond0\nSLAVE=yes\n", 'kx12: no bond or bridge "bond0" to belong to'),
+        ("kx12", "BRIDGE=eth0\n", 'kx12: no bond or bridge "eth0" to belong to'),
+        ("kx12", "BRIDGE=../eth0\n", 'kx12: no bond or bridge "../eth0" to belong to'),
+        ("eth0.10", "VLAN_ROW_DEVICE=gone0\nVLAN_ID=10\n", 'eth0.10: no row device "gone0"'),
+        ("eth0.10", "VLAN_ROW_DEVICE=eth0\nVLAN_ID=x\n", 'eth0.10: VLAN_ID "x" is not a number'),
+        ("eth0.10", "VLAN_ROW_DEVICE=eth0\n", 'eth0.10: VLAN_ID "" is not a number'),
+    ],
+)
+def test_what_cannot_be_made_is_told_and_the_others_go_on(name, text, message, keep, system_log):
+    configure("eth0", STATIC.format("192.168.77.5"))
+    keep(SCRIPTS / f"ifcfg-{name}").write_text("ONBOOT=yes\n" + text)
+    assert message in network("start", status=1).stderr
+    assert addresses("eth0") == ["192.168.77.5/24"]
+    wait_for(lambda: system_log.holds(message), what="the message in the system log")
+
+
+@pytest.mark.parametrize("value", ["9000", '"9000"\r'])
+def test_stored_mtu_is_set(value, keep):
+    info = keep("/etc/kovainfo.conf")
+    with open(info, "a", newline="") as file:
+        file.write(f"eth0_mtu={value}\n")
+    configure("eth0", STATIC.format("192.168.77.5"))
+    network("start", "eth0")
+    assert pathlib.Path("/sys/class/net/eth0/mtu").read_text() == "9000\n"
+    run("ip", "link", "set", "eth0", "mtu", "1500")
+
+
+@pytest.mark.parametrize("value", ["", "jumbo", "1500 up", "99999999"])
+def test_stored_mtu_that_cannot_be_set_is_told_and_costs_no_address(value, keep):
+    keep("/etc/kovainfo.conf").write_text(f"eth0_mtu={value}\n")
+    configure("eth0", STATIC.format("192.168.77.5"))
+    assert f'eth0: cannot set the MTU "{value}"' in network("start", "eth0", status=1).stderr
+    assert addresses("eth0") == ["192.168.77.5/24"]
 
 
 def test_empty_master_is_no_bond_member():

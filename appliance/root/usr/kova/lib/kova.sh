@@ -5,6 +5,7 @@ umask 022
 PATH=/usr/sbin:/usr/bin:/sbin:/bin
 LC_ALL=C
 export PATH LC_ALL
+carriage_return=$(printf '\r')
 
 # fail TEXT...: tells the caller and the system log what went wrong; always false
 fail() {
@@ -17,11 +18,10 @@ fail() {
 # quotes; false when the file or the key is not there
 key_value() (
     [ -f "$1" ] || exit 1
-    cr=$(printf '\r')
     while IFS= read -r line || [ -n "$line" ]; do
         case $line in "$2="*) ;; *) continue ;; esac
         line=${line#"$2="}
-        while [ "$line" != "${line%"$cr"}" ]; do line=${line%"$cr"}; done
+        while [ "$line" != "${line%"$carriage_return"}" ]; do line=${line%"$carriage_return"}; done
         case $line in \"*\")
             line=${line#\"}
             line=${line%\"}

@@ -1,0 +1,199 @@
+# box: --link eth0 --link lan0 --link lan1 --link lan2
+# needs: bonding bridge vlan
+"""Bonds: made, changed and deleted by the library over links that run, with traffic while one of them is cut."""
+
+import ctypes
+import pathlib
+import re
+
+import pytest
+from conftest import SLOWNESS, DhcpServer, addresses, is_up, on_other_side, run, wait_for
+from sdk import STATIC, Bond, card, library, register
+
+SCRIPTS = pathlib.Path("/etc/sysconfig/network-scripts")
+LINKS = ("lan0", "lan1", "lan2")
+UNKNOWN, ALB, LACP, XOR, BACKUP, ROUND_ROBIN = range(6)
+# mode: the kernel's name and number, what is added to the options, and the partner that goes with it
+KERNEL_MODES = {
+    ALB: ("balance-alb 6", "", "bridge"),
+    LACP: ("802.3ad 4", " lacp_rate=fast", "bond mode 4 lacp_rate fast"),
+    XOR: ("balance-xor 2", "", "bond mode 2"),
+    BACKUP: ("active-backup 1", "", "bridge"),
+    ROUND_ROBIN: ("balance-rr 0", "", "bond mode 0"),
+}
+FILE = "DEVICE={0}\nONBOOT=yes\nBOOTPROTO=static\nIPADDR=192.168.9{1}.5\nNETMASK=255.255.255.0\n"
+BAD_PARAMETER = 0xD00
+
+
+def path(link):
+    return SCRIPTS / f"ifcfg-{link}"
+
+
+@pytest.fixture(autouse=True)
+def running_links(keep):
+    """Three links with an address each, and no bond."""
+    keep("/etc/kovainfo.conf")
+    for number, link in enumerate(LINKS):
+        path(link).write_text(FILE.format(link, number))
+    run("/etc/rc.network", "start", *LINKS)
+    yield
+    bonds = [name for name in ("bond0", "bond0.20") if path(name).exists()]
+    run("/etc/rc.network", "stop", *bonds, *LINKS)
+    for file in SCRIPTS.glob("ifcfg-*"):
+        if file.name != "ifcfg-eth0":
+            file.unlink()
+    assert run("ip", "-o", "link", "show", "type", "bond").stdout == ""
+
+
+@pytest.fixture
+def partner():
+    """partner(kind): the other side of links as one bridge or bond "uplink" with the address 192.168.90.1."""
+
+    def make(kind, links=("lan0", "lan1")):
+        on_other_side("ip", "link", "del", "uplink", status=None)
+        more = " miimon 50" if kind.startswith("bond") else ""
+        joined = "".join(f"link set {link} down\nlink set {link} master uplink\nlink set {link} up\n" for link in links)
+        on_other_side("ip", "-batch", "-", input=f"link add uplink type {kind}{more}\n{joined}link set uplink up\n"
+                                                 "addr add 192.168.90.1/24 dev uplink\n")  # fmt: skip
+
+    yield make
+    on_other_side("ip", "-batch", "-", input="link del uplink\n" + "".join(f"link set {link} up\n" for link in LINKS))
+
+
+def bond(mode, members=("lan0", "lan1"), name="bond0"):
+    wanted = Bond(szName=name.encode(), mode=mode, cSlaves=len(members))
+    for place, member in zip(wanted.aszSlaves, members):
+        place.value = member.encode()
+    return wanted
+
+
+def set_bond(wanted):
+    return library.KOVANetLinkAggrSet(ctypes.byref(wanted))
+
+
+def get_bond(name="bond0"):
+    found = Bond()
+    assert library.KOVANetLinkAggrGet(name.encode(), ctypes.byref(found)) == 0, register()
+    return found
+
+
+def of_kernel(attribute):
+    return pathlib.Path(f"/sys/class/net/bond0/bonding/{attribute}").read_text().strip()
+
+
+def member_states():
+    """The link of each member as the bond sees it."""
+    text = pathlib.Path("/proc/net/bonding/bond0").read_text()
+    return dict(re.findall(r"Slave Interface: (\S+)\nMII Status: (\S+)\n", text))
+
+
+def keys(link):
+    return sorted(path(link).read_text().splitlines())
+
+
+def reaches_partner():
+    return run("ping", "-c", "1", "-W", str(SLOWNESS), "192.168.90.1", status=None).returncode == 0
+
+
+def wait_for_partner():
+    wait_for(reaches_partner, 30, "an answer of the partner")
+
+
+def wait_for_links(**wanted):
+    wait_for(lambda: member_states() == wanted, 30, f"the links {wanted}")
+
+
+@pytest.mark.parametrize("mode", KERNEL_MODES)
+def test_a_bond_carries_traffic_while_a_link_is_cut_and_gives_back_what_it_took(mode, partner):
+    kernel_mode, more, kind = KERNEL_MODES[mode]
+    partner(kind)
+    files = {link: keys(link) for link in LINKS}
+
+    assert set_bond(bond(mode)) == 0, register()
+    assert (of_kernel("mode"), of_kernel("slaves")) == (kernel_mode, "lan0 lan1")
+    assert (of_kernel("miimon"), of_kernel("updelay"), of_kernel("use_carrier")) == ("100", "100", "0")
+    assert addresses("bond0") == ["192.168.90.5/24"]
+    assert [addresses(link) for link in LINKS] == [[], [], ["192.168.92.5/24"]]
+    options = f'BONDING_OPTS="mode={kernel_mode[-1]} use_carrier=0 miimon=100 updelay=100{more}"'
+    assert keys("bond0") == sorted([*FILE.format("bond0", 0).splitlines(), "USERCTL=no", options])
+    for link in ("lan0", "lan1"):
+        assert keys(link) == sorted([*files[link], "MASTER=bond0", "SLAVE=yes", "USERCTL=no"])
+    found = get_bond()
+    assert (found.mode, found.members()) == (mode, ["lan0", "lan1"])
+    wait_for_links(lan0="up", lan1="up")
+    wait_for_partner()
+
+    for cut, kept in (("lan0", "lan1"), ("lan1", "lan0")):
+        on_other_side("ip", "link", "set", cut, "down")
+        wait_for_links(**{cut: "down", kept: "up"})
+        wait_for_partner()
+        assert library.KOVANetIfIsLink(b"bond0") == 1
+        on_other_side("ip", "link", "set", cut, "up")
+        wait_for_links(lan0="up", lan1="up")
+
+    assert set_bond(bond(UNKNOWN)) == 0, register()
+    assert not pathlib.Path("/sys/class/net/bond0").exists() and not path("bond0").exists()
+    assert {link: keys(link) for link in LINKS} == files
+    assert [addresses(link) for link in LINKS] == [["192.168.90.5/24"], ["192.168.91.5/24"], ["192.168.92.5/24"]]
+    assert all(is_up(link) for link in LINKS)
+
+
+def test_an_aggregation_knows_whether_it_has_a_partner(partner):
+    partner("bridge")
+    assert set_bond(bond(LACP)) == 0, register()
+    assert get_bond().blNoPartner == 1
+    partner("bond mode 4 lacp_rate fast")
+    wait_for(lambda: get_bond().blNoPartner == 0, 30, "the partner")
+    mac = on_other_side("cat", "/sys/class/net/uplink/address").stdout.strip()
+    assert of_kernel("ad_partner_mac") == mac
+    wait_for_partner()
+
+
+def test_a_bond_changes_mode_and_members_and_keeps_its_vlan(partner):
+    partner("bridge", LINKS)
+    assert set_bond(bond(BACKUP, LINKS)) == 0, register()
+    static = card(STATIC, "bond0", "192.168.90.5", "255.255.255.0")
+    assert library.KLIBNetVlanCreate(b"bond0", 20, ctypes.byref(static)) == 0, register()
+    assert (addresses("bond0"), addresses("bond0.20")) == ([], ["192.168.90.5/24"])
+
+    partner("bond mode 4 lacp_rate fast", LINKS)
+    on_other_side("ip", "-batch", "-", input="link add link uplink name uplink.20 type vlan id 20\naddr flush dev uplink\n"
+                                             "link set uplink.20 up\naddr add 192.168.90.1/24 dev uplink.20\n")  # fmt: skip
+    assert set_bond(bond(LACP, LINKS)) == 0, register()
+    assert (of_kernel("mode"), of_kernel("slaves")) == ("802.3ad 4", "lan0 lan1 lan2")
+    assert addresses("bond0.20") == ["192.168.90.5/24"]
+    wait_for_partner()
+    index = run("cat", "/sys/class/net/bond0/ifindex").stdout
+    wait_for(lambda: get_bond().blNoPartner == 0, 30, "the partner")
+    assert set_bond(get_bond()) == 0
+    assert run("cat", "/sys/class/net/bond0/ifindex").stdout == index, "made anew although nothing changed"
+
+    assert set_bond(bond(LACP, ("lan0", "lan1"))) == 0, register()
+    assert of_kernel("slaves") == "lan0 lan1"
+    assert "MASTER" not in path("lan2").read_text()
+    assert is_up("lan2"), "left behind"
+    wait_for_partner()
+
+
+def test_a_bond_takes_over_the_lease_of_its_first_member(partner, tmp_path):
+    partner("bridge")
+    with DhcpServer("uplink", "192.168.60", folder=tmp_path):
+        path("lan0").write_text("DEVICE=lan0\nONBOOT=yes\nBOOTPROTO=dhcp\n")
+        run("/etc/rc.network", "start", "lan0")
+        leased = wait_for(lambda: [one for one in addresses("lan0") if one.startswith("192.168.60.")], 60, "a lease")
+        assert set_bond(bond(BACKUP)) == 0, register()
+        assert wait_for(lambda: addresses("bond0"), 60, "the bond's lease") == leased
+        assert addresses("lan0") == []
+        assert set_bond(bond(UNKNOWN)) == 0, register()
+        assert wait_for(lambda: addresses("lan0"), 60, "the member's lease") == leased
+        run("/etc/rc.network", "stop", "lan0")
+
+
+@pytest.mark.parametrize("members", [(), ("lan0",), ("lan0", "")])
+def test_too_few_members_are_refused_and_run_on(members):
+    files = {link: keys(link) for link in LINKS}
+    assert set_bond(bond(BACKUP, members)) == -1
+    assert register()[0] == BAD_PARAMETER
+    assert not path("bond0").exists() and not pathlib.Path("/sys/class/net/bond0").exists()
+    assert {link: keys(link) for link in LINKS} == files
+    assert [addresses(link) for link in LINKS] == [["192.168.90.5/24"], ["192.168.91.5/24"], ["192.168.92.5/24"]]
