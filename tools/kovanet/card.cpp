@@ -168,19 +168,18 @@ void set_static(const std::string &name, const std::string &given, const std::st
     if (given.empty() || (slash == std::string::npos) == given_mask.empty()) {
         throw failure{kUsage, "give the address as ADDRESS/LENGTH, or as ADDRESS mask MASK"};
     }
-    const std::string address = given.substr(0, slash);
-    std::string mask = given_mask;
-    if (mask.empty()) {
-        require("address \"" + address + "\"", refuse_address(address));
-        require("prefix \"" + given + "\"", refuse_prefix(given));
-        mask = network_of(given).mask;
+    network fixed{given, given_mask};
+    if (given_mask.empty()) {
+        fixed = fixed_address_of(given);
+    } else {
+        require("address \"" + given + "\" with mask \"" + given_mask + "\"",
+                refuse_address_and_mask(given, given_mask));
     }
-    require("address \"" + address + "\" with mask \"" + mask + "\"", refuse_address_and_mask(address, mask));
 
     NETINFO card = record_for(name);
     card.nIPSource = 1;
-    snprintf(card.szIP, sizeof card.szIP, "%s", plain_address(address).c_str());
-    snprintf(card.szMask, sizeof card.szMask, "%s", plain_address(mask).c_str());
+    snprintf(card.szIP, sizeof card.szIP, "%s", plain_address(fixed.address).c_str());
+    snprintf(card.szMask, sizeof card.szMask, "%s", plain_address(fixed.mask).c_str());
     change(card);
 }
 

@@ -57,6 +57,29 @@ constexpr object kObjects[] = {
     {"block", "reasons that keep an interface from changes", add_block,
      "  kovanet block show eth0\n"
      "  kovanet block set eth0 ha on"},
+    {"vlan", "VLANs on the interfaces", add_vlan,
+     "  kovanet vlan list\n"
+     "  kovanet vlan create eth0 10 static 192.168.10.2/24\n"
+     "  kovanet vlan create eth0 10 keep --yes\n"
+     "  kovanet vlan show eth0.10\n"
+     "  kovanet vlan remove eth0.10"},
+    {"bond", "several interfaces used as one", add_bond,
+     "  kovanet bond list\n"
+     "  kovanet bond create bond0 802.3ad eth0 eth1\n"
+     "  kovanet bond change bond0 active-backup\n"
+     "  kovanet bond change bond0 active-backup eth0 eth1 eth2 --yes\n"
+     "  kovanet bond show bond0\n"
+     "  kovanet bond delete bond0"},
+    {"bridge", "bridges and their ports", add_bridge,
+     "  kovanet bridge list\n"
+     "  kovanet bridge set br0 master eth0 dhcp\n"
+     "  kovanet bridge set eth0 slave br0\n"
+     "  kovanet bridge set lbr0 local-lan wlan0 static 192.168.2.1/24\n"
+     "  kovanet bridge set eth0 none dhcp --yes"},
+    {"mtu", "largest packets of the interfaces", add_mtu,
+     "  kovanet mtu show\n"
+     "  kovanet mtu set eth0 9000\n"
+     "  kovanet mtu set eth0.10 1500 --yes"},
     {"dns", "name servers, and where they come from", add_dns,
      "  kovanet dns show\n"
      "  kovanet dns set 192.168.1.1 2001:db8::53\n"

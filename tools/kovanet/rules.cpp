@@ -220,4 +220,17 @@ network network_of(const std::string &prefix) {
     return {both.substr(0, slash), both.substr(std::min(slash + 1, both.size()))};
 }
 
+network fixed_address_of(const std::string &given) {
+    const size_t slash = given.find('/');
+    if (slash == std::string::npos) {
+        throw failure{kUsage, "give the address with its prefix length, as ADDRESS/LENGTH"};
+    }
+    const std::string address = given.substr(0, slash);
+    require("address \"" + address + "\"", refuse_address(address));
+    require("prefix \"" + given + "\"", refuse_prefix(given));
+    const std::string mask = network_of(given).mask;
+    require("address \"" + address + "\" with mask \"" + mask + "\"", refuse_address_and_mask(address, mask));
+    return {plain_address(address), mask};
+}
+
 } // namespace kova

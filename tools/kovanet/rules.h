@@ -45,5 +45,7 @@ struct network {
 };
 /** The network that an accepted prefix names. */
 network network_of(const std::string &prefix);
+/** The address that an interface gets, given with its prefix length, and its mask. Ends the program for a bad one. */
+network fixed_address_of(const std::string &given);
 
 } // namespace kova

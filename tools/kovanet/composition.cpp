@@ -1,0 +1,151 @@
+#include "composition.h"
+
+#include "errors.h"
+
+#include <cstdio>
+#include <kova/core.h>
+#include <kovanetsdk/addr.h>
+#include <kovanetsdk/bridge.h>
+#include <net/if.h>
+
+namespace kova {
+namespace {
+
+constexpr char kFolder[] = "/etc/sysconfig/network-scripts";
+constexpr int kWaitSeconds = 5;
+
+std::string file_of(const std::string &name) {
+    return std::string(kFolder) + "/ifcfg-" + name;
+}
+
+std::string key_of(const std::string &name, const char *key) {
+    char value[64] = "";
+    return KLIBCFileGetKeyValue(file_of(name).c_str(), key, value, sizeof value, 0) > 0 ? value : "";
+}
+
+} // namespace
+
+change_lock::change_lock() {
+    constexpr int kExclusive = 1;
+    clear_error();
+    if (KLIBCFileLockTimeByFile(kFolder, kExclusive, kWaitSeconds, &fd_) < 0) {
+        call_failed("cannot lock the interfaces");
+    }
+}
+
+change_lock::~change_lock() {
+    KLIBCFileUnlockByFile(fd_);
+}
+
+std::optional<VLANINFO> find_vlan(const std::string &name) {
+    VLANINFO vlan{};
+    clear_error();
+    const int result = KLIBNetVlanGet(name.c_str(), &vlan);
+    if (result < 0) {
+        call_failed("cannot ask whether " + name + " is a VLAN");
+    }
+    return result == 1 ? std::optional{vlan} : std::nullopt;
+}
+
+std::optional<VLANINFO> find_vlan_on(const std::string &row_device) {
+    for (const IFINFO &info : all_interfaces()) {
+        const std::optional<VLANINFO> vlan = find_vlan(info.szIfname);
+        if (vlan && row_device == vlan->szRowDevice) {
+            return vlan;
+        }
+    }
+    return std::nullopt;
+}
+
+void require_no_vlan_on(const std::string &name) {
+    if (const std::optional<VLANINFO> vlan = find_vlan_on(name)) {
+        throw failure{kNo, name + " has the VLAN " + vlan->szIfname + " already; first: kovanet vlan remove " +
+                               vlan->szIfname};
+    }
+}
+
+bool is_port(const std::string &name) {
+    return KLIBNetBridgeIfIsSlave(name.c_str()) == 1 || KOVANetIsIfBridgeType(name.c_str(), KLIB_BRIDGE_SLAVE) == 1;
+}
+
+IFINFO require_unused(const std::string &name) {
+    IFINFO info = require_interface(name);
+    if ((info.nFlags & (IFF_LOOPBACK | IFF_POINTOPOINT)) != 0) {
+        throw failure{kNo, name + " is not a network card; see kovanet card list"};
+    }
+    if (KOVANetIfIsBondingPassive(name.c_str()) == 1 || !key_of(name, "MASTER").empty()) {
+        throw failure{kNo, name + " is a member of a bond already; see kovanet bond list"};
+    }
+    if (is_port(name)) {
+        throw failure{kNo, name + " is a port of a bridge already; see kovanet bridge show " + name};
+    }
+    if (find_vlan(name)) {
+        throw failure{kNo, name + " is a VLAN, and nothing stands on a VLAN; see kovanet vlan list"};
+    }
+    require_no_vlan_on(name);
+    return info;
+}
+
+bool has_file(const std::string &name) {
+    return KLIBCFileExist(file_of(name).c_str()) == 1;
+}
+
+void require_file(const std::string &name) {
+    if (!has_file(name)) {
+        throw failure{kNo, name + " is not configured here: there is no " + file_of(name)};
+    }
+}
+
+ipv4_settings settings_of(const std::string &name) {
+    const std::string protocol = key_of(name, "BOOTPROTO");
+    if (protocol == "dhcp") {
+        return {ipv4_settings::kDhcp, {}};
+    }
+    const network fixed{key_of(name, "IPADDR"), key_of(name, "NETMASK")};
+    if (protocol != "static" || fixed.address.empty()) {
+        return {};
+    }
+    return {ipv4_settings::kStatic, fixed};
+}
+
+std::string text_of(const ipv4_settings &settings) {
+    switch (settings.source) {
+    case ipv4_settings::kStatic:
+        return "the address " + settings.fixed.address + " mask " + settings.fixed.mask;
+    case ipv4_settings::kDhcp:
+        return "an address from a DHCP server";
+    default:
+        return "no IPv4 address";
+    }
+}
+
+NETINFO record_of(const ipv4_settings &settings) {
+    NETINFO record{};
+    if (settings.source == ipv4_settings::kStatic) {
+        record.nIPSource = 1;
+        snprintf(record.szIP, sizeof record.szIP, "%s", settings.fixed.address.c_str());
+        snprintf(record.szMask, sizeof record.szMask, "%s", settings.fixed.mask.c_str());
+    }
+    return record;
+}
+
+void add_state(json &row, const std::string &name) {
+    const IFINFO info = find_interface(name).value_or(IFINFO{});
+    const int prefix = *info.szIP != '\0' ? KOVANetNetmaskToPrefix(info.szMask) : -1;
+    row["up"] = (info.nFlags & IFF_UP) != 0;
+    row["link"] = link_word(info.nLink != 0);
+    row["address"] = known_text(info.szIP);
+    row["prefix"] = known_number(prefix, 0);
+}
+
+std::string state_address(const json &row) {
+    return row["prefix"].is_null() ? field(row, "address") : field(row, "address") + "/" + field(row, "prefix");
+}
+
+std::string loss_of(const std::string &name) {
+    json row;
+    add_state(row, name);
+    return name + " loses " + (row["address"].is_null() ? "its addresses" : "its address " + state_address(row));
+}
+
+} // namespace kova
