@@ -1,13 +1,14 @@
 /**
  * @file
- * Validation and arithmetic of addresses, masks, prefixes and names.
+ * Validation and arithmetic of addresses, masks, prefixes and names; what is in use on the network around: addresses of
+ * other hosts, local ports, the addresses of a name; waking a host.
  *
  * The notion of a valid address is narrower than the C library's, and in one way wider: each part of a dotted IPv4 text
  * is a number as C writes it, so that 0x0a and 012 are both 10.
  *
  * Unless a call says otherwise, an argument that is NULL is logged, sets NET_ERR_BAD_PARAMETER and gives the failure
- * value; every other failure sets its code without a log line. No call takes a lock or touches a file; only
- * KOVANetCalNetwork and KOVANetCalBroadcast run a program.
+ * value; every other failure sets its code without a log line. No call takes a lock, touches a file or runs a program
+ * unless it says so.
  */
 #ifndef KOVANETSDK_ADDR_H
 #define KOVANETSDK_ADDR_H
@@ -169,6 +170,92 @@ int BlKLIBIsDomain(const char *szDomain);
  * @return 1 or 0
  */
 int BlKLIBIsHostname(const char *szHostname);
+
+/* ---- addresses of other hosts ---------------------------------------------------------------------------------- */
+
+/**
+ * Whether another host answers at an address. Runs "/bin/ping -c 1 -w 2", so that an address nobody has takes up to two
+ * seconds; not for the interface's own address, whatever way its numbers are written.
+ * @param szIfname  interface whose own address is no conflict; not empty
+ * @param szIP      address, as the tool takes it; not empty, and not an option
+ * @return 1 a host answers; 0 none does, or it is the interface's own; -1, logged, with NET_ERR_BAD_PARAMETER,
+ *         NET_ERR_EXEC (the tool cannot be run) or the code of KOVAILnxGetIP
+ */
+int KOVAIIpConflict(const char *szIfname, const char *szIP);
+
+/**
+ * Whether a member of a bond is configured with the bond's own address. The first member is not looked at: the bond has
+ * its address from there. Reads the bond as KOVANetLinkAggrGet does, and the interface files of the bond and its
+ * members ("ovs_%s" with the member's name for a bond of the virtual switch), under the lock 0x105 each; a member
+ * without an address is noted in the log.
+ * @param szBond  bond
+ * @param szName  receives up to 4 characters of the member's name, cut to the buffer; "" without a conflict
+ * @param cbName  size of szName, above 0
+ * @return 1 a member has it; 0 none has; -1, logged, with NET_ERR_BAD_PARAMETER, or with the code of
+ *         KOVANetLinkAggrGet or KOVAILnxGetIPFromCfg
+ */
+int KOVANetBondIPConflict(const char *szBond, char *szName, int cbName);
+
+/* ---- names of hosts -------------------------------------------------------------------------------------------- */
+
+/** An address that a name stands for. */
+typedef struct KOVALOOKUPIP {
+    char szIP[46];   /**< the address in text */
+    int32_t nFamily; /**< 2 for IPv4, 10 for IPv6 */
+} KOVALOOKUPIP;
+
+/**
+ * Looks up the addresses of a name: with the system's resolver, and when that knows none and the name holds neither "."
+ * nor ":", by asking the local network with "/usr/bin/nmblookup" (of its output at most 65,536 lines or 64 MiB are
+ * read; a name of more than 68 characters, or one that begins with "-", is not asked for). Name servers that do not
+ * answer take as long as
+ * "/etc/resolv.conf" gives them.
+ * @param szName      name or address; not empty
+ * @param pResult     receives the addresses in the order of the answers; every record is zeroed first
+ * @param cResult     records in pResult; pResult may be NULL when it is 0
+ * @param blCountAll  not 0: count all addresses there are, also those behind the last record
+ * @return number of addresses, above cResult only with blCountAll; 0 when there is none or the name cannot be looked
+ *         up, with NET_ERR_BAD_PARAMETER for a bad argument, NET_ERR_OUT_OF_MEMORY, logged, when the tool's output
+ *         cannot be read, and NET_ERR_EXEC, logged, when the tool cannot be run
+ */
+int KOVANetLookupIP(const char *szName, KOVALOOKUPIP *pResult, int cResult, int blCountAll);
+
+/* ---- local ports ----------------------------------------------------------------------------------------------- */
+
+/**
+ * Whether a socket of this machine, connected or not, has a local port of a range. Reads "/proc/net/tcp" and
+ * "/proc/net/tcp6", or "/proc/net/udp" and "/proc/net/udp6"; one that cannot be read is noted in the log and left out.
+ * @param nLow, nHigh  lowest and highest port
+ * @param nProtocol    1 for TCP, anything else for UDP
+ * @return 1 or 0; 0 also when nLow is above nHigh
+ */
+int KOVANetIsPortRangeUsed(int nLow, int nHigh, int nProtocol);
+
+/**
+ * The ports of a range at which sockets of this machine listen, from the files of KOVANetIsPortRangeUsed. Of UDP these
+ * are the sockets that the kernel reports in the state of listening (10), which an unconnected one is not.
+ * @param rgPort       receives the ports in the order in which the kernel lists them, each once
+ * @param pcPort       in: entries in rgPort, 0 or more; out: number stored, no more than that
+ * @param nLow, nHigh  lowest and highest port
+ * @param nProtocol    1 for TCP, anything else for UDP
+ * @return 0; -1 with NET_ERR_BAD_PARAMETER
+ */
+int KOVANetGetPortUsedInRange(int *rgPort, int *pcPort, int nLow, int nHigh, int nProtocol);
+
+/* ---- sleeping hosts -------------------------------------------------------------------------------------------- */
+
+/** Whom to wake. */
+typedef struct KLIBETHERWAKE {
+    unsigned char abMac[6]; /**< hardware address of the host */
+    char szIfname[16];      /**< interface to send over; at most 13 characters are used */
+} KLIBETHERWAKE;
+
+/**
+ * Sends one Wake-on-LAN frame: 110 bytes, to all hosts behind an interface. Needs the right to send raw frames.
+ * @return 0 when it is sent; -1, logged, with NET_ERR_BAD_PARAMETER (no request), NET_ERR_FILE_OPEN (no packet socket)
+ *         or NET_ERR_EXEC (no such interface, down, or refused)
+ */
+int KLIBNetEtherWake(const KLIBETHERWAKE *pWake);
 
 #ifdef __cplusplus
 }

@@ -53,8 +53,8 @@ int KLIBNetBridgeIfIsSlave(const char *szIfname);
  * Appends the ports of a bridge to a list (/sys/class/net/<name>/brif/).
  * @param szBridge  bridge
  * @param pMembers  list of the caller
- * @return number of ports; -1, logged, for a missing argument or what is no bridge (0xD00 for a bad name), or below 0
- *         with 0x900 or 0x200
+ * @return number of ports; -1, logged, with 0xD00 for a missing argument or bad name, without a code for what is no
+ *         bridge; below 0 with 0x900 or 0x200
  */
 int KLIBNetBridgeSlaveEnum(const char *szBridge, KLIBSZLIST *pMembers);
 /**
@@ -87,8 +87,8 @@ int KLIBNETGetBridgeInfoByTopology(const char *szIfname, BRIDGEINFO *pInfo, int 
  * @param pNetInfo  receives the name, in blLinkUp whether it is brought up at boot, in nIPSource whether it is static,
  *                  and if so address and mask; its other fields stay. Or NULL
  * @param pBridge   receives the role, or NULL
- * @return 0, also when a key is missing (logged); -1, logged, without both records, for a bad name (0xD00) or without a
- *         file
+ * @return 0, also when a key is missing (logged); -1, logged, with 0xD00 without both records or for a bad name,
+ * without a code when there is no file
  */
 int KOVANetGetBridgeConfig(const char *szIfname, NETINFO *pNetInfo, BRIDGEINFO *pBridge);
 /**
@@ -97,13 +97,14 @@ int KOVANetGetBridgeConfig(const char *szIfname, NETINFO *pNetInfo, BRIDGEINFO *
  * @param pNetInfo  blLinkUp non-zero to bring it up at boot; nIPSource non-zero for szIP and szMask, zero for DHCP. Or
  *                  NULL to leave these keys as they are
  * @param pBridge   szIfname, nType and szPeer
- * @return 0; -1 with 0xD00 (name), 0x200, the code of the rewrite, or for another role or no record (logged)
+ * @return 0; -1 with 0xD00 (no record, bad name), 0x200, the code of the rewrite, or without a code for another role
+ *         (logged)
  */
 int KOVANetSetBridgeConfig(const NETINFO *pNetInfo, const BRIDGEINFO *pBridge);
 /**
  * @param szIfname  interface
  * @param nType     role
- * @return 1 when its file gives it that role; else 0, logged when the file cannot be read
+ * @return 1 when its file gives it that role; else 0, logged when the file cannot be read, with 0xD00 for a bad name
  */
 int KOVANetIsIfBridgeType(const char *szIfname, int nType);
 /**

@@ -8,6 +8,11 @@
 #ifndef KOVANETSDK_CORE_H
 #define KOVANETSDK_CORE_H
 
+/**
+ * @defgroup errors Error codes
+ * What KLIBCErrGet gives after a failure.
+ * @{
+ */
 #define NET_ERR_UNKNOWN 0x100 /**< a lower step failed without a more specific cause */
 #define NET_ERR_OUT_OF_MEMORY                                                                                          \
     0x200                           /**< memory, a list or a map could not be had; a cluster address is not ready yet  \
@@ -28,5 +33,6 @@
 #define NET_ERR_EXISTS 0xBB00       /**< an entry to add to a fixed table is already there */
 #define NET_ERR_NOT_FOUND 0xBC00    /**< an entry or interface was not found, or is not of the required kind */
 #define NET_ERR_FULL 0xBD00         /**< a fixed table is full */
+/** @} */
 
 #endif

@@ -217,7 +217,7 @@ int DHCPIsRangeConflict(const char *ifname, const char *start, const char *end, 
  * (dhcpd6-) stay. What is moved stays moved when a later step fails.
  * @param old_if  name so far; no "\" in it
  * @param new_if  new name; no "\" in it
- * @return 0, also when there is nothing to move; -1 for bad names (0xD00 but for NULL) or a step that failed
+ * @return 0, also when there is nothing to move; -1 for bad names (0xD00) or a step that failed
  */
 int DHCPDConfChangeInterface(const char *old_if, const char *new_if);
 

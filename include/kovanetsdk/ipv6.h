@@ -1,6 +1,6 @@
 /**
  * @file
- * IPv6 addresses and kernel switches of one interface.
+ * IPv6 addresses and kernel switches of one interface, and how it is configured.
  */
 #ifndef KOVANETSDK_IPV6_H
 #define KOVANETSDK_IPV6_H
@@ -20,6 +20,15 @@ typedef struct KOVAV6IP {
     uint16_t nFlags;        /**< kernel address flags: 0x08 duplicate found, 0x40 tentative */
 } KOVAV6IP;
 
+/** How IPv6 of an interface is configured: the text of IPV6INIT in its file, which is compared in any case. */
+enum {
+    NET_IPV6_AUTO = 0,      /**< "auto": addresses made from what routers advertise */
+    NET_IPV6_OFF = 1,       /**< "off": no IPv6 */
+    NET_IPV6_DHCP = 2,      /**< "dhcp": address and name servers of a DHCPv6 server */
+    NET_IPV6_STATIC = 3,    /**< "static": a fixed address, and a gateway if there is one */
+    NET_IPV6_AUTO_DHCP = 4, /**< "auto_dhcp": as auto, and name servers of a DHCPv6 server */
+};
+
 /**
  * Lists the IPv6 addresses of an interface (/proc/net/if_inet6).
  * @param szIfname  interface
@@ -31,7 +40,8 @@ int KOVALnxV6IPGet(const char *szIfname, KOVAV6IP *rgV6IP, int cMax);
 
 /**
  * Adds or deletes an IPv6 address with KOVANetSetIP, or, with a gateway, the IPv6 default route (/sbin/ip -6 route).
- * Takes no lock: the caller holds 0x106.
+ * Takes no lock and asks for none: callers that change the same interface at once are kept apart only by a lock that
+ * they hold themselves.
  * @param nCmd           0 add, 1 delete
  * @param szDevice       interface
  * @param szV6IPAddr     address; also needed with a gateway
@@ -76,6 +86,56 @@ int KOVALnxIPv6ProcAction(const char *szIfname, int nSwitch);
  * @return 0; -1 with 0xD00 (the name), 0x900 (no file), or as KOVALnxIPv6ProcAction
  */
 int KOVALnxIPv6FlushAddr(const char *szIfname);
+
+/**
+ * Reads how IPv6 of an interface is configured (IPV6INIT, IPV6ADDR, IPV6PREFIXLENG and IPV6_DEFAULTGW in its file).
+ * What the file does not say stays empty. Takes no lock.
+ * @param szIfname       logical interface (one that counts under kind 2)
+ * @param pMode          receives one of NET_IPV6_...
+ * @param szV6IPAddr     receives the fixed address, kept also while another mode is used, or ""
+ * @param cbV6IPAddr     bytes in szV6IPAddr, at least 46
+ * @param pPrefixLength  receives the address's prefix length, or -1
+ * @param szGateway      receives the default router, or ""
+ * @param cbGateway      bytes in szGateway, at least 46
+ * @return 1 read; 0 when IPv6 was never configured, or for no logical interface (0xBC00, the outputs stay as they are);
+ *         -1 with 0xD00 (an argument), 0x900 (no file), 0x1000 (a value is no IPv6 address) or 0x4000 (a mode or prefix
+ *         length that is none): what was read before is filled in
+ */
+int KOVANetIPv6ConfGet(const char *szIfname, int *pMode, char *szV6IPAddr, int cbV6IPAddr, int *pPrefixLength,
+                       char *szGateway, int cbGateway);
+
+/**
+ * Configures IPv6 of an interface: its file, the kernel's switches, the DHCPv6 client (/sbin/start and /sbin/stop
+ * dhcp-client6), address and default route (as KOVANetIPv6IPAction). An address that cannot be set is refused before
+ * anything is changed. When a change fails later on an interface whose IPv6 was off, IPv6 is switched off again; what
+ * else was done stays. Takes no lock. Blocks up to 5 seconds while the link-local address settles, in the modes
+ * NET_IPV6_DHCP and NET_IPV6_STATIC 5 more for the kernel to find duplicates of the address.
+ * @param nMode          one of NET_IPV6_...
+ * @param szIfname       logical interface (one that counts under kind 2)
+ * @param szV6IPAddr     NET_IPV6_STATIC: address, without a prefix length; otherwise not looked at
+ * @param nPrefixLength  NET_IPV6_STATIC: 0 to 128
+ * @param szGateway      NET_IPV6_STATIC: default router, in the address's subnet or link-local; NULL or "" for none
+ * @return 0 done;
+ *         2 NET_IPV6_STATIC: the address is link-local, nothing was changed;
+ *         3 NET_IPV6_STATIC: the gateway is neither link-local nor in the address's subnet; address and mode are set
+ * and stored, the gateway is not; above 0, with NET_IPV6_STATIC and NET_IPV6_DHCP: that many addresses were found on
+ * another machine, too, and removed; the mode is not stored. Two or three of them give 2 or 3 as well: what is stored
+ * (KOVANetIPv6ConfGet) and the log tell which it was; -1 with 0xD00 (the name, or a prefix length above 128), 0xBC00
+ * (no such interface), 0x1000 (no IPv6 address, or none that an interface or a router can have), 0x900 or 0xB00 (a
+ * switch or the file), the code of the step that failed, or without one (another mode; a program that failed)
+ */
+int KOVANetIPv6ConfSet(int nMode, const char *szIfname, const char *szV6IPAddr, int nPrefixLength,
+                       const char *szGateway);
+
+/**
+ * Sets the switch of every interface for router advertisements (/proc/sys/net/ipv6/conf/IF/accept_ra) as its file says:
+ * IPV6_ACCEPT_RA, and without it IPV6INIT, where everything but "static" accepts them. For the boot. Loopback, members
+ * of bonds and bridges, and interfaces without a file are left alone; one whose file cannot be read is skipped. Looks
+ * at 32 interfaces at most. Takes no lock.
+ * @return 0; -1 with 0x200 (memory), 0x3400 (no socket), the code of the listing, or 0x900 or 0xB00 when a switch
+ * cannot be set: those behind it in the listing are not set either
+ */
+int KOVANetIpv6Init(void);
 
 #ifdef __cplusplus
 }

@@ -18,5 +18,6 @@
 #include <kovanetsdk/pppoe.h>
 #include <kovanetsdk/routing.h>
 #include <kovanetsdk/stats.h>
+#include <kovanetsdk/tunnel.h>
 
 #endif

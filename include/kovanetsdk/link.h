@@ -93,8 +93,8 @@ int KOVANetLinkAggrEnum(KLIBSZLIST *pBonds);
  * members that had its address, too, are left without one. Raises "net/ifname_change" around making and deleting, from
  * members to bond and back. The DHCP server's switches are DHCPDLinkAggrSet's matter. Takes no lock.
  * @param pOpt  the bond wanted: szName, mode, cSlaves (2 to 32) and aszSlaves, sorted, unused bytes zero, blNoPartner
- *              as read; with fewer members a bond that is there stays. mode 0 deletes it, and receives its members,
- *              whatever stood there. Equal to what is there: nothing is done
+ *              as read; with fewer members, or an interface named twice, a bond that is there stays. mode 0 deletes it,
+ *              and receives its members, whatever stood there. Equal to what is there: nothing is done
  * @return 0; -1 with 0xD00, 0x200, 0x2A00 (a copy), the codes of reading the bond or of the rewrite, or without a code
  *         when the event cannot be opened (nothing done)
  */
@@ -110,7 +110,7 @@ int KOVANetLinkAggrConfSetSlave(const char *szSlave, int blEnslave, const KOVALI
 /**
  * Rewrites the files so that a bond is no more: its first member gets its file, all leave, its own is deleted. Put back
  * from the ".saved" copies when a step fails; these copies stay otherwise. The first member's is made after it got the
- * bond's file, so that this is what it has after a failure.
+ * bond's file: after a failure it is a member with the bond's settings.
  * @param pOpt  the bond and its members
  * @return 0; -1 with 0xD00, 0x2A00 (a copy), 0x200, or the code of the step
  */

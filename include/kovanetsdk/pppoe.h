@@ -1,6 +1,7 @@
 /**
  * @file
- * PPPoE client: settings and secret, start and stop, the interface of the connection.
+ * PPPoE client: settings and secret, start and stop, the interface of the connection. PPPoE relay: settings of each
+ * bridge that is relayed, and the relay processes they ask for.
  */
 #ifndef KOVANETSDK_PPPOE_H
 #define KOVANETSDK_PPPOE_H
@@ -35,17 +36,19 @@ typedef struct PPPOE_CONF {
 int PPPoEConfigSet(const PPPOE_CONF *pConf);
 /**
  * Reads the settings back.
- * @param pConf  receives them; what is not there is "" (without a user also MTU and password), what is too long is cut
- * @return 0, also without a password for the user; -1, logged, without record, or when /etc/ppp/pppoe.conf or
- *         /etc/ppp/pap-secrets cannot be read
+ * @param pConf  receives them; what is not there is "" (without a user also MTU and password), what is too long is cut,
+ *               and blanks at the ends of a password are not part of it
+ * @return 0, also without a password for the user; -1, logged, with 0xD00 without record, or when /etc/ppp/pppoe.conf
+ * or /etc/ppp/pap-secrets cannot be read
  */
 int PPPoEConfigGet(PPPOE_CONF *pConf);
 /**
  * Starts or stops the connection with /usr/sbin/pppoe-start or pppoe-stop, waiting for it, and notes in pppoe_enable of
  * /etc/kovainfo.conf whether it is meant to be up: "yes" before a start, back to "no" when that fails. Takes no lock.
  * @param nOp  1 start, 0 stop
- * @return 0; 19 when the start script ended with it; -1 with 0xD00, the code of a key that could not be written, or
- *         when the start failed otherwise. Whether the stop script succeeds is not looked at
+ * @return 0; 19 when the start script ended with it: the other side refuses user or password; -1 with 0xD00, the code
+ * of a key that could not be written, or when the start failed otherwise. Whether the stop script succeeds is not
+ * looked at
  */
 int KOVAPPPoEService(int nOp);
 /**
@@ -79,6 +82,63 @@ int KOVAPPPoeNetInfoGet(char *szIP, int cbIP, char *szMask, int cbMask);
  * @return 0; -1 as KOVAPPPoECheckStatus, PPPoEConfigGet and KOVAPPPoEService
  */
 int KLIBDisablePPPoEOnIf(const char *szIfname);
+
+/** Settings of the relay of one bridge. */
+typedef struct PPPOE_RELAY_CONF {
+    uint32_t blEnabled; /**< 1: relay */
+    char szServer[16];  /**< interface towards the PPPoE server, or "" */
+} PPPOE_RELAY_CONF;
+
+/**
+ * Reads the relay settings of an interface from "enable" and "server" of /etc/sysconfig/pppoe-relay/<name>. A directory
+ * (mode 0755) or file that is missing is made, the file empty. Takes no lock.
+ * @param szIfname  interface whose clients are relayed; the file has the first 16 characters of its name
+ * @param pConf     receives the settings: blEnabled 1 when "enable" is exactly "yes", else 0; szServer cut to 15
+ *                  characters, "" without the key
+ * @return 0; -1, logged, with 0xD00 for a missing argument or a name that cannot be a file's, or when directory or file
+ *         cannot be made or read (0x900 or as KLIBCFileTouch)
+ */
+int KOVANetGetPPPoERelayConfig(const char *szIfname, PPPOE_RELAY_CONF *pConf);
+/**
+ * Stores the relay settings of an interface in one rewrite of its file, which is made like its directory when it is
+ * missing. A relay that runs is left alone. Takes no lock.
+ * @param szIfname  as KOVANetGetPPPoERelayConfig
+ * @param pConf     the settings: blEnabled 1 stores "yes", anything else "no"; szServer is "" or a text, terminated
+ *                  within its field, that can be an interface's name (else 0xD00 before anything is made)
+ * @return 0; -1, logged, with 0xD00 without settings or for a bad name, or when directory or file cannot be made (0x900
+ *         or as KLIBCFileTouch); -1 with 0x200, or as KLIBCFileSetKeys
+ */
+int KOVANetSetPPPoERelayConfig(const char *szIfname, const PPPOE_RELAY_CONF *pConf);
+/**
+ * Whether two settings are the same.
+ * @param pConf, pOther  the settings
+ * @return 1 both flags and both servers are equal; else 0, with 0xD00, logged, without a record
+ */
+int KOVANetIsSamePPPoERelayConfig(const PPPOE_RELAY_CONF *pConf, const PPPOE_RELAY_CONF *pOther);
+/**
+ * Brings the relay process of an interface into step with its settings. It is to run when the interface is a bridge of
+ * the local LAN by its file, up, and enabled: then "/usr/sbin/pppoe-relay -C <name> -S <server>" is started unless it
+ * runs with that server. One with another server, or that is not to run, is sent SIGTERM. The start is waited for; the
+ * relay goes to the background by itself. The end of a relay that was sent SIGTERM is not waited for. Takes no lock.
+ * @param szIfname  interface
+ * @return 0; -1, logged, with 0xD00 without a name, as KOVANetGetPPPoERelayConfig, when the relay cannot be stopped (as
+ *         KLIBCKill) or its start fails (0x2A00)
+ */
+int KOVANetApplyPPPoERelayConfig(const char *szIfname);
+/**
+ * The same for every interface that has a file in /etc/sysconfig/pppoe-relay/, 128 at most, in the order of their
+ * names; the first failure is the end. A missing directory is made with mode 0754. Takes no lock.
+ * @return 0; -1, logged, when the directory cannot be made or listed (0x900 or 0x200), or as
+ *         KOVANetApplyPPPoERelayConfig
+ */
+int KOVANetApplyPPPoERelayConfigAll(void);
+/**
+ * Deletes the settings of all interfaces; what cannot be deleted is logged and stays. Relays that run are left alone.
+ * Takes no lock.
+ * @return 0, also without the directory; -1, logged, with 0x200 or when its path is no directory that can be listed
+ *         (0x900)
+ */
+int KOVANetClearPPPoERelayConfigAll(void);
 
 #ifdef __cplusplus
 }

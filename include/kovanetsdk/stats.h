@@ -1,6 +1,7 @@
 /**
  * @file
- * Traffic counters of the interfaces, and with them the cheapest list of the interfaces there are.
+ * Traffic counters of the interfaces, and with them the cheapest list of the interfaces there are. The topology that
+ * the appliance's interfaces are used in. Whether a host can be reached.
  */
 #ifndef KOVANETSDK_STATS_H
 #define KOVANETSDK_STATS_H
@@ -52,6 +53,65 @@ int KLIBNetStatGetAll(NETSTAT *pStat, int nItem);
  *         when there is no such interface; pStat is left as it was
  */
 int KLIBNetStatGetSingle(const char *szIfname, NETSTAT *pStat);
+
+/* ---- topology ------------------------------------------------------------------------------------------------- */
+
+/** Topologies. */
+enum {
+    KLIB_TOPOLOGY_UNKNOWN = 0, /**< none stored, or a model without the choice */
+    KLIB_TOPOLOGY_CLIENT = 1,  /**< wired and wireless each for itself */
+    KLIB_TOPOLOGY_BRIDGE = 2,  /**< wired and wireless in one bridge */
+    KLIB_TOPOLOGY_ROUTER = 3,  /**< wired to the outside, wireless in a bridge of its own for the local LAN */
+    KLIB_TOPOLOGY_COUNT = 4
+};
+
+/** Description of a topology. */
+typedef struct TOPOLOGYINFO {
+    int nTopology;     /**< a topology, index of gTopologyInfo */
+    char szName[64];   /**< its name in /etc/kovainfo.conf */
+    char szIfname[16]; /**< interface that has the appliance's address */
+    int blClient;      /**< 1 the client topology, else 0 */
+    int nIFInfoRow;    /**< row of grgTopologyIFInfo (bridge.h) with the roles of the interfaces */
+} TOPOLOGYINFO;
+
+/** The descriptions, as they are without VLANs. */
+/* NOLINTNEXTLINE(bugprone-dynamic-static-initializers): a constant table, declared for C */
+extern const TOPOLOGYINFO gTopologyInfo[KLIB_TOPOLOGY_COUNT];
+
+/**
+ * Tells the topology: the one whose name, in any case, is "net_topology" of /etc/kovainfo.conf, on models that have
+ * "support_net_topology" = "yes" there. Takes no lock.
+ * @param pInfo  in: nTopology 1 to 3 asks for the description of that topology, anything else for that of the current
+ *               one. Receives the description, with the name of the first VLAN (/proc/net/vlan/config) that is on
+ *               szIfname in its place; VLANs that cannot be read count as none. Untouched on a model without the
+ * choice. Or NULL
+ * @return the topology described, or with NULL the current one; 0 when there is none, which is logged when the key is
+ *         missing. Sets no code of its own
+ */
+int KLIBNetTopologyGet(TOPOLOGYINFO *pInfo);
+/**
+ * Stores a topology for KLIBNetTopologyGet: "net_topology" of /etc/kovainfo.conf. Nothing of the network changes.
+ * Takes no lock beyond that of the rewrite.
+ * @param pInfo  its szName is stored, whether a topology has it or not
+ * @return 0; -1 with 0xD00, logged, without a record, or as KLIBCINFOSetKeyValue
+ */
+int KLIBNETSetTopologyConfigs(const TOPOLOGYINFO *pInfo);
+
+/* ---- reachability --------------------------------------------------------------------------------------------- */
+
+/**
+ * Whether a TCP connection to a host can be opened. Its addresses from getaddrinfo are tried one after the other; when
+ * none answers, those that /usr/bin/nmblookup tells for the name. A connection that opens gets one zero byte and is
+ * closed. Signals do not end the wait, and no SIGPIPE is raised.
+ * @param szHost   name or address, IPv4 or IPv6
+ * @param nPort    1 to 65535
+ * @param nTimeout seconds to wait for each address, 0 or more: all of it takes up to as many times that as there are
+ *                 addresses, and the time that the resolver and nmblookup take
+ * @return 1; else 0, with 0xD00, logged, for a bad argument (NULL, an empty host among them), and with 0x2A00 or 0x200,
+ *         logged, when /usr/bin/nmblookup cannot be run or its output not be read; a host of more than 68 characters,
+ * or one that begins with "-", is not asked for with it
+ */
+int BlKLIBIsConnected(const char *szHost, int nPort, int nTimeout);
 
 #ifdef __cplusplus
 }

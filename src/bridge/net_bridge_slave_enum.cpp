@@ -7,7 +7,7 @@ extern "C" int KLIBNetBridgeSlaveEnum(const char *szBridge, KLIBSZLIST *pMembers
     using namespace kova;
     constexpr int kAnyType = 64; // ports are links
     if (szBridge == nullptr || pMembers == nullptr) {
-        return fail_keeping_code(HERE, -1, "Bad Parameter.");
+        return fail(HERE, NET_ERR_BAD_PARAMETER, -1, "Bad Parameter.");
     }
     if (refuses_ifname(HERE, "szBridge", szBridge)) {
         return -1;

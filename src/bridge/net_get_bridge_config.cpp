@@ -96,7 +96,7 @@ void save_copy(const ifcfg_path &path) {
 
 extern "C" int KOVANetGetBridgeConfig(const char *szIfname, NETINFO *pNetInfo, BRIDGEINFO *pBridge) {
     if (pNetInfo == nullptr && pBridge == nullptr) {
-        return fail_keeping_code(HERE, -1, "Wrong Parameter.");
+        return fail(HERE, NET_ERR_BAD_PARAMETER, -1, "Wrong Parameter.");
     }
     if (refuses_ifname(HERE, "szIfname", szIfname)) {
         return -1;
@@ -119,7 +119,7 @@ extern "C" int KOVANetGetBridgeConfig(const char *szIfname, NETINFO *pNetInfo, B
 
 extern "C" int KOVANetSetBridgeConfig(const NETINFO *pNetInfo, const BRIDGEINFO *pBridge) {
     if (pBridge == nullptr) {
-        return fail_keeping_code(HERE, -1, "Wrong Parameter.");
+        return fail(HERE, NET_ERR_BAD_PARAMETER, -1, "Wrong Parameter.");
     }
     const field_text ifname{pBridge->szIfname};
     if (refuses_ifname(HERE, "pBridge->szIfname", ifname.c_str())) {
@@ -146,7 +146,7 @@ extern "C" int KOVANetSetBridgeConfig(const NETINFO *pNetInfo, const BRIDGEINFO 
 
 extern "C" int KOVANetIsIfBridgeType(const char *szIfname, int nType) {
     if (szIfname == nullptr) {
-        return fail_keeping_code(HERE, 0, "Bad parameter");
+        return fail(HERE, NET_ERR_BAD_PARAMETER, 0, "Bad parameter");
     }
     BRIDGEINFO bridge = {};
     if (KOVANetGetBridgeConfig(szIfname, nullptr, &bridge) < 0) {

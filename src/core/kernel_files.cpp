@@ -7,11 +7,11 @@
 
 namespace kova {
 
-heap<char> next_line(const stream &file) {
+heap<char> next_line(FILE *file) {
     char *line = nullptr;
     size_t room = 0;
     errno = 0; // the end of the file is no error
-    const ssize_t length = getline(&line, &room, file.get());
+    const ssize_t length = getline(&line, &room, file);
     heap<char> owned{line};
     if (length < 0) {
         return nullptr;

@@ -27,7 +27,10 @@ private:
 };
 
 /** The next line of a stream without its newline, nothing at the end or when it cannot be read. */
-heap<char> next_line(const stream &file);
+heap<char> next_line(FILE *file);
+inline heap<char> next_line(const stream &file) {
+    return next_line(file.get());
+}
 
 /** Reads the decimal number a text begins with. @return whether there is one that fits */
 bool leading_number(const char *text, int &number);

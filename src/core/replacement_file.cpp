@@ -38,11 +38,9 @@ replacement_file::~replacement_file() {
     }
 }
 
-bool replacement_file::finish() const {
-    constexpr mode_t kReadableByAll = 0644;
+bool replacement_file::finish(mode_t mode) const {
     const int fd = fileno(stream_.get());
-    return ferror(stream_.get()) == 0 && fflush(stream_.get()) == 0 && fchmod(fd, kReadableByAll) == 0 &&
-           fsync(fd) == 0;
+    return ferror(stream_.get()) == 0 && fflush(stream_.get()) == 0 && fchmod(fd, mode) == 0 && fsync(fd) == 0;
 }
 
 bool replacement_file::replace() {

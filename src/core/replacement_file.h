@@ -7,6 +7,7 @@
 #include "core/guards.h"
 
 #include <climits>
+#include <sys/types.h>
 
 namespace kova {
 
@@ -22,8 +23,8 @@ public:
 
     [[nodiscard]] bool is_open() const { return stream_.is_held(); }
     [[nodiscard]] FILE *get() const { return stream_.get(); }
-    /** Everything is written: makes the file readable by all and brings it to the disk. */
-    [[nodiscard]] bool finish() const;
+    /** Everything is written: gives the file its mode, readable by all, and brings it to the disk. */
+    [[nodiscard]] bool finish(mode_t mode = 0644) const;
     /** Renames the finished file over its target. Where the directory cannot be synced, it is in place all the same. */
     [[nodiscard]] bool replace();
 

@@ -11,26 +11,27 @@ namespace kova {
 
 namespace {
 
-/** The printf format of a line's beginning, and whether unit or function fills its text. */
-struct beginning {
-    const char *format;
-    bool names_function;
-};
-
-beginning beginning_of(lead begin) {
-    switch (begin) {
+/** Writes how a line begins. */
+void begin_line(const place &at, char *out, size_t size) {
+    switch (at.begin) {
     case lead::unit:
-        return {"%s:%d ", false};
+        snprintf(out, size, "%s:%d ", at.unit, at.line);
+        break;
     case lead::unit_spaced:
-        return {"%s (%d) ", false};
+        snprintf(out, size, "%s (%d) ", at.unit, at.line);
+        break;
     case lead::function:
-        return {"%s(%d) ", true};
+        snprintf(out, size, "%s(%d) ", at.function, at.line);
+        break;
     case lead::function_colon:
-        return {"%s(%d): ", true};
+        snprintf(out, size, "%s(%d): ", at.function, at.line);
+        break;
+    case lead::unit_function:
+        snprintf(out, size, "%s %s(%d): ", at.unit, at.function, at.line);
+        break;
     case lead::none:
         break;
     }
-    return {nullptr, false};
 }
 
 #pragma GCC diagnostic push
@@ -42,10 +43,7 @@ beginning beginning_of(lead begin) {
 [[gnu::format(printf, 3, 0)]] void log_line(int level, const place &at, const char *format, va_list arguments) {
     const errno_keeper keep;
     char whole[1024] = "";
-    const beginning begin = beginning_of(at.begin);
-    if (begin.format != nullptr) {
-        snprintf(whole, sizeof whole, begin.format, begin.names_function ? at.function : at.unit, at.line);
-    }
+    begin_line(at, whole, sizeof whole);
     const size_t used = strlen(whole);
     snprintf(whole + used, sizeof whole - used, "%s", format);
     keep.restore(); // for %m

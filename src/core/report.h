@@ -20,6 +20,7 @@ enum class lead : unsigned char {
     unit_spaced,    ///< "%s (%d) ", unit and line
     function,       ///< "%s(%d) ", function and line
     function_colon, ///< "%s(%d): ", function and line
+    unit_function,  ///< "%s %s(%d): ", unit, function and line
 };
 
 /** The point in the source that reports. */
@@ -55,6 +56,11 @@ struct place {
 #define HERE_AS(name)                                                                                                  \
     ::kova::place {                                                                                                    \
         KOVA_UNIT, name, __LINE__, ::kova::lead::function                                                              \
+    }
+/** The same behind the unit's name. */
+#define HERE_IN_UNIT_AS(name)                                                                                          \
+    ::kova::place {                                                                                                    \
+        KOVA_UNIT, name, __LINE__, ::kova::lead::unit_function                                                         \
     }
 
 // What the register says, for log texts that end in "[0x%04X %s:%d]".

@@ -39,6 +39,16 @@ public:
     explicit field_text(const char (&field)[Size]) : built_text<Size + 1>("%.*s", static_cast<int>(Size), field) {}
 };
 
+/** Whether a record's field is terminated. */
+template<size_t Size> [[nodiscard]] bool ends_within(const char (&field)[Size]) {
+    return memchr(field, '\0', Size) != nullptr;
+}
+
+/** Whether a record's field is one line as well: a second one would be a line of its own in a file. */
+template<size_t Size> [[nodiscard]] bool is_one_line(const char (&field)[Size]) {
+    return ends_within(field) && strpbrk(field, "\r\n") == nullptr;
+}
+
 /** Copies a text, cut to the room there is; the size is above 0. */
 inline void copy_cut(char *out, size_t size, const char *text) {
     const size_t length = strnlen(text, size - 1);

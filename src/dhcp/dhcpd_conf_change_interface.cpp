@@ -108,7 +108,7 @@ int move_wpad(const rename_pair &names) {
 
 extern "C" int DHCPDConfChangeInterface(const char *old_if, const char *new_if) {
     if (old_if == nullptr || new_if == nullptr) {
-        return fail_keeping_code(HERE, -1, "Bad parameters");
+        return fail(HERE, NET_ERR_BAD_PARAMETER, -1, "Bad parameters");
     }
     if (refuses_name(HERE, "old_if", old_if) || refuses_name(HERE, "new_if", new_if)) {
         return -1;

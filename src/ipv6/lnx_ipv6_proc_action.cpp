@@ -1,11 +1,11 @@
 #include <kovanetsdk/ipv6.h>
 
 #include "core/guards.h"
+#include "core/pause.h"
 #include "core/report.h"
 #include "core/text.h"
 
 #include <algorithm>
-#include <ctime>
 #include <kovanetsdk/iface.h>
 
 using namespace kova;
@@ -37,7 +37,7 @@ void wait_for_addresses(const char *szIfname) {
     constexpr int kAttempts = 10;
     constexpr timespec kPause{0, 500'000'000};
     for (int i = 0; i < kAttempts && !is_settled(szIfname); ++i) {
-        nanosleep(&kPause, nullptr);
+        pause_for(kPause);
     }
 }
 

@@ -32,6 +32,13 @@ void restore_slaves(const KOVALINKAGGROPT &bond) {
     }
 }
 
+void set_member_keys(key_changes &changes, const char *szSlave, const char *szBond) {
+    changes.set(key::kDevice, szSlave);
+    changes.set(key::kUserCtl, "no");
+    changes.set(key::kMaster, szBond);
+    changes.set(key::kSlave, "yes");
+}
+
 bool has_usable_name(const KOVALINKAGGROPT &bond) {
     return is_usable_name(bond.szName);
 }

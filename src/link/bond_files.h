@@ -22,6 +22,9 @@ void drop_old_copies(const KOVALINKAGGROPT &bond);
 /** Puts the files of all members back. */
 void restore_slaves(const KOVALINKAGGROPT &bond);
 
+/** The keys that make a file that of a bond's member. */
+void set_member_keys(key_changes &changes, const char *szSlave, const char *szBond);
+
 /** Whether the bond's name can be part of a path, and ends within its field. */
 [[nodiscard]] bool has_usable_name(const KOVALINKAGGROPT &bond);
 

@@ -49,17 +49,24 @@ int release_slaves(const KOVALINKAGGROPT &bond, const char *szBondIP) {
 }
 
 int dissolve(const KOVALINKAGGROPT &bond) {
-    const ifcfg_path path{bond.szName};
-    const ifcfg_path first{bond.aszSlaves[0]};
-    if (KLIBCExec("/bin/cp", "-f", path.c_str(), first.c_str(), nullptr) != 0) {
-        return fail(HERE, NET_ERR_EXEC, -1, "Failed to copy %s to %s", path.c_str(), first.c_str());
-    }
     char szBondIP[20];
     read_bond_address(bond.szName, szBondIP);
     if (release_slaves(bond, szBondIP) < 0) {
         return -1;
     }
+    const ifcfg_path path{bond.szName};
     return unlink(path.c_str()) == 0 ? 0 : fail_keeping_code(HERE, -1, "remove file %s failed", path.c_str());
+}
+
+/** Its copy holds the bond's settings: as they are, the first member would be taken for a bond itself. */
+void rejoin_first_slave(const KOVALINKAGGROPT &bond) {
+    const char *const szFirst = bond.aszSlaves[0];
+    key_changes changes;
+    set_member_keys(changes, szFirst, bond.szName);
+    changes.remove(key::kBondingOpts);
+    if (changes.is_complete()) {
+        (void)changes.apply(ifcfg_path{szFirst}.c_str());
+    }
 }
 
 } // namespace
@@ -72,8 +79,18 @@ extern "C" int KOVANetLinkAggrConfDel(const KOVALINKAGGROPT *pOpt) {
         return -1;
     }
     drop_old_copies(*pOpt);
+    const ifcfg_path path{pOpt->szName};
+    const ifcfg_path first{pOpt->aszSlaves[0]};
+    if (KLIBCExec("/bin/cp", "-f", path.c_str(), first.c_str(), nullptr) != 0) {
+        restore_slaves(*pOpt);
+        if (KLIBCFileCheckKeyValue(first.c_str(), key::kDevice, pOpt->szName, 0) == 1) { // it was copied all the same
+            rejoin_first_slave(*pOpt);
+        }
+        return fail(HERE, NET_ERR_EXEC, -1, "Failed to copy %s to %s", path.c_str(), first.c_str());
+    }
     if (dissolve(*pOpt) < 0) {
         restore_slaves(*pOpt);
+        rejoin_first_slave(*pOpt);
         return -1;
     }
     return 0;

@@ -33,14 +33,13 @@ bool refuses_bond(const KOVALINKAGGROPT *pOpt) {
     return refuses_null(HERE, "pOpt", pOpt) || refuses(HERE, has_usable_name(*pOpt), "has_usable_name(*pOpt)");
 }
 
-bool join(key_changes &changes, const char *szBond) {
-    changes.set(key::kUserCtl, "no");
-    changes.set(key::kMaster, szBond);
-    changes.set(key::kSlave, "yes");
+bool join(key_changes &changes, const char *szSlave, const char *szBond) {
+    set_member_keys(changes, szSlave, szBond);
     return changes.is_complete();
 }
 
-bool leave(key_changes &changes, const char *path) {
+bool leave(key_changes &changes, const char *szSlave, const char *path) {
+    changes.set(key::kDevice, szSlave);
     if (!changes.is_complete() || KOVANetLinkAggrConfUpdateBootProto(path, changes.to_set()) < 0) {
         return false;
     }
@@ -58,8 +57,8 @@ extern "C" int KOVANetLinkAggrConfSetSlave(const char *szSlave, int blEnslave, c
     }
     const ifcfg_path path{szSlave};
     key_changes changes;
-    changes.set(key::kDevice, szSlave);
-    const bool is_complete = blEnslave != 0 ? join(changes, pOpt->szName) : leave(changes, path.c_str());
+    const bool is_complete =
+        blEnslave != 0 ? join(changes, szSlave, pOpt->szName) : leave(changes, szSlave, path.c_str());
     if (!is_complete) {
         return fail_quietly(HERE, NET_ERR_OUT_OF_MEMORY, -1);
     }

@@ -5,6 +5,7 @@
 #include "link/ifname_change.h"
 
 #include <cstring>
+#include <sys/stat.h>
 #include <unistd.h>
 
 using namespace kova;
@@ -36,6 +37,21 @@ void remove_file(const path_text &path) {
 
 // ---- the files of a bond
 
+/** Whether no interface is named twice: the copy of its file would be of what was written already. */
+bool has_distinct_names(const KOVALINKAGGROPT &bond) {
+    for (int i = 0; i < bond.cSlaves; ++i) {
+        const char *const szSlave = bond.aszSlaves[i];
+        bool is_named_before = strcmp(szSlave, bond.szName) == 0;
+        for (int k = 0; k < i; ++k) {
+            is_named_before = is_named_before || strcmp(szSlave, bond.aszSlaves[k]) == 0;
+        }
+        if (is_named_before) {
+            return false;
+        }
+    }
+    return true;
+}
+
 bool refuses_bond(const KOVALINKAGGROPT &bond) {
     constexpr int kFewestSlaves = 2;
     bool has_names = true;
@@ -43,7 +59,16 @@ bool refuses_bond(const KOVALINKAGGROPT &bond) {
         has_names = has_names && bond.aszSlaves[i][0] != '\0';
     }
     return refuses(HERE, bond.cSlaves >= kFewestSlaves, "2 <= pOpt->cSlaves") ||
-           refuses(HERE, has_names, "'\\0' != *pOpt->aszSlaves[i]");
+           refuses(HERE, has_names, "'\\0' != *pOpt->aszSlaves[i]") ||
+           refuses(HERE, has_distinct_names(bond), "has_distinct_names(*pOpt)");
+}
+
+/** The directory is everybody's: nothing is written through a link that somebody else may have made. */
+void drop_link(const path_text &path) {
+    struct stat status;
+    if (lstat(path.c_str(), &status) == 0 && S_ISLNK(status.st_mode)) {
+        unlink(path.c_str());
+    }
 }
 
 /** The bond goes on with what its first member had: its settings, and the lease of its DHCP client. */
@@ -51,6 +76,7 @@ void take_over_first_slave(const KOVALINKAGGROPT &bond) {
     const char *const szFirst = bond.aszSlaves[0];
     (void)KLIBCExec("/bin/cp", "-f", ifcfg_path{szFirst}.c_str(), ifcfg_path{bond.szName}.c_str(), nullptr);
     const path_text lease{"/tmp/dhcpv4.leases.%s", bond.szName};
+    drop_link(lease);
     (void)KLIBCExec("/bin/cp", "-f", path_text{"/tmp/dhcpv4.leases.%s", szFirst}.c_str(), lease.c_str(), nullptr);
     (void)KLIBCFileReplaceSubStr(lease.c_str(), szFirst, bond.szName);
 }

@@ -2,8 +2,8 @@
 
 #include "core/kernel.h"
 #include "core/report.h"
+#include "link/mtu_key.h"
 
-#include <cstdlib>
 #include <cstring>
 #include <kovanetsdk/iface.h>
 
@@ -21,7 +21,7 @@ int change_mtu(const char *szValue, const char *szIfname) {
     }
     log_warning(HERE, "we temporarily do the eth up/down in sdk when setting MTU");
     KLIBNetIfDown(szIfname);
-    if (socket.set_mtu(szIfname, static_cast<int>(strtol(szValue, nullptr, 10))) < 0) {
+    if (socket.set_mtu(szIfname, mtu_number(szValue)) < 0) {
         return fail(HERE, NET_ERR_SYSCALL, -1, "Kernel refuses MTU %s of %s: %m", szValue, szIfname);
     }
     return 0;

@@ -1,22 +1,22 @@
 #include <kovanetsdk/link.h>
 
 #include "core/kernel.h"
+#include "core/pause.h"
 #include "core/report.h"
+#include "link/mtu_key.h"
 
-#include <cstdlib>
 #include <kovanetsdk/events.h>
 #include <kovanetsdk/iface.h>
-#include <unistd.h>
 
 using namespace kova;
 
 namespace {
 
 /** Links need a while to come back; who listens to the event may rely on them. */
-constexpr unsigned kSettleSeconds = 5;
+constexpr int kSettleSeconds = 5;
 
 int announce(const char *szIfname, const char *szValue, int result) {
-    sleep(kSettleSeconds);
+    pause_for_seconds(kSettleSeconds);
     (void)KOVANetMTUChangeHook(szIfname, szValue); // what was changed stays changed
     return result;
 }
@@ -54,8 +54,8 @@ int fail_to_set(const char *szValue, const char *szIfname) {
 /** Whether a link is too slow for frames of a size; 1500 counts as jumbo, too. */
 bool is_jumbo_on_slow_link(const char *szValue, int speed) {
     constexpr int kGigabit = 1000;
-    constexpr long kLargestOrdinary = 1499;
-    return speed < kGigabit && strtol(szValue, nullptr, 10) > kLargestOrdinary;
+    constexpr int kLargestOrdinary = 1499;
+    return speed < kGigabit && mtu_number(szValue) > kLargestOrdinary;
 }
 
 int set_interface(const char *szValue, const char *szIfname) {

@@ -2,6 +2,7 @@
 
 #include "core/commands.h"
 #include "core/guards.h"
+#include "core/pause.h"
 #include "link/ifname_change.h"
 #include "link/vlan_change.h"
 #include "link/vlan_name.h"
@@ -9,7 +10,6 @@
 #include <cstring>
 #include <kovanetsdk/addr.h>
 #include <kovanetsdk/iface.h>
-#include <unistd.h>
 
 using namespace kova;
 
@@ -142,7 +142,7 @@ int move_to_vlan(const plan &plan) {
         return -1;
     }
     start_interfaces(names, 2);
-    sleep(kVlanSettleSeconds);
+    pause_for_seconds(kVlanSettleSeconds);
     return tell_new_name(HERE, plan.szRowDevice, plan.szVlan);
 }
 

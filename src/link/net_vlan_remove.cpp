@@ -2,6 +2,7 @@
 
 #include "core/commands.h"
 #include "core/guards.h"
+#include "core/pause.h"
 #include "link/ifname_change.h"
 #include "link/mtu_key.h"
 #include "link/vlan_change.h"
@@ -44,7 +45,7 @@ int move_to_row_device(const VLANINFO &vlan) {
     }
     unlink(ifcfg_path{vlan.szIfname}.c_str());
     start_interfaces(names, 1);
-    sleep(kVlanSettleSeconds);
+    pause_for_seconds(kVlanSettleSeconds);
     return tell_new_name(HERE, vlan.szIfname, vlan.szRowDevice);
 }
 

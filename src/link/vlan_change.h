@@ -11,7 +11,7 @@
 namespace kova {
 
 /** Links need a while to come back. */
-inline constexpr unsigned kVlanSettleSeconds = 2;
+inline constexpr int kVlanSettleSeconds = 2;
 
 /** An interface file that is written anew. */
 class new_ifcfg {

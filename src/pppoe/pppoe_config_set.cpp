@@ -3,12 +3,13 @@
 #include "core/guards.h"
 #include "core/ifcfg.h"
 #include "core/kernel_files.h"
+#include "core/replacement_file.h"
 #include "core/report.h"
+#include "core/secret_file.h"
 #include "core/text.h"
 #include "pppoe/pppoe_files.h"
 
 #include <cstring>
-#include <fcntl.h>
 #include <sys/stat.h>
 
 using namespace kova;
@@ -20,11 +21,6 @@ constexpr char kEth[] = "ETH";
 constexpr char kDefaultRoute[] = "DEFAULTROUTE";
 constexpr char kUser[] = "USER";
 constexpr char kMtu[] = "MTU";
-
-/** Whether a field ends within itself and is one line: a second one would be somebody else's secret. */
-template<size_t Size> bool is_one_line(const char (&field)[Size]) {
-    return memchr(field, '\0', Size) != nullptr && strpbrk(field, "\r\n") == nullptr;
-}
 
 bool refuses_settings(const PPPOE_CONF *pConf) {
     return refuses_null(HERE, "pConf", pConf) ||
@@ -45,18 +41,6 @@ int write_conf(const PPPOE_CONF &conf, const char *szQuotedUser) {
         }
     }
     return 0;
-}
-
-/** A file of our own that nobody else can have opened before. */
-stream create_secret_file(const char *path) {
-    unlink(path);
-    constexpr mode_t kOwnerOnly = 0600;
-    descriptor fd{open(path, O_WRONLY | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC, kOwnerOnly)};
-    stream file{fd.is_held() ? fdopen(fd.get(), "w") : nullptr};
-    if (file.is_held()) {
-        (void)fd.give_up();
-    }
-    return file;
 }
 
 int write_secret(const char *szQuotedUser, const char *szPassword) {
@@ -84,6 +68,7 @@ int replace_secrets(const char *szQuotedUser, const char *szPassword) {
         unlink(kNewSecrets);
         return -1;
     }
+    sync_directory_of(kPapSecrets);
     constexpr mode_t kOwnerOnly = 0600;
     if (chmod(kPapSecrets, kOwnerOnly) != 0) {
         return fail_keeping_code(HERE, -1, "chmod %s failed", kPapSecrets);
@@ -133,7 +118,7 @@ extern "C" int PPPoEConfigSet(const PPPOE_CONF *pConf) {
 
 extern "C" int PPPoEConfigGet(PPPOE_CONF *pConf) {
     if (pConf == nullptr) {
-        return fail_keeping_code(HERE_SPACED, -1, "bad parameter PPPoEConf");
+        return fail(HERE_SPACED, NET_ERR_BAD_PARAMETER, -1, "bad parameter PPPoEConf");
     }
     *pConf = {};
     if (KLIBCFileGetKeyValue(kPppoeConf, kEth, pConf->szIfname, sizeof pConf->szIfname, 0) < 0) {

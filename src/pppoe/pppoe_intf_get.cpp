@@ -79,10 +79,9 @@ heap<char> ask_status_tool() {
         log_err(HERE, "failed to excute cmd/usr/sbin/pppoe-status");
         return nullptr;
     }
-    char line[1024];
-    while (fgets(line, sizeof line, status.get()) != nullptr) {
-        if (strstr(line, "Point-to-Point") != nullptr) {
-            char *const word = line + strspn(line, " \t");
+    while (const heap<char> line = next_line(status.get())) {
+        if (strstr(line.get(), "Point-to-Point") != nullptr) {
+            char *const word = line.get() + strspn(line.get(), " \t");
             word[strcspn(word, " \t\r\n")] = '\0';
             return heap<char>{strdup(word)};
         }
@@ -134,9 +133,11 @@ extern "C" int KOVAPPPoeIntfGet(char *szIfname, int cbIfname) {
         find_ppp_interface() < 1) {
         return -1;
     }
-    heap<char> cached = read_cache();
-    const bool is_cached = cached != nullptr;
-    const heap<char> name = is_cached ? std::move(cached) : ask_status_tool();
+    heap<char> name = read_cache();
+    const bool is_cached = name != nullptr;
+    if (!is_cached) {
+        name = ask_status_tool();
+    }
     if (name == nullptr) {
         return -1;
     }

@@ -10,14 +10,14 @@ namespace {
 constexpr char kEnable[] = "pppoe_enable";
 
 int start() {
-    constexpr int kAlreadyStarting = 19; // the script's own status, which callers tell from other failures
+    constexpr int kRefused = 19; // user or password are not the other side's, which callers tell from other failures
     const bool is_marked = KLIBCINFOSetKeyValue(kEnable, "yes") >= 0;
     const int status = is_marked ? run("/usr/sbin/pppoe-start") : -1;
     if (status == 0) {
         return 0;
     }
     (void)KLIBCINFOSetKeyValue(kEnable, "no");
-    return status == kAlreadyStarting ? status : -1;
+    return status == kRefused ? status : -1;
 }
 
 int stop() {

@@ -113,8 +113,8 @@ unsigned mode_of(const std::string &path) {
 
 /** Tools that the library starts: here they succeed at once. */
 void replace_tools() {
-    for (const char *tool : {"/sbin/ip", "/sbin/ifconfig", "/sbin/start", "/sbin/stop", "/usr/kova/service/ddns",
-                             "/usr/kova/sbin/kovanetdtool"}) {
+    for (const char *tool : {"/etc/rc.network", "/sbin/ip", "/sbin/ifconfig", "/sbin/start", "/sbin/stop",
+                             "/usr/kova/service/ddns", "/usr/kova/sbin/kovanetdtool"}) {
         fs::create_directories(fs::path{tool}.parent_path());
         fs::remove(tool);
         fs::create_symlink("/bin/true", tool);
@@ -214,7 +214,8 @@ protected:
         const std::string backup = fs::path{file_}.filename().string() + ".tmp";
         std::vector<std::string> found;
         for (const std::string &name : names_in(directory())) {
-            const bool is_known = file_ == directory() + "/" + name ||
+            const bool is_other = std::find(what_.others.begin(), what_.others.end(), name) != what_.others.end();
+            const bool is_known = is_other || file_ == directory() + "/" + name ||
                                   (!where_.is_link && std::binary_search(strangers_.begin(), strangers_.end(), name));
             if (!is_known && name.starts_with(backup) == of_backups) {
                 found.push_back(name);

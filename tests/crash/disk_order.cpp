@@ -2,6 +2,7 @@
 
 #include <fcntl.h>
 #include <filesystem>
+#include <sys/stat.h>
 #include <sys/syscall.h>
 
 namespace kova_test {
@@ -33,6 +34,16 @@ void disk_order::note_change(const std::string &path) {
     steps_.push_back("write " + name);
     changed_.insert(name);
     synced_.erase(name);
+}
+
+/** A mode that the file had already is no change. */
+void disk_order::note_mode(const system_call &call, const std::string &path, uint64_t mode) {
+    if (!call.has_returned) {
+        struct stat status = {};
+        is_mode_there_ = stat(path.c_str(), &status) == 0 && (status.st_mode & 07777) == mode;
+    } else if (call.result >= 0 && !is_mode_there_) {
+        note_change(path);
+    }
 }
 
 void disk_order::note_sync(const std::string &path) {
@@ -71,6 +82,14 @@ void disk_order::note_removal(const std::string &path) {
 }
 
 void disk_order::note(const system_call &call) {
+#ifdef SYS_chmod
+    if (call.number == SYS_chmod) {
+        return note_mode(call, call.text(0), call.arguments[1]);
+    }
+#endif
+    if (call.number == SYS_fchmodat) {
+        return note_mode(call, call.text(1), call.arguments[2]);
+    }
     if (!call.has_returned || call.result < 0) {
         return;
     }
@@ -79,7 +98,6 @@ void disk_order::note(const system_call &call) {
     case SYS_open:
         return makes_or_empties(call.arguments[1]) ? note_change(call.text(0)) : void();
     case SYS_creat:
-    case SYS_chmod:
     case SYS_chown:
         return note_change(call.text(0));
     case SYS_rename:
@@ -90,7 +108,6 @@ void disk_order::note(const system_call &call) {
 #endif
     case SYS_openat:
         return makes_or_empties(call.arguments[2]) ? note_change(call.text(1)) : void();
-    case SYS_fchmodat:
     case SYS_fchownat:
         return note_change(call.text(1));
     case SYS_truncate:

@@ -30,6 +30,7 @@ public:
 private:
     [[nodiscard]] std::string name_of(const std::string &path) const;
     void note_change(const std::string &path);
+    void note_mode(const system_call &call, const std::string &path, uint64_t mode);
     void note_sync(const std::string &path);
     void note_name(const std::string &from, const std::string &to);
     void note_removal(const std::string &path);
@@ -39,6 +40,7 @@ private:
     std::set<std::string> synced_;
     std::set<std::string> changed_;
     bool has_new_names_ = false;
+    bool is_mode_there_ = false; ///< the file that gets a mode has it already
     std::vector<std::string> steps_;
     std::vector<std::string> dangers_;
 };

@@ -57,6 +57,11 @@ bool set_card(int source) {
     return KOVANetSetCard1(&wanted, nullptr) == 0;
 }
 
+bool set_relay(const char *) {
+    const PPPOE_RELAY_CONF conf{1, "eth1"};
+    return KOVANetSetPPPoERelayConfig("lbr0", &conf) == 0;
+}
+
 /** The file of an address that is refused after it was written. */
 bool set_broken_mask(const char *path) {
     const std::pair<const char *, const char *> lines[] = {
@@ -66,6 +71,16 @@ bool set_broken_mask(const char *path) {
         works = works && KLIBCFileSetKeyValue(path, key, value, kPlain) == 0;
     }
     return works;
+}
+
+bool make_bond(const char *) {
+    KOVALINKAGGROPT bond = {"bond0", KOVA_LINK_AGGR_BALANCE_RR, 0, 2, {"eth0", "eth1"}};
+    return KOVANetLinkAggrSet(&bond) == 0;
+}
+
+bool set_secret(const char *) {
+    const PPPOE_CONF conf = {"eth0", "user", "secret", "1492", 1};
+    return PPPoEConfigSet(&conf) == 0;
 }
 
 } // namespace
@@ -155,6 +170,33 @@ const std::vector<operation> &operations() {
          .floor = 44,
          .call = [](const char *) { return DHCPInterfaceSetEnabled("eth0", 0, 1) == 0; },
          .path = "/etc/dhcpd/dhcpd-eth0.info",
+         .is_built_of_others = true},
+        {.name = "KOVANetLinkAggrSet_make",
+         .floor = 350,
+         .call = make_bond,
+         .files = works_on::kPresentFile,
+         .path = kIfcfg,
+         .is_built_of_others = true,
+         .others = {"ifcfg-bond0", "ifcfg-eth0.saved", "ifcfg-eth1", "ifcfg-eth1.saved"}},
+        {.name = "PPPoEConfigSet",
+         .floor = 210,
+         .call = set_secret,
+         .files = works_on::kMissingFile,
+         .path = "/etc/ppp/pap-secrets",
+         .mode = 0600,
+         .is_built_of_others = true,
+         .keeps_backup = true,
+         .others = {"pppoe.conf"}},
+        {.name = "KLIBNETSetTopologyConfigs",
+         .floor = 44,
+         .call = [](const char *) { return KLIBNETSetTopologyConfigs(&gTopologyInfo[KLIB_TOPOLOGY_BRIDGE]) == 0; },
+         .path = kInfo,
+         .is_built_of_others = true},
+        {.name = "KOVANetSetPPPoERelayConfig",
+         .floor = 44,
+         .call = set_relay,
+         .files = works_on::kPresentFile,
+         .path = "/etc/sysconfig/pppoe-relay/lbr0",
          .is_built_of_others = true},
     };
     return all;

@@ -21,13 +21,14 @@ struct operation {
     std::function<bool(const char *path)> call;
 
     works_on files = works_on::kAnyFile;
-    std::string path{};              ///< the only file it works on; empty: any
-    std::string text{kKeys};         ///< what the file holds before
-    unsigned mode = 0644;            ///< of a file it makes
-    bool is_built_of_others = false; ///< which are tried in all surroundings; this one in the plain ones
-    bool puts_back = false;          ///< fails, and a file that was there is as before
-    bool keeps_backup = false;       ///< a killed one may leave "<file>.tmp<seconds>", which every reader skips
-    bool is_random = false;          ///< two files it makes differ, their sizes do not
+    std::string path{};                ///< the only file it works on; empty: any
+    std::string text{kKeys};           ///< what the file holds before
+    unsigned mode = 0644;              ///< of a file it makes
+    bool is_built_of_others = false;   ///< which are tried in all surroundings; this one in the plain ones
+    bool puts_back = false;            ///< fails, and a file that was there is as before
+    bool keeps_backup = false;         ///< a killed one may leave "<file>.tmp<seconds>", which every reader skips
+    bool is_random = false;            ///< two files it makes differ, their sizes do not
+    std::vector<std::string> others{}; ///< names of files beside it that it works on, too
     /** Writes what a file may hold in between, when that is more than old and new. */
     std::function<bool(const char *path)> first_part{};
 

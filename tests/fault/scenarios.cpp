@@ -1,5 +1,8 @@
 #include "fault/sweep.h"
 
+#include "support/fake_names.h"
+
+#include <algorithm>
 #include <cstring>
 #include <filesystem>
 #include <kova/plugin.h>
@@ -138,6 +141,17 @@ void no_protocol(world &) {
 void two_vlans(world &it) {
     it.kernel.load_vlan_module();
     it.kernel.add("eth0.10", {.ip = "192.168.10.10", .mask = "255.255.255.0", .row_device = "eth0"});
+}
+
+/** A fixed address and the switches of IPv6. */
+void fixed_ipv6(world &it) {
+    write_file(ifcfg("eth0"), "DEVICE=eth0\nIPV6INIT=static\nIPV6ADDR=2001:db8::9\nIPV6PREFIXLENG=64\n"
+                              "IPV6_DEFAULTGW=fe80::9\n");
+    it.rig.replace_file("/proc/sys/net/ipv6/conf/eth0/accept_ra", "1");
+    it.rig.replace_file("/proc/sys/net/ipv6/conf/eth1/accept_ra", "1");
+    for (const char *kind : {"client", "info"}) { // of one that has just begun
+        write_file("/tmp/dhclient6-eth0-" + std::string(kind) + ".pid", "");
+    }
 }
 
 void open_event(world &it) {
@@ -395,6 +409,12 @@ void bond_to_change(world &it) {
     write_file(ifcfg("eth1"), "DEVICE=eth1\n" + address + member);
 }
 
+/** The same, with a member that has an address of its own. */
+void bond_and_other_address(world &it) {
+    bond_to_change(it);
+    write_file(ifcfg("eth1"), "DEVICE=eth1\nIPADDR=192.168.1.11\nMASTER=bond0\nSLAVE=yes\n");
+}
+
 void bond_to_delete(world &it) {
     bond_to_change(it);
     it.bond.mode = KOVA_LINK_AGGR_UNKNOWN;
@@ -480,7 +500,138 @@ void noted_connection_interface(world &it) {
     write_file("/tmp/kovapppoe.intf", "ppp0");
 }
 
+constexpr char kRelay[] = "/etc/sysconfig/pppoe-relay/br0";
+
+constexpr int kNoProcess = 2000000000; // beyond the highest the kernel gives out
+
+/** A relay of the local LAN's bridge to be started. */
+void relay(world &it) {
+    local_lan_bridge(it);
+    write_file(kRelay, "enable=yes\nserver=eth1\n");
+    it.relay = {1, "eth0"};
+    it.rig.redirect("/proc", "/tmp/fault-processes"); // nobody runs
+    write_file("/tmp/fault-processes/version", "");
+}
+
+/** The only process is a relay of that bridge to a server. It is no real one, so that it outlives every signal. */
+void relay_to(world &it, const std::string &server) {
+    relay(it);
+    it.rig.redirect("/proc", "/tmp/fault-relay");
+    const std::string line = "/usr/sbin/pppoe-relay -C br0 -S " + server + " ";
+    std::string arguments = line;
+    std::replace(arguments.begin(), arguments.end(), ' ', '\0');
+    const std::string process = "/tmp/fault-relay/" + std::to_string(kNoProcess);
+    write_file(process + "/stat", std::to_string(kNoProcess) + " (pppoe-relay) S 1\n");
+    write_file(process + "/cmdline", arguments);
+}
+
+void relay_that_runs(world &it) {
+    relay_to(it, "eth1");
+}
+
+void relay_to_another(world &it) {
+    relay_to(it, "eth0");
+}
+
+void relay_that_is_off(world &it) {
+    relay_to(it, "eth1");
+    write_file(kRelay, "enable=no\nserver=eth1\n");
+}
+
+/** Settings of no bridge yet. */
+void relay_to_set(world &it) {
+    it.relay = {1, "eth0"};
+}
+
+/** A listening port of either protocol and family, and two connected ones. */
+void sockets(world &it) {
+    it.rig.replace_file("/proc/net/tcp",
+                        "  sl  local_address rem_address   st\n"
+                        "   0: 00000000:0016 00000000:0000 0A\n   1: 00000000:0050 0A000001:1000 01\n");
+    it.rig.replace_file("/proc/net/tcp6", "   0: 00000000000000000000000000000000:01BB "
+                                          "00000000000000000000000000000000:0000 0A\n");
+    it.rig.replace_file("/proc/net/udp",
+                        "   0: 00000000:0035 00000000:0000 0A\n   1: 00000000:0043 0A000001:1000 01\n");
+    it.rig.replace_file("/proc/net/udp6", "   0: 00000000000000000000000000000000:0222 "
+                                          "00000000000000000000000000000000:0000 0A\n");
+}
+
+/** The topology with everything that it is told by. */
+void topology(world &it) {
+    it.rig.replace_file("/proc/net/vlan/config", "VLAN Dev name    | VLAN ID\nName-Type: VLAN_NAME_TYPE_RAW_PLUS_VID\n"
+                                                 "eth0.10        | 10  | eth0\n");
+    write_file("/etc/kovainfo.conf", "support_net_topology=\"yes\"\nnet_topology=\"router\"\n");
+}
+
+void open_port(world &it) {
+    it.host.emplace();
+}
+
+// ---- the same for the tunnel client
+
+/** A zone that is known already. */
+void local_zone(world &) {
+    setenv("TZ", "UTC0", 1);
+    tzset();
+}
+
+/** An account with a user is stored, another is to be, and nobody runs. */
+void tunnel_account(world &it) {
+    it.tunnel = {0, "broker.example", "alice", "secret"};
+    write_file("/etc/kova/service/kovatunnel.conf", "run=yes\n");
+    write_file("/etc/kova/secret.key", std::string(32, 'k'));
+    write_file("/etc/sysconfig/network-scripts/ifcfg-tun", "LOGIN=\"login\"\nSERVER=\"broker\"\nUSERID=\"bob\"\n");
+    write_file("/etc/gogoc/.tunnel_passwd", std::string("password") + std::string(56, '\0'));
+    it.rig.redirect("/proc", "/tmp/fault-processes");
+    write_file("/tmp/fault-processes/version", "");
+}
+
+void tunnel_to_make(world &it) {
+    tunnel_account(it);
+    std::filesystem::remove("/etc/sysconfig/network-scripts/ifcfg-tun");
+    std::filesystem::remove("/etc/gogoc/.tunnel_passwd");
+}
+
+/** The script brings the interface up. */
+void tunnel_with_address(world &it) {
+    tunnel_account(it);
+    it.rig.replace_file("/proc/net/if_inet6", "20010db8000000000000000000000002 05 40 00 80      tun\n");
+    write_file("/usr/kova/service/kovarelayd", "#!/bin/sh\n");
+}
+
+/** The client runs and gets no address. */
+void tunnel_that_hangs(world &it) {
+    tunnel_account(it);
+    it.rig.redirect("/proc", "/tmp/fault-client");
+    write_file("/tmp/fault-client/4242/stat", "4242 (gogoc) S 1\n");
+    write_file("/tmp/fault-client/4242/cmdline", std::string("/usr/bin/gogoc\0-f\0", 18));
+}
+
 // ---- calls that are more than an expression
+
+/** Looks a name up: nas01 is known to the resolver, every other to a host of the local network. */
+long look_up(const char *name) {
+    kova_test::fake_names names;
+    names.add("nas01", {"10.0.0.1", "2001:db8::1"});
+    KOVALOOKUPIP found[2];
+    return KOVANetLookupIP(name, found, 2, 0);
+}
+
+long look_up_on_network(world &it) {
+    it.rig.answer("/usr/bin/nmblookup", 0, "10.0.0.1 nas02<00>\n");
+    return look_up("nas02");
+}
+
+long list_ports(world &it, int protocol) {
+    int ports[8];
+    it.number = 8;
+    return KOVANetGetPortUsedInRange(ports, &it.number, 1, 1023, protocol);
+}
+
+long wake_on_loopback(world &) {
+    const KLIBETHERWAKE request{{2, 0, 0, 0, 0, 1}, "lo"};
+    return KLIBNetEtherWake(&request);
+}
 
 long list_vlans(world &it) {
     VLANINFO *found = nullptr;
@@ -494,6 +645,11 @@ long give_back_a_lock(world &it, long result) {
     int &held = it.rig.held["named locks"];
     held = result < 0 && held == -1 ? 0 : held;
     return result;
+}
+
+long read_ipv6(world &it) {
+    return KOVANetIPv6ConfGet("eth0", &it.number, it.addresses[0].szIP, sizeof it.addresses[0].szIP, &it.number,
+                              it.addresses[1].szIP, sizeof it.addresses[1].szIP);
 }
 
 long list_served_interfaces(world &) {
@@ -523,6 +679,25 @@ long read_boot_switch(world &it) {
 
 long read_boot_settings(world &it) {
     return DHCPPXEConfGet(&it.boot) < 0 ? -1 : it.boot.enabled;
+}
+
+long reach_by_address(world &it) {
+    kova_test::fake_names names;
+    names.add("nas01", {"127.0.0.1"});
+    return BlKLIBIsConnected("nas01", it.host->port(), 5);
+}
+
+long reach_on_local_network(world &it) {
+    const kova_test::fake_names nobody;
+    it.rig.answer("/usr/bin/nmblookup", 0, "127.0.0.1 nas01<00>\n");
+    return BlKLIBIsConnected("nas01", it.host->port(), 5);
+}
+
+/** @return the topology when its description has the VLAN, else -1 */
+long describe_topology(world &) {
+    TOPOLOGYINFO info{};
+    const int number = KLIBNetTopologyGet(&info);
+    return strcmp(info.szIfname, "eth0.10") == 0 ? number : -1;
 }
 
 // ---- what functions get over by design
@@ -571,6 +746,21 @@ const tolerances off_and_on{
     {"fopen /proc/net/if_inet6", "no address to remove was found"},
     {"fread /proc/net/if_inet6", "the end of the list"},
     {"", "what fails between off and on leaves IPv6 off, and says so", -1, "/disable_ipv6"},
+};
+const tolerances ipv6_mode{
+    {"ioctl ", "another interface is left out of the list"},
+    {"KLIBCFileGetKeyValue /etc/sysconfig/network-scripts/ifcfg-eth0", "logged; the mode before counts as unknown"},
+    {"KLIBCReadPidFile /tmp/dhclient6-eth0-", "without a pid there is no client"},
+    {"KLIBCExecl /sbin/ip -6 address del", "logged; the address of the mode before may be gone already"},
+    {"fopen /proc/net/if_inet6", "there is nothing to wait for, and no duplicate was found"},
+    {"fread /proc/net/if_inet6", "the end of the list"},
+    {"", "there is no way back: what was done before the failure stays", -1, "/proc/sys/net/ipv6/conf/eth0/"},
+    {"", "there is no way back: what was done before the failure stays", -1, "ifcfg-eth0"},
+};
+const tolerances ipv6_switches{
+    {"ioctl ", "an interface that the kernel does not tell about is left alone"},
+    {"KLIBCFileGetKeyValue /etc/sysconfig/network-scripts/ifcfg-", "logged; the interface is skipped"},
+    {"", "interfaces before the one that fails are set", -1, "/accept_ra"},
 };
 const tolerances address_list{
     {"fread /proc/net/if_inet6", "a list of the kernel ends where it cannot be read on", kAnyResult},
@@ -681,6 +871,19 @@ const tolerances vendor_steps{
     {"KLIBCFileAddLine", "the old lines go before the new ones are added, each whole", -1, "dhcpd-vendor.conf"},
 };
 
+const tolerances nobody_there{
+    {"KLIBCExecl /bin/ping", "a status of its own is the tool's word that nobody answers", 0},
+};
+const tolerances names_elsewhere{
+    {"getaddrinfo ", "the local network is asked what the resolver does not tell"},
+    {"fread from /usr/bin/nmblookup", "the answers that were read count"},
+    {"KLIBCPclose", "the answers are read"},
+};
+const tolerances socket_tables{
+    {"fopen /proc/net/", "logged; the other family's sockets are looked at"},
+    {"fread /proc/net/", "logged; the other family's sockets are looked at"},
+};
+
 const tolerances vlan_question{
     {"ioctl 0x8982 ", "the kernel's word for what is no VLAN"},
 };
@@ -702,20 +905,39 @@ const tolerances one_by_one{
 const tolerances link_state{
     {"ioctl 0x8946 ", "a link of unknown speed keeps its MTU"},
 };
-const tolerances bond_files{
-    {"KLIBCExec /bin/cp -f /etc/sysconfig/network-scripts/ifcfg-eth", "not looked at: what to begin with or go back to",
-     std::nullopt, "/etc/sysconfig/network-scripts/"},
-    {"KLIBCFileGetKeyValue /etc/sysconfig/network-scripts/ifcfg-", "a key that cannot be read counts as absent",
-     kAnyResult, "/etc/sysconfig/network-scripts/"},
-    {"KLIBCFileLock 0x105", "an address that cannot be read counts as absent", kAnyResult,
-     "/etc/sysconfig/network-scripts/"},
+/** What is common to all changes of bonds. */
+const tolerances bond_copies{
+    {"KLIBCExec /bin/cp -f /etc/sysconfig/network-scripts/ifcfg-eth1 ", "the copy is to go back to; not looked at"},
+    {"KLIBCExec /bin/cp -f /etc/sysconfig/network-scripts/ifcfg-eth0 /etc/sysconfig/network-scripts/ifcfg-eth0.saved",
+     "the copy is to go back to; not looked at"},
     {"unlink /etc/sysconfig/network-scripts/ifcfg-eth", "logged; an old copy is written over, a new one stays",
-     std::nullopt, "/etc/sysconfig/network-scripts/"},
-    {"", "what fails is put back from the copies that are there", -1, "/etc/sysconfig/network-scripts/"},
+     std::nullopt, ".saved"},
 };
-const tolerances end_of_old_bond{
-    {"", "how the old bond ends is not looked at: the new one's files count", kAnyResult,
-     "/etc/sysconfig/network-scripts/"},
+const char *const kMemberLines = "MASTER=bond0\nSLAVE=yes\n";
+const char *const kAddressLines = "IPADDR=192.168.1.10\nNETMASK=255.255.255.0\n";
+const tolerances new_bond{
+    {"KLIBCExec /bin/cp -f /etc/sysconfig/network-scripts/ifcfg-eth0 /etc/sysconfig/network-scripts/ifcfg-bond1",
+     "not looked at: what to begin with", std::nullopt, "ifcfg-bond1", "BOOTPROTO=dhcp\nDEVICE=bond1\n"},
+    {"KLIBCFileGetKeyValue", "a protocol that cannot be read is none", std::nullopt, "ifcfg-bond1", "BOOTPROTO=dhcp\n"},
+    {"", "what cannot be put back, as memory is gone for good, stays", -1, ".saved", "DEVICE=eth"},
+};
+const tolerances end_of_bond{
+    {"KLIBCFileGetKeyValue", "a protocol that cannot be read is none, and so is the bond's address", kAnyResult,
+     "ifcfg-eth"},
+    {"KLIBCFileLock 0x105", "an address that cannot be read is none", kAnyResult, "ifcfg-eth1", "DEVICE=eth1\n"},
+    {"", "the second member's protocol goes before its copy is made", -1, "ifcfg-eth1", kMemberLines},
+    {"", "the first is left with the settings when nothing can be written any more", -1, "ifcfg-eth0", kAddressLines},
+};
+const tolerances other_bond{
+    {"KLIBCFileGetKeyValue", "a protocol that cannot be read is none, and so is the bond's address", kAnyResult,
+     "ifcfg-bond0", "BOOTPROTO=dhcp\n"},
+    {"KLIBCFileGetKeyValue", "a protocol that cannot be read is none", kAnyResult, "ifcfg-eth0", "BOOTPROTO=dhcp\n"},
+    {"KLIBCExec /bin/cp -f /etc/sysconfig/network-scripts/ifcfg-eth0 /etc/sysconfig/network-scripts/ifcfg-bond0",
+     "not looked at: what to begin with", std::nullopt, "ifcfg-bond0", "BOOTPROTO=dhcp\nDEVICE=bond0\n"},
+    {"", "how the old bond ends is not looked at: the new one's files count", kAnyResult, "ifcfg-eth1", kMemberLines},
+    {"", "members stay apart, the first with the settings", -1, "ifcfg-eth0", kAddressLines},
+    {"", "members stay apart, the first with the settings", -1, "ifcfg-eth1", "DEVICE=eth1\n"},
+    {"", "members stay apart, the first with the settings", -1, "ifcfg-bond0", "gone"},
 };
 const tolerances vlan_steps{
     {"ioctl 0x8982 ", "the kernel's word for what is no VLAN", std::nullopt, "/etc/kovainfo.conf"},
@@ -766,6 +988,8 @@ const tolerances dial_steps{
     {"KLIBCFileSetKeyValue /etc/ppp/pppoe.conf", "the settings are several keys; each is written whole", -1,
      "/etc/ppp/pppoe.conf"},
     {"unlink /etc/ppp/pap-secrets.tmp", "none is in the way; the open would tell of one"},
+    {"open /etc/ppp/ ", "the file is in its place; its name may be lost with the machine's power"},
+    {"fsync /etc/ppp ", "the file is in its place; its name may be lost with the machine's power"},
 };
 const tolerances dial_switch{
     {"KLIBCFileCheckKeyValue /etc/ppp/pppoe.conf DEFAULTROUTE", "a switch that cannot be read is off"},
@@ -792,6 +1016,64 @@ const tolerances noted_name{
     {"KLIBCPclose", "the answer is read"},
 };
 
+const tolerances relay_directory{
+    {"stat /etc/sysconfig/pppoe-relay/", "whether it is there shows at making it"},
+};
+const tolerances relay_made_empty{
+    {"KLIBCFileTouch", "a new file is empty before it is written, which is no relay", -1, "pppoe-relay/br0"},
+    {"KLIBCFileSetKeys", "a new file is empty before it is written, which is no relay", -1, "pppoe-relay/br0"},
+    {"KLIBCSzHash", "a new file is empty before it is written, which is no relay", -1, "pppoe-relay/br0"},
+};
+const tolerances relay_switch{
+    {"KLIBCFileCheckKeyValue", "a switch that cannot be read is off"},
+    {"KLIBCFileGetKeyValue /etc/sysconfig/network-scripts/", "logged; a key that cannot be read is empty"},
+    {"fopen /sys/class/net/br0/flags", "what is not known to be up is down"},
+    {"fread /sys/class/net/br0/flags", "what is not known to be up is down"},
+};
+const tolerances relay_processes{
+    {"KLIBCIsProcAlive", "a process that cannot be looked at is gone", kAnyResult},
+    {"KLIBCKill /usr/sbin/pppoe-relay -C br0 > open", "a process that cannot be looked at is gone"},
+    {"KLIBCKill /usr/sbin/pppoe-relay -C br0 > fstat", "a process that cannot be looked at is gone"},
+    {"KLIBCKill /usr/sbin/pppoe-relay -C br0 > read", "a process that cannot be looked at is gone"},
+};
+const tolerances relay_files{
+    {"unlink /etc/sysconfig/pppoe-relay/", "logged; the others go all the same", std::nullopt, "pppoe-relay/br0"},
+};
+
+const tolerances next_to_ask{
+    {"getaddrinfo", "whoever the resolver does not tell of is asked for on the local network"},
+};
+const tolerances opened{
+    {"send", "the connection came about"},
+    {"KLIBCPclose", "the answer is read"},
+};
+const tolerances tunnel_files{
+    {"fclose written /etc/gogoc/.tunnel_passwd.", "what was written is on the disk already"},
+    {"open /etc/gogoc/ ", "the password is in its place"},
+    {"fsync /etc/gogoc ", "the password is in its place"},
+};
+const tolerances tunnel_failure{
+    {"pipe2 ", "the call fails in either case", -1},
+    {"fork ", "the call fails in either case", -1},
+    {"KLIBCKill /usr/bin/gogoc", "the call fails in either case", -1},
+};
+const tolerances tunnel_work{
+    {"fork > unlink /etc/gogoc/gogoc.conf", "what cannot be deleted stays, its owner's alone", std::nullopt,
+     "/etc/gogoc/gogoc.conf"},
+    {"fork > ", "logged by the process of its own; what the tunnel is like is asked afterwards"},
+    {"waitpid ", "a caller may ignore its children; whether the process is there shows at its end"},
+    {"read pipe ", "asked again a second later"},
+    {"KLIBCFileLockTimeByFile /etc/gogoc/gogoc.conf",
+     "it keeps the file from being made meanwhile; it is deleted anyway"},
+    {"unlink /etc/gogoc/gogoc.conf", "the process of its own has deleted it"},
+    {"rename tsp-broker-list.txt", "logged; as a rule there is none"},
+    {"fopen /proc/net/if_inet6", "what cannot be listed is no address, and without a client nothing more is checked"},
+    {"fread /proc/net/if_inet6", "what cannot be listed is no address, and without a client nothing more is checked"},
+    {"KLIBServiceIsRunning kovarelayd", "a relay that cannot be asked does not run"},
+    {"KLIBServiceReload kovarelayd", "the tunnel is what it is, whatever the relay does"},
+    {"KLIBCIsProcAlive /usr/bin/gogoc", "a process that cannot be looked at is gone", kAnyResult},
+};
+
 const char *const kOld[] = {"eth0"};
 const char *const kNew[] = {"bond0"};
 const uint32_t kMask[] = {255, 255, 0, 0};
@@ -808,6 +1090,9 @@ const uint32_t kMask[] = {255, 255, 0, 0};
 const std::vector<scenario> &scenarios() {
     static const std::vector<scenario> all{
         {"BlKLIBIsAtom", CALL(BlKLIBIsAtom("a")), pure},
+        {"BlKLIBIsConnected", CALL(reach_by_address(it)), open_port, failure::zero, opened},
+        {"BlKLIBIsConnected/local network", CALL(reach_on_local_network(it)), open_port, failure::zero, opened,
+         next_to_ask},
         {"BlKLIBIsDomain", CALL(BlKLIBIsDomain("a.b")), pure},
         {"BlKLIBIsHostname", CALL(BlKLIBIsHostname("a")), pure},
         {"BlKLIBIsIpAddr", CALL(BlKLIBIsIpAddr("192.168.1.10")), pure},
@@ -872,6 +1157,7 @@ const std::vector<scenario> &scenarios() {
         {"KLIBNETGetBridgeInfo/port", CALL(KLIBNETGetBridgeInfo("eth0", &it.bridge)), bridge, failure::below_one,
          bridge_keys},
         {"KLIBNETGetBridgeInfoByTopology", CALL(KLIBNETGetBridgeInfoByTopology("br0", &it.bridge, 2)), pure},
+        {"KLIBNETSetTopologyConfigs", CALL(KLIBNETSetTopologyConfigs(&gTopologyInfo[KLIB_TOPOLOGY_BRIDGE])), topology},
         {"KLIBNetBridgeIfIsMaster", CALL(KLIBNetBridgeIfIsMaster("br0")), bridge, failure::zero},
         {"KLIBNetBridgeIfIsSlave", CALL(KLIBNetBridgeIfIsSlave("eth0")), bridge_port, failure::zero},
         {"KLIBNetBridgeSlaveEnum", CALL(KLIBNetBridgeSlaveEnum("br0", it.list)), bridge, failure::below_one},
@@ -880,6 +1166,7 @@ const std::vector<scenario> &scenarios() {
          bridge_keys},
         {"KLIBNetEnumBridge/local LAN", CALL(KLIBNetEnumBridge(it.list, KLIB_BRIDGE_LOCAL_LAN)), local_lan_bridge,
          failure::below_one},
+        {"KLIBNetEtherWake", wake_on_loopback},
         {"KLIBNetGetIfCfg", CALL(KLIBNetGetIfCfg("eth0", "IPADDR", it.text, sizeof it.text))},
         {"KLIBNetGetInterfaceInfo", CALL(KLIBNetGetInterfaceInfo(it.records, 32, 2)), two_vlans, cards},
         {"KLIBNetGetInterfaceInfo/cluster", CALL(KLIBNetGetInterfaceInfo(it.records, 32, 5)), cluster, cards},
@@ -911,6 +1198,7 @@ const std::vector<scenario> &scenarios() {
              return records != nullptr;
          },
          failure::zero},
+        {"KLIBNetTopologyGet", CALL(describe_topology(it)), topology, failure::below_one},
         {"KLIBNetVlanCreate", CALL(KLIBNetVlanCreate("eth0", 10, &it.card)), vlan_to_make, vlan_steps, dispatch},
         {"KLIBNetVlanEnum", list_vlans, vlan},
         {"KLIBNetVlanExist", CALL(KLIBNetVlanExist(nullptr)), vlan, failure::zero},
@@ -933,6 +1221,7 @@ const std::vector<scenario> &scenarios() {
          switch_ports},
         {"KOVAGetMTUSetting/switch port", CALL(KOVAGetMTUSetting("ovs_eth0")), virtual_switch, failure::below_one},
         {"KOVAIGetDHCPTestNetInfo", CALL(KOVAIGetDHCPTestNetInfo(&it.card)), lease_to_ask_for},
+        {"KOVAIIpConflict", CALL(KOVAIIpConflict("eth0", "192.168.1.20")), nobody_there},
         {"KOVAILnxGetIP", CALL(KOVAILnxGetIP("eth0", it.text, sizeof it.text))},
         {"KOVAILnxGetIPFromCfg", CALL(KOVAILnxGetIPFromCfg("eth0", it.text, sizeof it.text))},
         {"KOVAILnxSetIPNetmask", CALL(KOVAILnxSetIPNetmask("eth0", "192.168.1.20", "255.255.255.0")), backed_up,
@@ -943,8 +1232,21 @@ const std::vector<scenario> &scenarios() {
         {"KOVALnxIPv6ProcAction/disable", CALL(KOVALnxIPv6ProcAction("eth0", 1)), off_and_on},
         {"KOVALnxSetHostname", CALL(KOVALnxSetHostname("kova")), host_names, renamed, host_name},
         {"KOVALnxV6IPGet", CALL(KOVALnxV6IPGet("eth0", it.addresses, 16)), address_list},
+        {"KOVANetApplyPPPoERelayConfig/start", CALL(KOVANetApplyPPPoERelayConfig("br0")), relay, relay_switch,
+         relay_processes, relay_directory},
+        {"KOVANetApplyPPPoERelayConfig/runs", CALL(KOVANetApplyPPPoERelayConfig("br0")), relay_that_runs, relay_switch,
+         relay_processes, relay_directory},
+        {"KOVANetApplyPPPoERelayConfig/restart", CALL(KOVANetApplyPPPoERelayConfig("br0")), relay_to_another,
+         relay_switch, relay_processes, relay_directory},
+        {"KOVANetApplyPPPoERelayConfig/stop", CALL(KOVANetApplyPPPoERelayConfig("br0")), relay_that_is_off,
+         relay_switch, relay_processes, relay_directory},
+        {"KOVANetApplyPPPoERelayConfigAll", CALL(KOVANetApplyPPPoERelayConfigAll()), relay, relay_switch,
+         relay_processes, relay_directory},
+        {"KOVANetBondIPConflict", CALL(KOVANetBondIPConflict("bond0", it.text, sizeof it.text)), bond_and_other_address,
+         kernel_bond},
         {"KOVANetCalBroadcast", CALL(KOVANetCalBroadcast("192.168.1.10/24", it.text, sizeof it.text)), calculator},
         {"KOVANetCalNetwork", CALL(KOVANetCalNetwork("192.168.1.10/24", it.text, sizeof it.text)), calculator},
+        {"KOVANetClearPPPoERelayConfigAll", CALL(KOVANetClearPPPoERelayConfigAll()), relay, relay_files},
         {"KOVANetDNSChangeHook", CALL(KOVANetDNSChangeHook(KLIB_PLUGIN_POST, it.list))},
         {"KOVANetDNSFileSet", CALL(KOVANetDNSFileSet(it.list, it.list)), resolver, told, renamed, made_again},
         {"KOVANetDNSGet", CALL(give_back_a_lock(it, KOVANetDNSGet(it.text, sizeof it.text))), resolver, server_list},
@@ -988,6 +1290,12 @@ const std::vector<scenario> &scenarios() {
          switch_ports},
         {"KOVANetGetEthInfo/switch port", CALL(KOVANetGetEthInfo(&it.ethernet, "ovs_eth0")), virtual_switch},
         {"KOVANetGetIfBlock", CALL(KOVANetGetIfBlock("eth0", &it.number))},
+        {"KOVANetGetPPPoERelayConfig", CALL(KOVANetGetPPPoERelayConfig("br0", &it.relay)), relay, relay_directory,
+         relay_switch},
+        {"KOVANetGetPPPoERelayConfig/new", CALL(KOVANetGetPPPoERelayConfig("br0", &it.relay)), relay_directory,
+         relay_switch},
+        {"KOVANetGetPortUsedInRange/tcp", [](world &it) { return list_ports(it, 1); }, sockets, socket_tables},
+        {"KOVANetGetPortUsedInRange/udp", [](world &it) { return list_ports(it, 2); }, sockets, socket_tables},
         {"KOVANetHostnameChangeHook", CALL(KOVANetHostnameChangeHook("kova"))},
         {"KOVANetIFGetIPConfig", CALL(KOVANetIFGetIPConfig("eth0", &it.card)), protocol},
         {"KOVANetIFGetIPConfig/dhcp", CALL(KOVANetIFGetIPConfig("eth1", &it.card)), protocol},
@@ -995,6 +1303,19 @@ const std::vector<scenario> &scenarios() {
         {"KOVANetIFGetInfoEx/cluster", CALL(KOVANetIFGetInfoEx("eth0", 0x12, it.records, &it.card)), cluster, protocol},
         {"KOVANetIP2If", CALL(KOVANetIP2If("192.168.2.10", it.text, sizeof it.text)), failure::below_one, cards},
         {"KOVANetIPChangePreHook", CALL(KOVANetIPChangePreHook(1, "eth0", "fe80::1", "fe80::2", 64))},
+        {"KOVANetIPv6ConfGet", CALL(read_ipv6(it)), fixed_ipv6, failure::below_one, cards},
+        {"KOVANetIPv6ConfSet/auto", CALL(KOVANetIPv6ConfSet(NET_IPV6_AUTO, "eth0", nullptr, 0, nullptr)), fixed_ipv6,
+         failure::not_zero, ipv6_mode},
+        {"KOVANetIPv6ConfSet/off", CALL(KOVANetIPv6ConfSet(NET_IPV6_OFF, "eth0", nullptr, 0, nullptr)), fixed_ipv6,
+         failure::not_zero, ipv6_mode},
+        {"KOVANetIPv6ConfSet/dhcp", CALL(KOVANetIPv6ConfSet(NET_IPV6_DHCP, "eth0", nullptr, 0, nullptr)), fixed_ipv6,
+         failure::not_zero, ipv6_mode},
+        {"KOVANetIPv6ConfSet/static", CALL(KOVANetIPv6ConfSet(NET_IPV6_STATIC, "eth0", "2001:db8::5", 64, nullptr)),
+         fixed_ipv6, failure::not_zero, announced, ipv6_mode},
+        {"KOVANetIPv6ConfSet/gateway", CALL(KOVANetIPv6ConfSet(NET_IPV6_STATIC, "eth0", "2001:db8::5", 64, "fe80::1")),
+         fixed_ipv6, failure::not_zero, announced, ipv6_mode},
+        {"KOVANetIPv6ConfSet/auto_dhcp", CALL(KOVANetIPv6ConfSet(NET_IPV6_AUTO_DHCP, "eth0", nullptr, 0, nullptr)),
+         fixed_ipv6, failure::not_zero, ipv6_mode},
         {"KOVANetIPv6IPAction", CALL(KOVANetIPv6IPAction(0, "eth0", "fe80::2", 64, nullptr)), announced},
         {"KOVANetIPv6IPAction/gateway", CALL(KOVANetIPv6IPAction(0, "eth0", "fe80::2", 64, "fe80::1")),
          failure::not_zero},
@@ -1011,13 +1332,19 @@ const std::vector<scenario> &scenarios() {
         {"KOVANetIfIsLink/switch port", CALL(KOVANetIfIsLink("ovs_eth0")), virtual_switch},
         {"KOVANetIfIsStaticIP", CALL(KOVANetIfIsStaticIP("eth0")), failure::zero},
         {"KOVANetInternalLanNumGet", CALL(KOVANetInternalLanNumGet()), port_count},
+        {"KOVANetIpv6Init", CALL(KOVANetIpv6Init()), fixed_ipv6, ipv6_switches},
         {"KOVANetIsDevTypeMatch", CALL(KOVANetIsDevTypeMatch("eth0", 2)), failure::zero, cards},
         {"KOVANetIsIFUp", CALL(KOVANetIsIFUp("eth0")), failure::zero},
         {"KOVANetIsIfBridgeType", CALL(KOVANetIsIfBridgeType("br0", KLIB_BRIDGE_MASTER)), bridge, failure::zero,
          bridge_keys},
+        {"KOVANetIsPortRangeUsed/tcp", CALL(KOVANetIsPortRangeUsed(400, 500, 1)), sockets, failure::zero,
+         socket_tables},
+        {"KOVANetIsPortRangeUsed/udp", CALL(KOVANetIsPortRangeUsed(540, 550, 2)), sockets, failure::zero,
+         socket_tables},
         {"KOVANetIsPrivateIP", CALL(KOVANetIsPrivateIP("10.0.0.1")), pure},
+        {"KOVANetIsSamePPPoERelayConfig", CALL(KOVANetIsSamePPPoERelayConfig(&it.relay, &it.relay)), pure},
         {"KOVANetIsSameSubnet", CALL(KOVANetIsSameSubnet("10.0.0.1", "10.0.0.2", "255.0.0.0")), pure},
-        {"KOVANetLinkAggrConfDel", CALL(KOVANetLinkAggrConfDel(&it.bond)), bond_to_delete, bond_files},
+        {"KOVANetLinkAggrConfDel", CALL(KOVANetLinkAggrConfDel(&it.bond)), bond_to_delete, bond_copies, end_of_bond},
         {"KOVANetLinkAggrConfSetSlave/join", CALL(KOVANetLinkAggrConfSetSlave("eth0", 1, &it.bond)), bond_to_make,
          member_copies},
         {"KOVANetLinkAggrConfSetSlave/leave", CALL(KOVANetLinkAggrConfSetSlave("eth0", 0, nullptr)), bond_to_change,
@@ -1032,12 +1359,15 @@ const std::vector<scenario> &scenarios() {
         {"KOVANetLinkAggrModeToString", CALL(KOVANetLinkAggrModeToString(KOVA_LINK_AGGR_8023AD) != nullptr), pure},
         {"KOVANetLinkAggrOptSlsaveAdd", CALL(KOVANetLinkAggrOptSlsaveAdd(&it.bond, "eth0")), member_to_add, pure},
         {"KOVANetLinkAggrPhyGet", CALL(KOVANetLinkAggrPhyGet("bond0", it.list))},
-        {"KOVANetLinkAggrSet/make", CALL(KOVANetLinkAggrSet(&it.bond)), bond_to_make, bond_steps, dispatch, bond_files},
+        {"KOVANetLinkAggrSet/make", CALL(KOVANetLinkAggrSet(&it.bond)), bond_to_make, bond_steps, dispatch, bond_copies,
+         new_bond},
         {"KOVANetLinkAggrSet/change", CALL(KOVANetLinkAggrSet(&it.bond)), bond_to_change, bond_steps, kernel_bond,
-         end_of_old_bond},
+         bond_copies, other_bond},
         {"KOVANetLinkAggrSet/delete", CALL(KOVANetLinkAggrSet(&it.bond)), bond_to_delete, bond_steps, dispatch,
-         kernel_bond, bond_files},
+         kernel_bond, bond_copies, end_of_bond},
         {"KOVANetLinkAggrStringToMode", CALL(KOVANetLinkAggrStringToMode("balance-rr")), pure},
+        {"KOVANetLookupIP/resolver", [](world &) { return look_up("nas01"); }, failure::zero},
+        {"KOVANetLookupIP/network", look_up_on_network, failure::zero, names_elsewhere},
         {"KOVANetMTUChangeHook", CALL(KOVANetMTUChangeHook("eth0", "9000"))},
         {"KOVANetNetmaskToPrefix", CALL(KOVANetNetmaskToPrefix("255.0.0.0")), pure},
         {"KOVANetNtoa", CALL(KOVANetNtoa(1) != nullptr), pure},
@@ -1069,6 +1399,10 @@ const std::vector<scenario> &scenarios() {
          up_and_down, switch_members, announced, one_by_one},
         {"KOVANetSetMTUValue/switch port", CALL(KOVANetSetMTUValue("9000", "ovs_eth0")), mtu_of_switch, mtu_question,
          up_and_down, link_state, announced},
+        {"KOVANetSetPPPoERelayConfig/new", CALL(KOVANetSetPPPoERelayConfig("br0", &it.relay)), relay_to_set,
+         relay_directory, relay_made_empty},
+        {"KOVANetSetPPPoERelayConfig/change", CALL(KOVANetSetPPPoERelayConfig("br0", &it.relay)), relay,
+         relay_directory},
         {"KOVANetStaticDNSListGet", CALL(KOVANetStaticDNSListGet(&it.list)), resolver, server_list},
         {"KOVAPPPoECheckStatus/up", CALL(KOVAPPPoECheckStatus(1)), dialled, failure::below_one, processes},
         {"KOVAPPPoECheckStatus/down", CALL(KOVAPPPoECheckStatus(1)), dial_enabled, processes},
@@ -1080,6 +1414,18 @@ const std::vector<scenario> &scenarios() {
          noted_name},
         {"KOVAPPPoeNetInfoGet", CALL(KOVAPPPoeNetInfoGet(it.text, sizeof it.text, it.names[0], sizeof it.names[0])),
          connection_interface, noted_name},
+        {"KOVASchedGetNowIndex", CALL(KOVASchedGetNowIndex()), local_zone, pure},
+        {"KOVATunnelConfigGet", CALL(KOVATunnelConfigGet(&it.tunnel)), tunnel_account},
+        {"KOVATunnelConfigSet/new", CALL(KOVATunnelConfigSet(&it.tunnel)), tunnel_to_make, tunnel_files},
+        {"KOVATunnelConfigSet/change", CALL(KOVATunnelConfigSet(&it.tunnel)), tunnel_account, tunnel_files},
+        {"KOVATunnelExecute/start", CALL(KOVATunnelExecute(KOVA_TUNNEL_START, &it.tunnel)), tunnel_with_address,
+         tunnel_files, tunnel_work},
+        {"KOVATunnelExecute/stored", CALL(KOVATunnelExecute(KOVA_TUNNEL_RESTART, nullptr)), tunnel_with_address,
+         tunnel_files, tunnel_work},
+        {"KOVATunnelExecute/stop", CALL(KOVATunnelExecute(KOVA_TUNNEL_STOP, nullptr)), tunnel_account, tunnel_files,
+         tunnel_work},
+        {"KOVATunnelExecute/hanging", CALL(KOVATunnelExecute(KOVA_TUNNEL_RESTART, &it.tunnel)), tunnel_that_hangs,
+         failure::like_zero, tunnel_files, tunnel_work, tunnel_failure},
         {"NetRoutetableCheck", CALL(NetRoutetableCheck()), two_without_link, cards, protocol, known_kind, route_tools},
         {"NetRoutetableEdit/add", CALL(NetRoutetableEdit(NET_ROUTE_ADD, "10.0.0.1", "255.0.0.0", "eth0")), route_tools},
         {"NetRoutetableEdit/delete", CALL(NetRoutetableEdit(NET_ROUTE_DELETE, "10.0.0.1", "255.0.0.0", "eth0")),

@@ -5,6 +5,7 @@
  */
 #pragma once
 
+#include "support/connections.h"
 #include "support/fake_kernel.h"
 #include "support/fault_points.h"
 
@@ -47,6 +48,9 @@ struct world {
     VLANINFO vlan = {};
     BRIDGEINFO bridge = {};
     PPPOE_CONF dial = {};
+    PPPOE_RELAY_CONF relay = {};
+    std::optional<kova_test::listener> host; ///< who can be reached
+    TUNNEL_CONF tunnel = {};
 };
 
 /** How a function's result says that it failed. */
@@ -64,6 +68,7 @@ struct tolerance {
     std::string reason;           ///< why, in one line
     std::optional<long> result{}; ///< what the function answers then; without one as when nothing failed
     std::string file{};           ///< file that may be in between, by a part of its path
+    std::string holds{};          ///< what it holds then, whatever else; "gone" for one that is no more
 };
 using tolerances = std::vector<tolerance>;
 inline constexpr long kAnyResult = LONG_MIN;
@@ -114,9 +119,6 @@ struct report {
 };
 
 report run(const scenario &one, const kova_test::fault_plan &plan);
-
-/** The operation of a point, "open" of "KLIBCFileSetKeys /etc/... > open /etc/...". */
-std::string operation_of(const std::string &point);
 
 /** Runs a scenario through all its points. @return what is wrong, a line each */
 texts sweep(const scenario &one, const report &clean);

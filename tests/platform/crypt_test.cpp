@@ -93,6 +93,9 @@ TEST_F(crypt, KLIBCCryptBufCrypt_anotherMachine_cannotRead) {
     const buffer there = cipher("password");
     EXPECT_NE(here, there);
     EXPECT_NE(read_file(kKeyFile), key);
+    buffer shown;
+    EXPECT_WORKS(KLIBCCryptBufCrypt(here.data(), here.size(), shown.data(), shown.size()), 0);
+    EXPECT_STRNE(shown.data(), "password") << "its own key does not bring the text back";
     write_file(kKeyFile, key);
     EXPECT_EQ(cipher("password"), here);
 }

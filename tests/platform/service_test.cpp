@@ -68,11 +68,27 @@ TEST_F(service, KLIBServicecfgRunKeyGet_key_isRead) {
     EXPECT_EQ(run, 1);
     write_file(kConfiguration, "run=no\n");
     EXPECT_WORKS(KLIBServicecfgRunKeyGet("kova-test", &run), 0);
-    EXPECT_EQ(run, 0);
+    EXPECT_EQ(run, 2);
     write_file(kConfiguration, "other=yes\n");
     EXPECT_WORKS(KLIBServicecfgRunKeyGet("kova-test", &run), 0);
-    EXPECT_EQ(run, 0);
+    EXPECT_EQ(run, 2);
     EXPECT_FAILS(KLIBServicecfgRunKeyGet("kova-test", nullptr), -1, 0xD00);
+}
+
+TEST_F(service, KLIBServicecfgRunKeySet_key_isReadBack) {
+    for (const int wanted : {1, 2, 1}) {
+        int run = 0;
+        EXPECT_WORKS(KLIBServicecfgRunKeySet("kova-test", wanted), 0);
+        EXPECT_WORKS(KLIBServicecfgRunKeyGet("kova-test", &run), 0);
+        EXPECT_EQ(run, wanted);
+    }
+    EXPECT_EQ(read_file(kConfiguration), "run=yes\n");
+    write_file(kConfiguration, "# mine\nrun=no\nother=yes\n");
+    EXPECT_WORKS(KLIBServicecfgRunKeySet("kova-test", 1), 0);
+    EXPECT_EQ(read_file(kConfiguration), "# mine\nrun=yes\nother=yes\n");
+    for (const int wrong : {0, 3, -1})
+        EXPECT_FAILS(KLIBServicecfgRunKeySet("kova-test", wrong), -1, 0xD00);
+    EXPECT_EQ(read_file(kConfiguration), "# mine\nrun=yes\nother=yes\n");
 }
 
 TEST_F(service, KLIBService_badNames_areRefused) {
@@ -82,6 +98,7 @@ TEST_F(service, KLIBService_badNames_areRefused) {
         EXPECT_FAILS(KLIBServiceIsRunning(name), -1, 0xD00);
         EXPECT_FAILS(KLIBServicectlJobStop(name), -1, 0xD00);
         EXPECT_FAILS(KLIBServicecfgRunKeyGet(name, &run), -1, 0xD00);
+        EXPECT_FAILS(KLIBServicecfgRunKeySet(name, 1), -1, 0xD00);
     }
     EXPECT_FAILS(KLIBServiceReload(nullptr), -1, 0xD00);
     EXPECT_FAILS(KLIBServiceIsRunning(std::string(65, 'x').c_str()), -1, 0xD00);

@@ -55,8 +55,8 @@ int collect(dl_phdr_info *object, size_t, void *out) {
 }
 
 const segments &loaded() {
+    const rig_at_work guard; // also while its end is registered, which may ask for memory
     static const segments found = [] {
-        const rig_at_work guard;
         segments all;
         dl_iterate_phdr(collect, &all);
         return all;
@@ -124,6 +124,22 @@ bool fault_points::meets(const std::string &operation, const std::string &detail
     }
     failed.push_back(label);
     return true;
+}
+
+std::string operation_of(const std::string &point) {
+    const size_t outer = point.rfind(" > ");
+    const std::string call = outer == std::string::npos ? point : point.substr(outer + 3);
+    return call.substr(0, call.find(' '));
+}
+
+void fault_points::adopt(const texts &also_met, const texts &also_failed) {
+    const bool is_chosen_there = met.size() <= plan_.chosen && plan_.chosen < met.size() + also_met.size();
+    if (is_chosen_there) {
+        const std::string &chosen = also_met[plan_.chosen - met.size()];
+        chosen_operation_ = operation_of(chosen);
+    }
+    met.insert(met.end(), also_met.begin(), also_met.end());
+    failed.insert(failed.end(), also_failed.begin(), also_failed.end());
 }
 
 // ---- streams

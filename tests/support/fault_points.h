@@ -24,6 +24,9 @@ struct fault_plan {
     size_t chosen = 0; ///< number of the point, from 0
 };
 
+/** The operation of a point, "open" of "KLIBCFileSetKeys /etc/... > open /etc/...". */
+std::string operation_of(const std::string &point);
+
 /** What a run met. */
 class fault_points {
 public:
@@ -32,6 +35,10 @@ public:
     /** Counts a point. @return whether it fails */
     bool meets(const std::string &operation, const std::string &detail);
     void leave() { within_.pop_back(); }
+    /** What is met from now on is met within a call that is left already. */
+    void stay_in(const std::string &call) { within_.push_back(call); }
+    /** Goes on behind what another process met. */
+    void adopt(const texts &also_met, const texts &also_failed);
     [[nodiscard]] bool fails_otherwise() const { return plan_.how == fault_plan::way::otherwise; }
 
     texts met{}; ///< "KLIBCFileSetKeys /etc/... > open /etc/...": the calls of the platform around it, then the point

@@ -556,6 +556,27 @@ extern "C" int socket(int domain, int type, int protocol) noexcept {
     return next(domain, type, protocol);
 }
 
+extern "C" int setsockopt(int fd, int level, int option, const void *value, socklen_t size) noexcept {
+    static const auto next = real<int (*)(int, int, int, const void *, socklen_t)>("setsockopt");
+    const fault_point point{"setsockopt", is_in_code_under_test(__builtin_return_address(0)),
+                            [&] { return std::to_string(option); }};
+    if (is_failing(point, 0)) {
+        errno = ENOPROTOOPT;
+        return -1;
+    }
+    return next(fd, level, option, value, size);
+}
+
+extern "C" ssize_t sendto(int fd, const void *bytes, size_t size, int flags, const sockaddr *to, socklen_t length) {
+    static const auto next = real<ssize_t (*)(int, const void *, size_t, int, const sockaddr *, socklen_t)>("sendto");
+    const fault_point point{"sendto", is_in_code_under_test(__builtin_return_address(0)), [] { return std::string(); }};
+    if (is_failing(point, 0)) {
+        errno = ENOBUFS;
+        return -1;
+    }
+    return next(fd, bytes, size, flags, to, length);
+}
+
 // ---- paths
 
 namespace {
@@ -566,6 +587,10 @@ std::string meant(const char *path) {
 
 int open_meant(const char *name, const char *path, int flags, mode_t mode, const void *caller) {
     const fault_point point = path_point("open", path, caller);
+    if (is_observing() && (flags & O_CREAT) != 0) {
+        const rig_at_work guard;
+        current_rig->made[path] = mode;
+    }
     if (is_failing(point, 0)) {
         errno = EMFILE;
         return -1;
@@ -651,10 +676,26 @@ int note_sleep(const timespec *wanted) {
     return 0;
 }
 
+/** A signal that is handled comes when half of the time is over. */
+int interrupt_sleep(const timespec *wanted, timespec *left) {
+    constexpr long kNanosecondsOfSecond = 1'000'000'000;
+    const long half = (wanted->tv_sec * kNanosecondsOfSecond + wanted->tv_nsec) / 2;
+    const timespec slept{half / kNanosecondsOfSecond, half % kNanosecondsOfSecond};
+    note_sleep(&slept);
+    if (left != nullptr) {
+        *left = slept;
+    }
+    errno = EINTR;
+    return -1;
+}
+
 } // namespace
 
 extern "C" int nanosleep(const timespec *wanted, timespec *left) {
     static const auto next = real<int (*)(const timespec *, timespec *)>("nanosleep");
+    if (is_observing() && current_points == nullptr && current_rig->is_failing("nanosleep")) {
+        return interrupt_sleep(wanted, left);
+    }
     return is_observing() ? note_sleep(wanted) : next(wanted, left);
 }
 
@@ -791,10 +832,13 @@ const bool others_can_fail[] = {
     can_fail("KLIBPluginExit"),
     can_fail("ioctl"),
     can_fail("socket"),
+    can_fail("setsockopt"),
+    can_fail("sendto"),
     can_fail("open"),
     can_fail("fopen"),
     can_fail("access"),
     can_fail("opendir"),
+    can_fail("nanosleep"),
     can_fail("malloc"),
     can_fail("calloc"),
     can_fail("realloc"),

@@ -60,21 +60,23 @@ template<typename Test> size_t end_of(const std::string &line, size_t at, Test i
 }
 
 /**
- * A log line with N in place of its line numbers: "unit:12 ", "function(12)", "function (12)" or "(unit:12:" at the
- * beginning, and "unit:12]" of a lower error anywhere. By hand, as a line may be very long and expressions are slow.
+ * A log line with N in place of its line numbers: "unit:12 ", "function(12)", "function (12)", "unit function(12)" or
+ * "(unit:12:" at the beginning, and "unit:12]" of a lower error anywhere. By hand, as a line may be very long and
+ * expressions are slow.
  */
 std::string without_line_numbers(const std::string &line) {
     const auto is_name = [](unsigned char c) { return isalnum(c) != 0 || c == '_' || c == '.' || c == '/'; };
     const auto is_digit = [](unsigned char c) { return isdigit(c) != 0; };
     const size_t name = end_of(line, line.rfind('(', 0) == 0 ? 1 : 0, is_name);
-    const size_t bracket = end_of(line, name, [](unsigned char c) { return c == ' '; });
+    const size_t second = end_of(line, name, [](unsigned char c) { return c == ' '; });
+    const size_t bracket = end_of(line, second, is_name); // "unit function(12)": behind the function
     std::string shown;
     for (size_t at = 0; at < line.size();) {
         shown += line[at];
         const size_t end = end_of(line, at + 1, is_digit);
         const char behind = end < line.size() ? line[end] : '\0';
         const bool is_place = line[at] == ':' && (behind == ']' || (at == name && (behind == ' ' || behind == ':')));
-        const bool is_function = line[at] == '(' && at == bracket && behind == ')';
+        const bool is_function = line[at] == '(' && (at == second || at == bracket) && behind == ')';
         const bool is_line_number = end > at + 1 && (is_place || is_function);
         shown += is_line_number ? "N" : "";
         at = is_line_number ? end : at + 1;
@@ -115,6 +117,7 @@ outcome test_rig::observe(const std::function<long()> &call) {
     KLIBCErrSetEx(0, "", 0);
     is_observing = true;
     now.result = call();
+    release_forked();
     is_observing = false;
     now.code = KLIBCErrGet();
     now.unit = KLIBCErrorGetFile();
@@ -138,6 +141,11 @@ void test_rig::fail(const std::string &operation, int nth) {
 void test_rig::fail_from(const std::string &operation, int nth) {
     fail(operation, nth);
     failures_[operation].stays = true;
+}
+
+void test_rig::before(const std::string &operation, const std::function<void()> &look) {
+    EXPECT_TRUE(fault_operations().count(operation)) << operation << " is nothing that the rig stands before";
+    looks_[operation] = look;
 }
 
 void test_rig::answer_ioctl(ioctl_answer answer) {
@@ -202,6 +210,12 @@ int test_rig::note_command(const texts &words, std::string *output) {
 }
 
 bool test_rig::is_failing(const std::string &operation) {
+    const auto look = looks_.find(operation);
+    if (is_observing && look != looks_.end()) {
+        is_observing = false; // what it does is not the call's
+        look->second();
+        is_observing = true;
+    }
     if (!is_observing || failures_.empty()) {
         return false;
     }
@@ -215,6 +229,24 @@ bool test_rig::is_failing(const std::string &operation) {
         failures_.erase(found);
     }
     return true;
+}
+
+texts test_rig::failures_left() const {
+    texts left;
+    for (const auto &[operation, how] : failures_) {
+        for (const std::string &text :
+             {operation, std::to_string(how.skip), std::string(how.stays ? "stays" : "once")}) {
+            left.push_back(text);
+        }
+    }
+    return left;
+}
+
+void test_rig::keep_failures(const texts &left) {
+    failures_.clear();
+    for (size_t i = 0; i + 2 < left.size(); i += 3) {
+        failures_[left[i]] = {std::stoi(left[i + 1]), left[i + 2] == "stays"};
+    }
 }
 
 std::string test_rig::redirected(const char *path) const {
@@ -254,11 +286,11 @@ texts open_descriptors() {
 void lay_out_clean_appliance() {
     for (const char *path :
          {"/etc/sysconfig", "/etc.defaults", "/etc/kova", "/etc/kovainfo.conf", "/etc/dhclient", "/etc/ppp",
-          "/run/ddns", "/run/lock/kova", "/usr/kova", "/etc/dhcpd", "/etc/iproute2/config"}) {
+          "/run/ddns", "/run/lock/kova", "/usr/kova", "/etc/dhcpd", "/etc/iproute2/config", "/etc/gogoc"}) {
         fs::remove_all(path);
     }
     for (const char *path : {"/etc/sysconfig/network-scripts", "/etc.defaults", "/etc/kova", "/etc/dhclient/ipv4",
-                             "/etc/ppp", "/run/ddns"}) {
+                             "/etc/ppp", "/etc/gogoc", "/run/ddns"}) {
         fs::create_directories(path);
     }
 }

@@ -70,12 +70,15 @@ public:
 
     /**
      * Makes the nth next call of an operation fail: one of the platform, whose code is in the register then, or malloc,
-     * calloc, realloc, fopen, open, opendir, access, socket, ioctl, or one of unit/failing_calls.cpp. A name that
-     * the rig does not know fails the test.
+     * calloc, realloc, fopen, open, opendir, access, socket, setsockopt, sendto, ioctl, getaddrinfo, or one of
+     * unit/failing_calls.cpp; a signal interrupts nanosleep halfway. A name that the rig does not know fails the test.
      */
     void fail(const std::string &operation, int nth = 1);
     /** The same, and every call after it. */
     void fail_from(const std::string &operation, int nth = 1);
+
+    /** Called before each call of an operation that can fail: a look at what is there in between. */
+    void before(const std::string &operation, const std::function<void()> &look);
 
     // ---- kernel
 
@@ -93,12 +96,23 @@ public:
     /** Called at every sleep with the milliseconds asked for: what happens meanwhile. */
     void on_sleep(const std::function<void(long)> &effect);
 
+    // ---- processes that the call forks: each runs to its end before the call goes on, and belongs to the outcome
+
+    /** Holds the next one where it calls wait_for_release, until it is released or the call has ended. */
+    void hold_forked();
+    void wait_for_release() const;
+    /** Lets it go on to its end. */
+    void release_forked();
+
     // ---- used by the replaced calls
 
     void note_log(int level, const std::string &line);
     int note_command(const texts &words, std::string *output);
     bool is_failing(const std::string &operation);
     std::string redirected(const char *path) const;
+    /** The failures that are still to come, as texts for another process, and back. */
+    [[nodiscard]] texts failures_left() const;
+    void keep_failures(const texts &left);
     /** The path that was asked for when this one was opened. */
     std::string asked_for(const std::string &path) const;
 
@@ -107,8 +121,11 @@ public:
     ioctl_answer on_ioctl;
     std::function<int(char *, size_t)> on_gethostname;
     std::function<void(long)> during_sleep;
-    std::map<std::string, int> held; ///< containers, handles and streams that are open, by kind
-    long slept_ms = 0;               ///< the clocks are ahead by what was slept
+    std::map<std::string, int> held;    ///< containers, handles and streams that are open, by kind
+    std::map<std::string, mode_t> made; ///< files that open made, or would have made, with the mode asked for
+    bool is_holding = false;
+    int held_report = -1; ///< where a process that is held will tell what it did
+    long slept_ms = 0;    ///< the clocks are ahead by what was slept
 
 private:
     struct reply {
@@ -123,6 +140,7 @@ private:
     };
     std::map<std::string, reply> replies_;
     std::map<std::string, failure> failures_;
+    std::map<std::string, std::function<void()>> looks_;
     std::map<std::string, std::string> redirects_;
     int files_ = 0;
 };

@@ -10,6 +10,7 @@ namespace {
 const std::string kInfo = "/etc/kovainfo.conf";
 const std::string kUnit = "conf_get_mtu_value";
 const texts kLocked{"+0x806", "-0x800"};
+const std::string kNoOrigin = "INFO conf_get_mtu_value:N Failed to fetch slave interface from OVS master ovs_eth0";
 
 } // namespace
 
@@ -73,6 +74,14 @@ TEST_F(conf_get_mtu_value, KOVAConfGetMTUValue_switchPort_hasTheKeyOfTheInterfac
     EXPECT_STREQ("4", value);
 }
 
+TEST_F(conf_get_mtu_value, KOVAConfGetMTUValue_switchPortOfNoInterface_hasItsOwnKey) {
+    rig.replace_file("/sys/devices/virtual/net/ovs_eth0", "");
+    write_file(kInfo, "eth0_mtu=1\novs_eth0_mtu=2\n");
+    rig.fail("KLIBNetOVSGetOriginalIf");
+    EXPECT_OUTCOME(get("ovs_eth0"), {.result = 0, .log = {kNoOrigin}});
+    EXPECT_STREQ("2", value);
+}
+
 TEST_F(conf_get_mtu_value, KOVAConfGetMTUValue_fileThatCannotBeRead_fails) {
     shell("rm " + kInfo);
     EXPECT_OUTCOME(get("eth0"), {.result = -1,
@@ -133,6 +142,19 @@ TEST_F(conf_get_mtu_value, KOVAConfSetMTUValue_switchPort_storesForTheInterfaceB
     rig.replace_file("/sys/devices/virtual/net/ovs_eth0", "");
     EXPECT_OUTCOME(set("9000", "ovs_eth0"), {.locks = kLocked});
     EXPECT_EQ("dns_mode=\"static\"\neth0_mtu=\"9000\"\n", read_file(kInfo));
+}
+
+TEST_F(conf_get_mtu_value, KOVAConfSetMTUValue_switchPortAboveAVlan_isNoVlanItself) {
+    rig.replace_file("/sys/devices/virtual/net/ovs_eth0.10", "");
+    EXPECT_OUTCOME(set("9000", "ovs_eth0.10"), {.locks = kLocked});
+    EXPECT_EQ("dns_mode=\"static\"\neth0.10_mtu=\"9000\"\n", read_file(kInfo));
+}
+
+TEST_F(conf_get_mtu_value, KOVAConfSetMTUValue_switchPortOfNoInterface_getsItsOwnKey) {
+    rig.replace_file("/sys/devices/virtual/net/ovs_eth0", "");
+    rig.fail("KLIBNetOVSGetOriginalIf");
+    EXPECT_OUTCOME(set("9000", "ovs_eth0"), {.log = {kNoOrigin}, .locks = kLocked});
+    EXPECT_EQ("dns_mode=\"static\"\novs_eth0_mtu=\"9000\"\n", read_file(kInfo));
 }
 
 TEST_F(conf_get_mtu_value, KOVAConfSetMTUValue_anyText_isStoredAsItIs) {

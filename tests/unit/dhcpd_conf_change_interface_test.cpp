@@ -156,7 +156,8 @@ TEST_F(dhcpd_conf_change_interface, DHCPDConfChangeInterface_onlyRegularFiles_ar
 
 TEST_F(dhcpd_conf_change_interface, DHCPDConfChangeInterface_badNames_changeNothing) {
     write_file(kDir + "dhcpd-eth0.info", "enable=\"yes\"\n");
-    const outcome missing{.result = -1, .log = {kUnit + "Bad parameters"}};
+    const outcome missing{
+        .result = -1, .code = 0xD00, .unit = "dhcpd_conf_change_interface", .log = {kUnit + "Bad parameters"}};
     EXPECT_OUTCOME(change(nullptr, "eth1"), missing);
     EXPECT_OUTCOME(change("eth0", nullptr), missing);
     EXPECT_OUTCOME(change(nullptr, nullptr), missing);

@@ -1,12 +1,14 @@
 /**
  * @file
- * More calls that a unit test can make fail: those that bring a file to its place, the host name, entries of lists.
+ * More calls that a unit test can make fail: those that bring a file to its place, the host name, entries of lists, and
+ * one of the library's own that fails for no name of an interface.
  */
 #include "support/fault_points.h"
 
 #include <cstdio>
 #include <dlfcn.h>
 #include <kova/core.h>
+#include <kovanetsdk/iface.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
@@ -29,8 +31,13 @@ int failure(int error) {
     return -1;
 }
 
-const bool known[] = {can_fail("fsync"), can_fail("fclose"),      can_fail("rename"),
-                      can_fail("chmod"), can_fail("sethostname"), can_fail("KLIBCSzListGet")};
+const bool known[] = {can_fail("fsync"),
+                      can_fail("fclose"),
+                      can_fail("rename"),
+                      can_fail("chmod"),
+                      can_fail("sethostname"),
+                      can_fail("KLIBCSzListGet"),
+                      can_fail("KLIBNetOVSGetOriginalIf")};
 
 } // namespace
 
@@ -62,6 +69,11 @@ extern "C" int stat(const char *path, struct stat *status) noexcept {
 extern "C" const char *KLIBCSzListGet(const KLIBSZLIST *list, int index) {
     static const auto next = real<const char *(const KLIBSZLIST *, int)>("KLIBCSzListGet");
     return is_failing("KLIBCSzListGet") ? nullptr : next(list, index);
+}
+
+extern "C" int KLIBNetOVSGetOriginalIf(const char *szIfname, char *szOut, int size) {
+    static const auto next = real<int(const char *, char *, int)>("KLIBNetOVSGetOriginalIf");
+    return is_failing("KLIBNetOVSGetOriginalIf") ? -1 : next(szIfname, szOut, size);
 }
 
 extern "C" int sethostname(const char *name, size_t size) noexcept {

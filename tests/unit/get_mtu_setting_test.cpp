@@ -27,6 +27,12 @@ TEST_F(get_mtu_setting, KOVAGetMTUSetting_unknownInterface_isZero) {
     EXPECT_EQ(texts{"ERR get_mtu:N Cannot get MTU of eth9: No such device"}, rig.now.log);
 }
 
+TEST_F(get_mtu_setting, KOVAGetMTUSetting_sixteenCharacters_areNoOtherInterface) {
+    kernel.add(long_text(15), {.mtu = 9000});
+    EXPECT_OUTCOME(get(long_text(15).c_str()), {.result = 9000});
+    EXPECT_EQ(0, get(long_text(16).c_str()).result);
+}
+
 TEST_F(get_mtu_setting, KOVAGetMTUSetting_longName_isLoggedTwice) {
     EXPECT_OUTCOME(get("abcdefghijklmnopq"), {.result = -1,
                                               .code = 0xD00,
@@ -40,6 +46,13 @@ TEST_F(get_mtu_setting, KOVAGetMTUSetting_switchPort_hasThatOfTheInterfaceBehind
     kernel.add("eth0", {.mtu = 9000});
     kernel.add("ovs_eth0", {.mtu = 1500});
     EXPECT_OUTCOME(get("ovs_eth0"), {.result = 9000});
+}
+
+TEST_F(get_mtu_setting, KOVAGetMTUSetting_switchPortOfNoInterface_isMinusOne) {
+    rig.replace_file("/sys/devices/virtual/net/ovs_eth0", "");
+    kernel.add("ovs_eth0", {.mtu = 1500});
+    rig.fail("KLIBNetOVSGetOriginalIf");
+    EXPECT_OUTCOME(get("ovs_eth0"), {.result = -1, .log = {"ERR get_mtu_setting:N get ovs origin interface error"}});
 }
 
 TEST_F(get_mtu_setting, KOVAGetMTUSetting_switchBond_hasTheLargestOfItsMembers) {

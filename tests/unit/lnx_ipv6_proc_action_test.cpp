@@ -75,6 +75,13 @@ TEST_F(lnx_ipv6_proc_action, KOVALnxIPv6ProcAction_one_switches_off_at_once) {
     EXPECT_EQ("1\n", read_file(kShown));
 }
 
+TEST_F(lnx_ipv6_proc_action, KOVALnxIPv6ProcAction_signal_does_not_shorten_the_wait) {
+    std::vector<long> sleeps(11, 500);
+    sleeps[0] = sleeps[1] = 250;
+    rig.fail("nanosleep");
+    EXPECT_OUTCOME(act(0), {.sleeps = sleeps});
+}
+
 TEST_F(lnx_ipv6_proc_action, KOVALnxIPv6ProcAction_other_values_switch_on_at_once) {
     for (const int nSwitch : {2, -1}) {
         write_file(kShown, "before");

@@ -25,6 +25,15 @@ TEST_F(net_bridge_if_is_master, KLIBNetBridgeIfIsMaster_whatIsNoDirectory_isNone
     EXPECT_OUTCOME(is_master("br0"), {.result = 0});
 }
 
+TEST_F(net_bridge_if_is_master, KLIBNetBridgeIfIsMaster_longNames_areLookedForWhole) {
+    shell("mkdir -p /tmp/sys-long/bridge");
+    rig.redirect("/sys/class/net/" + long_text(15), "/tmp/sys-long");
+    EXPECT_OUTCOME(is_master(long_text(15).c_str()), {.result = 1});
+    for (const size_t length : {16, 17, 255, 4096}) {
+        EXPECT_EQ(0, is_master(long_text(length).c_str()).result);
+    }
+}
+
 TEST_F(net_bridge_if_is_master, KLIBNetBridgeIfIsMaster_badNames_areRefused) {
     EXPECT_OUTCOME(is_master(nullptr), refusal("net_bridge_if_is_master", "((void *)0) != szIfname", 0));
     EXPECT_OUTCOME(is_master(""), refusal("net_bridge_if_is_master", "'\\0' != *szIfname", 0));

@@ -22,6 +22,15 @@ TEST_F(net_bridge_if_is_slave, KLIBNetBridgeIfIsSlave_realBridge_hasItsPort) {
     EXPECT_OUTCOME(is_slave("kv0"), {.result = 0});
 }
 
+TEST_F(net_bridge_if_is_slave, KLIBNetBridgeIfIsSlave_longNames_areLookedForWhole) {
+    shell("mkdir -p /tmp/sys-long/brport");
+    rig.redirect("/sys/class/net/" + long_text(15), "/tmp/sys-long");
+    EXPECT_OUTCOME(is_slave(long_text(15).c_str()), {.result = 1});
+    for (const size_t length : {16, 17, 255, 4096}) {
+        EXPECT_EQ(0, is_slave(long_text(length).c_str()).result);
+    }
+}
+
 TEST_F(net_bridge_if_is_slave, KLIBNetBridgeIfIsSlave_badNames_areRefused) {
     EXPECT_OUTCOME(is_slave(nullptr), refusal("net_bridge_if_is_slave", "((void *)0) != szIfname", 0));
     EXPECT_OUTCOME(is_slave(""), refusal("net_bridge_if_is_slave", "'\\0' != *szIfname", 0));

@@ -62,10 +62,9 @@ TEST_F(net_bridge_slave_enum, KLIBNetBridgeSlaveEnum_list_isAppendedTo) {
 }
 
 TEST_F(net_bridge_slave_enum, KLIBNetBridgeSlaveEnum_whatIsNoBridge_isLogged) {
-    for (const char *name : {"lo", "gone0"}) {
-        EXPECT_OUTCOME(
-            list(name),
-            {.result = -1, .log = {std::string("ERR net_bridge_slave_enum:N [") + name + "] is not bridge master."}});
+    for (const std::string &name : texts{"lo", "gone0", long_text(15), long_text(16), long_text(17)}) {
+        EXPECT_OUTCOME(list(name.c_str()),
+                       {.result = -1, .log = {"ERR net_bridge_slave_enum:N [" + name + "] is not bridge master."}});
     }
 }
 
@@ -77,7 +76,8 @@ TEST_F(net_bridge_slave_enum, KLIBNetBridgeSlaveEnum_directoryThatCannotBeRead_f
 }
 
 TEST_F(net_bridge_slave_enum, KLIBNetBridgeSlaveEnum_missingArguments_areLogged) {
-    const outcome bad{.result = -1, .log = {"ERR net_bridge_slave_enum:N Bad Parameter."}};
+    const outcome bad{
+        .result = -1, .code = 0xD00, .unit = kUnit, .log = {"ERR net_bridge_slave_enum:N Bad Parameter."}};
     EXPECT_OUTCOME(list(nullptr), bad);
     EXPECT_OUTCOME(rig.observe([] { return KLIBNetBridgeSlaveEnum("br0", nullptr); }), bad);
 }

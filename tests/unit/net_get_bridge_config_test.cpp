@@ -120,10 +120,22 @@ TEST_F(net_get_bridge_config, KOVANetGetBridgeConfig_oneRecord_isEnough) {
 }
 
 TEST_F(net_get_bridge_config, KOVANetGetBridgeConfig_longNames_areCutInTheRecords) {
-    write_file(ifcfg(long_text(16)), "");
-    EXPECT_OUTCOME(get(long_text(16).c_str()), {.result = 0});
-    EXPECT_EQ(long_text(15), role.szIfname);
-    EXPECT_EQ(long_text(15), ip.szIfname);
+    for (const size_t length : {15, 16, 17, 200}) {
+        write_file(ifcfg(long_text(length)), "");
+        EXPECT_OUTCOME(get(long_text(length).c_str()), {.result = 0});
+        EXPECT_EQ(long_text(15), role.szIfname);
+        EXPECT_EQ(long_text(15), ip.szIfname);
+    }
+}
+
+TEST_F(net_get_bridge_config, KOVANetGetBridgeConfig_directory_hasNoKeys) {
+    shell("mkdir " + kFile);
+    const outcome got = get();
+    EXPECT_EQ(0, got.result);
+    EXPECT_EQ(texts{}, got.log);
+    expect_role(1, "");
+    EXPECT_EQ(0U, ip.blLinkUp);
+    EXPECT_EQ(0U, ip.nIPSource);
 }
 
 TEST_F(net_get_bridge_config, KOVANetGetBridgeConfig_noFile_isLogged) {
@@ -131,8 +143,9 @@ TEST_F(net_get_bridge_config, KOVANetGetBridgeConfig_noFile_isLogged) {
 }
 
 TEST_F(net_get_bridge_config, KOVANetGetBridgeConfig_badArguments_areRefused) {
-    EXPECT_OUTCOME(rig.observe([] { return KOVANetGetBridgeConfig("br0", nullptr, nullptr); }),
-                   {.result = -1, .log = {"ERR net_get_bridge_config:N Wrong Parameter."}});
+    EXPECT_OUTCOME(
+        rig.observe([] { return KOVANetGetBridgeConfig("br0", nullptr, nullptr); }),
+        {.result = -1, .code = 0xD00, .unit = kUnit, .log = {"ERR net_get_bridge_config:N Wrong Parameter."}});
     EXPECT_OUTCOME(get(nullptr), refusal(kUnit, "((void *)0) != szIfname"));
     EXPECT_OUTCOME(get(""), refusal(kUnit, "'\\0' != *szIfname"));
     for (const std::string &name : bad_names()) {
@@ -148,7 +161,8 @@ TEST_F(net_get_bridge_config, KOVANetIsIfBridgeType_role_isCompared) {
 }
 
 TEST_F(net_get_bridge_config, KOVANetIsIfBridgeType_failures_areZeroAndLogged) {
-    EXPECT_OUTCOME(is_type(nullptr, 1), {.result = 0, .log = {"ERR net_get_bridge_config:N Bad parameter"}});
+    EXPECT_OUTCOME(is_type(nullptr, 1),
+                   {.result = 0, .code = 0xD00, .unit = kUnit, .log = {"ERR net_get_bridge_config:N Bad parameter"}});
     EXPECT_OUTCOME(is_type("br0", 1), {.result = 0,
                                        .log = {"ERR net_get_bridge_config:N Failed to access [" + kFile + "].",
                                                "ERR net_get_bridge_config:N Failed to get PPPoE relay config"}});
@@ -225,6 +239,22 @@ TEST_F(net_get_bridge_config, KOVANetSetBridgeConfig_rewriteThatFails_leavesTheF
     EXPECT_EQ("DEVICE=old\n", read_file(kFile + ".saved")) << "stays, and is not put back";
 }
 
+TEST_F(net_get_bridge_config, KOVANetSetBridgeConfig_directory_cannotBeRewritten) {
+    shell("mkdir " + kFile);
+    const outcome got = set(bridge(1));
+    EXPECT_EQ(-1, got.result);
+    EXPECT_EQ("file_rewrite", got.unit);
+    EXPECT_EQ(kCopy, got.commands);
+    EXPECT_EQ(texts{"ifcfg-br0"}, list_dir("/etc/sysconfig/network-scripts"));
+}
+
+TEST_F(net_get_bridge_config, KOVANetSetBridgeConfig_readOnlyFileWithoutNewline_isRewritten) {
+    write_file(kFile, "# mine\nBRIDGE=br9");
+    shell("chmod 0400 " + kFile);
+    EXPECT_OUTCOME(set(bridge(2, "eth0")), {.commands = kCopy});
+    EXPECT_EQ("# mine\nDEVICE=br0\nTYPE=bridge\nPRIMARY=eth0\n", read_file(kFile));
+}
+
 TEST_F(net_get_bridge_config, KOVANetSetBridgeConfig_noMemory_is200) {
     write_file(kFile, "DEVICE=old\n");
     const NETINFO fixed = address(1, 1);
@@ -240,8 +270,9 @@ TEST_F(net_get_bridge_config, KOVANetSetBridgeConfig_noMemory_is200) {
 }
 
 TEST_F(net_get_bridge_config, KOVANetSetBridgeConfig_badArguments_areRefused) {
-    EXPECT_OUTCOME(rig.observe([] { return KOVANetSetBridgeConfig(nullptr, nullptr); }),
-                   {.result = -1, .log = {"ERR net_get_bridge_config:N Wrong Parameter."}});
+    EXPECT_OUTCOME(
+        rig.observe([] { return KOVANetSetBridgeConfig(nullptr, nullptr); }),
+        {.result = -1, .code = 0xD00, .unit = kUnit, .log = {"ERR net_get_bridge_config:N Wrong Parameter."}});
     EXPECT_OUTCOME(set(bridge(1, "", "")), refusal(kUnit, "'\\0' != *pBridge->szIfname"));
     for (const char *name : {"a b", "a/b", "../x", "..", "a\nb"}) {
         EXPECT_OUTCOME(set(bridge(1, "", name)), refusal(kUnit, "is_interface_name(pBridge->szIfname)"));

@@ -73,9 +73,82 @@ TEST_F(net_link_aggr_conf_del, KOVANetLinkAggrConfDel_memberThatCannotLeave_isPu
                            .unit = "platform",
                            .commands = {kCopies[0], kCopies[1], kCopies[2], put_back("eth0"), put_back("eth1")},
                            .locks = kLocks});
+    EXPECT_EQ((texts{"ifcfg-bond0", "ifcfg-eth0", "ifcfg-eth1"}), list_dir("/etc/sysconfig/network-scripts"));
     EXPECT_EQ(kBond, read_file(ifcfg("bond0")));
-    EXPECT_EQ(kBond, read_file(ifcfg("eth0")));
+    EXPECT_EQ("DEVICE=eth0\nBOOTPROTO=static\nIPADDR=10.0.0.1\nNETMASK=255.0.0.0\n" + kMember, read_file(ifcfg("eth0")))
+        << "the bond's settings, but a member";
     EXPECT_EQ(kEth1 + kMember, read_file(ifcfg("eth1")));
+}
+
+TEST_F(net_link_aggr_conf_del, KOVANetLinkAggrConfDel_firstMemberWithoutMemory_staysTheBonds) {
+    for (const char *operation : {"KLIBCSzHashAlloc", "KLIBCSzHashSetValue", "KLIBCFileSetKeys"}) {
+        SetUp();
+        rig.fail_from(operation);
+        EXPECT_EQ(-1, del().result);
+        EXPECT_EQ(kBond, read_file(ifcfg("bond0")));
+        EXPECT_EQ(kBond, read_file(ifcfg("eth0")));
+        EXPECT_EQ(kEth1 + kMember, read_file(ifcfg("eth1")));
+        rig = {};
+    }
+}
+
+TEST_F(net_link_aggr_conf_del, KOVANetLinkAggrConfDel_filesThatAreNotThere_endItWithTheBondLeft) {
+    shell("rm " + ifcfg("bond0"));
+    EXPECT_OUTCOME(del(), {.result = -1,
+                           .code = 0x2A00,
+                           .unit = kUnit,
+                           .log = {"ERR " + kUnit + ":N Failed to copy " + ifcfg("bond0") + " to " + ifcfg("eth0")},
+                           .commands = {kCopies[0], put_back("eth0"), put_back("eth1")}});
+    EXPECT_EQ(kEth0, read_file(ifcfg("eth0")));
+    EXPECT_EQ(kEth1 + kMember, read_file(ifcfg("eth1")));
+    SetUp();
+    shell("rm " + ifcfg("eth1")); // its address cannot be compared
+    EXPECT_EQ(-1, del().result);
+    EXPECT_EQ(0x900U, rig.now.code);
+    EXPECT_EQ((texts{"ifcfg-bond0", "ifcfg-eth0"}), list_dir("/etc/sysconfig/network-scripts"));
+    EXPECT_EQ(kBond, read_file(ifcfg("bond0")));
+    SetUp();
+    shell("rm " + ifcfg("eth0")); // it gets the bond's
+    EXPECT_EQ(0, del().result);
+    EXPECT_EQ("DEVICE=eth0\nBOOTPROTO=static\nIPADDR=10.0.0.1\nNETMASK=255.0.0.0\n", read_file(ifcfg("eth0")));
+}
+
+TEST_F(net_link_aggr_conf_del, KOVANetLinkAggrConfDel_directoriesForFiles_endItWithTheBondLeft) {
+    for (const char *name : {"bond0", "eth0", "eth1"}) {
+        SetUp();
+        shell("rm " + ifcfg(name) + " && mkdir " + ifcfg(name));
+        // a copy into a directory is no failure of the tool: the next step fails
+        EXPECT_EQ(-1, del().result) << name;
+        shell("rm -r " + ifcfg(name));
+        EXPECT_EQ(name == std::string("bond0") ? "<absent>" : kBond, read_file(ifcfg("bond0"))) << name;
+    }
+}
+
+TEST_F(net_link_aggr_conf_del, KOVANetLinkAggrConfDel_foreignFiles_keepTheirOtherLines) {
+    write_file(ifcfg("bond0"),
+               "# bond\n\nDEVICE=bond0\nIPV6INIT=auto\nnonsense\nIPADDR=10.0.0.1\nBONDING_OPTS=\"mode=4\"");
+    write_file(ifcfg("eth1"), "MASTER=bond0\n# card\nSLAVE=yes\nIPADDR=\"10.0.0.1\"");
+    const outcome got = del();
+    EXPECT_EQ(0, got.result);
+    EXPECT_EQ("# bond\n\nDEVICE=eth0\nIPV6INIT=auto\nnonsense\nIPADDR=10.0.0.1\nBOOTPROTO=dhcp\n",
+              read_file(ifcfg("eth0")));
+    EXPECT_EQ("# card\nIPADDR=\nBOOTPROTO=dhcp\nDEVICE=eth1\nNETMASK=\n", read_file(ifcfg("eth1")));
+}
+
+TEST_F(net_link_aggr_conf_del, KOVANetLinkAggrConfDel_32Members_allLeave) {
+    texts names;
+    for (int i = 10; i < 42; ++i) {
+        names.push_back("eth" + std::to_string(i));
+        write_file(ifcfg(names.back()), "DEVICE=" + names.back() + "\nBOOTPROTO=dhcp\n" + kMember);
+    }
+    request("bond0", names);
+    EXPECT_EQ(0, del().result);
+    EXPECT_EQ("DEVICE=eth10\nBOOTPROTO=static\nIPADDR=10.0.0.1\nNETMASK=255.0.0.0\n", read_file(ifcfg("eth10")));
+    for (size_t i = 1; i < names.size(); ++i) {
+        EXPECT_EQ("DEVICE=" + names[i] + "\nBOOTPROTO=dhcp\n", read_file(ifcfg(names[i])));
+    }
+    bond.cSlaves = 33;
+    EXPECT_OUTCOME(del(), refusal(kUnit, "has_usable_slaves(*pOpt)"));
 }
 
 TEST_F(net_link_aggr_conf_del, KOVANetLinkAggrConfDel_bondsFileThatCannotBeCopied_endsIt) {

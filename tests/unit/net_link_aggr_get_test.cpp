@@ -82,7 +82,8 @@ TEST_F(net_link_aggr_get, KOVANetLinkAggrGet_kernelModes_areMapped) {
 }
 
 TEST_F(net_link_aggr_get, KOVANetLinkAggrGet_otherMode_isLoggedAndZero) {
-    for (const std::string &mode : texts{"balance-tlb 5", "802.3ad", "x"}) {
+    for (const std::string &mode : texts{"balance-tlb 5", "802.3ad", "802.3ad ", "balance-rr", "balance-r", "4", " ",
+                                         "BALANCE-RR 0", "\x01\xff", long_text(900)}) {
         add_kernel_bond("eth0 eth1\n", mode + "\n");
         const outcome got = get("bond0");
         EXPECT_EQ(0, got.result);
@@ -135,6 +136,44 @@ TEST_F(net_link_aggr_get, KOVANetLinkAggrGet_modeFile_hasToBeReadable) {
                                   .unit = "net_link_aggr_get",
                                   .log = {"ERR net_link_aggr_get:N Fail to read [/sys/class/net/bond0/bonding/mode], "
                                           "errno=[0/Success]"}});
+}
+
+TEST_F(net_link_aggr_get, KOVANetLinkAggrGet_32Members_areTaken) {
+    texts names;
+    std::string line;
+    for (int i = 41; i >= 10; --i) {
+        names.insert(names.begin(), "eth" + std::to_string(i));
+        line += names.front() + " ";
+    }
+    add_kernel_bond(line + "\n", "balance-rr 0\n");
+    EXPECT_EQ(0, get("bond0").result);
+    EXPECT_EQ(names, slaves());
+    EXPECT_TRUE(is_clean());
+}
+
+TEST_F(net_link_aggr_get, KOVANetLinkAggrGet_foreignMemberList_isTakenByWords) {
+    add_kernel_bond(std::string("eth1 \0eth0\n", 11), "balance-rr 0\n");
+    EXPECT_EQ(0, get("bond0").result);
+    EXPECT_EQ(texts{"eth1"}, slaves());
+    add_kernel_bond("eth1\teth0", "balance-rr 0\n"); // cut off
+    EXPECT_EQ(0, get("bond0").result);
+    EXPECT_EQ((texts{"eth0", "eth1"}), slaves());
+    add_kernel_bond(long_text(100000), "balance-rr 0\n");
+    EXPECT_EQ(0, get("bond0").result);
+    EXPECT_EQ(texts{long_text(15)}, slaves());
+    add_kernel_bond("eth0 eth0\n", "balance-rr 0\n");
+    EXPECT_EQ(-1, get("bond0").result);
+    EXPECT_EQ(0xBB00U, rig.now.code);
+}
+
+TEST_F(net_link_aggr_get, KOVANetLinkAggrGet_bondThatVanishesMeanwhile_failsOrIsNone) {
+    add_kernel_bond("eth0 eth1\n", "802.3ad 4\n");
+    rig.fail("fopen", 2); // the mode, behind the members
+    EXPECT_EQ(-1, get("bond0").result);
+    EXPECT_EQ(0x900U, rig.now.code);
+    rig.fail("fopen", 1);
+    EXPECT_EQ(0, get("bond0").result);
+    EXPECT_EQ(0, bond.mode + bond.cSlaves);
 }
 
 TEST_F(net_link_aggr_get, KOVANetLinkAggrGet_tooManyMembers_fail) {
@@ -197,6 +236,33 @@ TEST_F(net_link_aggr_get, KOVANetLinkAggrGet_switchBondNamesAMemberTwice_isLogge
                     .unit = "net_link_aggr_opt_slsave_add",
                     .log = {"ERR net_link_aggr_opt_slsave_add:N Slave eth0 is already in [ovs_bond0]",
                             "ERR net_link_aggr_get:N Failed to add the slave eth0 into KOVALINKAGGROPT"}});
+}
+
+TEST_F(net_link_aggr_get, KOVANetLinkAggrGet_switchBondOf33Members_isLogged) {
+    for (const int number : {32, 33}) {
+        std::string list;
+        for (int i = 0; i < number; ++i) {
+            const std::string name = "e" + std::to_string(i);
+            kernel.add(name);
+            list += name + " ";
+        }
+        add_switch_bond("SLAVE_LIST=\"" + list + "\"\nBOND_MODE=balance-slb\n");
+        EXPECT_EQ(number == 32 ? 0 : 1, get("ovs_bond0").result);
+        EXPECT_EQ(32, bond.cSlaves);
+    }
+    EXPECT_EQ(0xBD00U, rig.now.code);
+    EXPECT_EQ("ERR net_link_aggr_get:N Failed to add the slave e32 into KOVALINKAGGROPT", rig.now.log.back());
+}
+
+TEST_F(net_link_aggr_get, KOVANetLinkAggrGet_switchBondFileThatCannotBeRead_isOne) {
+    add_switch_bond("");
+    for (const char *break_it : {"rm ", "rm -f ", "mkdir "}) {
+        shell(break_it + ifcfg("ovs_bond0"));
+        EXPECT_OUTCOME(get("ovs_bond0"), {.result = 1,
+                                          .code = 0x900,
+                                          .unit = "key_value",
+                                          .log = {"ERR net_link_aggr_get:N Failed to get key [BLOCK_CNT]"}});
+    }
 }
 
 TEST_F(net_link_aggr_get, KOVANetLinkAggrGet_switchBondNamesPaths_leavesThemOut) {

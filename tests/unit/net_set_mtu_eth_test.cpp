@@ -135,6 +135,15 @@ TEST_F(net_set_mtu_eth, KOVANetSetMTUEth_switchPort_setsTheInterfaceBehindIt) {
     EXPECT_EQ(not_set("eth0"), set("9000", "ovs_eth0").log.back());
 }
 
+TEST_F(net_set_mtu_eth, KOVANetSetMTUEth_switchPortOfNoInterface_isLeftAlone) {
+    rig.replace_file("/sys/devices/virtual/net/ovs_eth0", "");
+    kernel.add("ovs_eth0");
+    rig.fail("KLIBNetOVSGetOriginalIf");
+    EXPECT_OUTCOME(set("9000", "ovs_eth0"),
+                   {.result = -1, .log = {"ERR net_set_mtu_eth:N get ovs origin interface error"}});
+    EXPECT_EQ(texts{}, kernel.changes);
+}
+
 TEST_F(net_set_mtu_eth, KOVANetSetMTUEth_switchBond_setsItsMembersAlone) {
     for (const char *name : {"eth1", "eth2", "ovs_bond0"}) {
         kernel.add(name);

@@ -55,6 +55,12 @@ TEST_F(net_set_mtu_value, KOVANetSetMTUValue_interface_isStoredSetAndAnnounced) 
     EXPECT_EQ(set_lines("eth0"), before_the_wait);
 }
 
+TEST_F(net_set_mtu_value, KOVANetSetMTUValue_signal_doesNotShortenTheWait) {
+    rig.fail("nanosleep");
+    EXPECT_OUTCOME(set("9000", "eth0"),
+                   {.log = {kNotice}, .events = event("eth0"), .locks = kLocked, .sleeps = {2500, 2500}});
+}
+
 TEST_F(net_set_mtu_value, KOVANetSetMTUValue_vlan_isSetWithItsRowDevice) {
     kernel.add("eth0.10", {.row_device = "eth0", .vlan_id = 10});
     EXPECT_OUTCOME(set("9000", "eth0.10"),
@@ -72,6 +78,14 @@ TEST_F(net_set_mtu_value, KOVANetSetMTUValue_switchPort_isTheInterfaceBehindIt) 
     EXPECT_EQ(set_lines("eth0"), kernel.changes);
 }
 
+TEST_F(net_set_mtu_value, KOVANetSetMTUValue_switchPortOfNoInterface_changesNothing) {
+    rig.replace_file("/sys/devices/virtual/net/ovs_eth0", "");
+    rig.fail("KLIBNetOVSGetOriginalIf");
+    EXPECT_OUTCOME(set("9000", "ovs_eth0"), {.result = -1, .log = {kBegin + "get ovs origin interface error"}});
+    EXPECT_EQ("", read_file(kInfo));
+    EXPECT_EQ(texts{}, kernel.changes);
+}
+
 TEST_F(net_set_mtu_value, KOVANetSetMTUValue_jumboOnASlowLink_isStoredAndAnnouncedAlone) {
     for (const unsigned speed : {10U, 100U, 999U, 0U, 0xFFFFU}) { // the last two are unknown
         for (const std::string &mtu : texts{"1500", "9000"}) {
@@ -85,6 +99,18 @@ TEST_F(net_set_mtu_value, KOVANetSetMTUValue_jumboOnASlowLink_isStoredAndAnnounc
             EXPECT_EQ(texts{}, kernel.changes);
         }
     }
+}
+
+TEST_F(net_set_mtu_value, KOVANetSetMTUValue_valueOnASlowLink_isTheNumberThatTheKernelIsGiven) {
+    for (const auto &[text, mtu] : std::map<std::string, std::string>{
+             {"", "0"}, {"many", "0"}, {"-9000", "-9000"}, {"4294968696", "1400"}, {"99999999999999999999", "-1"}}) {
+        kernel.add("eth0", {.speed = 100});
+        EXPECT_EQ(0, set(text.c_str(), "eth0").result);
+        EXPECT_EQ((texts{"eth0 down", "eth0 mtu " + mtu, "eth0 up"}), kernel.changes) << text;
+    }
+    kernel.add("eth0", {.speed = 100});
+    EXPECT_EQ(0, set("1500 bytes", "eth0").result);
+    EXPECT_EQ(texts{}, kernel.changes);
 }
 
 TEST_F(net_set_mtu_value, KOVANetSetMTUValue_smallMtuOrFastLink_isSet) {
@@ -226,6 +252,17 @@ TEST_F(net_set_mtu_value, KOVANetSetMTUValue_switchBondThatFails_isAnnouncedAllT
                                               .events = event("ovs_bond0"),
                                               .locks = kLocked,
                                               .sleeps = {5000}});
+}
+
+TEST_F(net_set_mtu_value, KOVANetSetMTUValue_longNames_areThoseThatTheKernelCanHave) {
+    kernel.add(long_text(15));
+    EXPECT_EQ(0, set("9000", long_text(15).c_str()).result);
+    EXPECT_EQ(9000, kernel.at(long_text(15)).mtu);
+    const outcome got = set("9000", long_text(16).c_str());
+    EXPECT_EQ(-1, got.result) << "it has a setting, but is no interface";
+    EXPECT_EQ(kBegin + "Failed to set MTU 9000 of " + long_text(16), got.log.back());
+    EXPECT_EQ(texts{}, got.events);
+    EXPECT_EQ(texts{}, kernel.changes);
 }
 
 TEST_F(net_set_mtu_value, KOVANetSetMTUValue_badArguments_areRefused) {

@@ -19,6 +19,12 @@ const std::string kRowFile = "# the office\n"
                              "IPV6PREFIXLENG=64\n"
                              "IPV6_DEFAULTGW=\n"
                              "IPV6DNS=\"2001:db8::53\"\n"
+                             "BOOTPROTO2=kept\n"
+                             "IPADDR2=kept\n"
+                             "NETMASK2=kept\n"
+                             "IPV6INIT2=kept\n"
+                             "IPV6_DEFAULTGW2=kept\n"
+                             " BOOTPROTO=kept\n"
                              "IPV6DNS2=kept\n"
                              "ONBOOT=yes\n"
                              "LOCAL_LAN=yes"; // no final newline
@@ -26,6 +32,12 @@ const std::string kNewRowFile = "# the office\n"
                                 "DEVICE=eth0\n"
                                 "IPV6ADDR=2001:db8::1\n"
                                 "IPV6PREFIXLENG=64\n"
+                                "BOOTPROTO2=kept\n"
+                                "IPADDR2=kept\n"
+                                "NETMASK2=kept\n"
+                                "IPV6INIT2=kept\n"
+                                "IPV6_DEFAULTGW2=kept\n"
+                                " BOOTPROTO=kept\n"
                                 "IPV6DNS2=kept\n"
                                 "ONBOOT=yes\n"
                                 "LOCAL_LAN=yes\n"
@@ -101,18 +113,28 @@ protected:
         EXPECT_EQ(texts{"ifcfg-eth0"}, list_dir("/etc/sysconfig/network-scripts"));
     }
 
+    /** What a call did that made the VLAN. */
+    static void expect_moved() {
+        EXPECT_EQ(kNewRowFile, read_file(ifcfg("eth0")));
+        EXPECT_EQ(kVlanFile, read_file(ifcfg("eth0.10")));
+        EXPECT_EQ("eth0_mtu=\"9000\"\neth0.10_mtu=\"9000\"\n", read_file("/etc/kovainfo.conf"));
+        EXPECT_EQ((texts{"ifcfg-eth0", "ifcfg-eth0.10"}), list_dir("/etc/sysconfig/network-scripts"));
+        EXPECT_EQ(0644U, mode_of(ifcfg("eth0")));
+        EXPECT_EQ(0644U, mode_of(ifcfg("eth0.10")));
+    }
+
     std::optional<fake_kernel> kernel;
     NETINFO ip{.nIPSource = 1, .szIP = "192.168.1.10", .szMask = "255.255.255.0"};
 };
 
 TEST_F(net_vlan_create, KLIBNetVlanCreate_staticAddress_movesTheConfigurationToTheVlan) {
     EXPECT_OUTCOME(create(), {.commands = kCommands, .events = events(0), .locks = kAllLocks, .sleeps = {2000}});
-    EXPECT_EQ(kNewRowFile, read_file(ifcfg("eth0")));
-    EXPECT_EQ(kVlanFile, read_file(ifcfg("eth0.10")));
-    EXPECT_EQ("eth0_mtu=\"9000\"\neth0.10_mtu=\"9000\"\n", read_file("/etc/kovainfo.conf"));
-    EXPECT_EQ((texts{"ifcfg-eth0", "ifcfg-eth0.10"}), list_dir("/etc/sysconfig/network-scripts"));
-    EXPECT_EQ(0644U, mode_of(ifcfg("eth0")));
-    EXPECT_EQ(0644U, mode_of(ifcfg("eth0.10")));
+    expect_moved();
+}
+
+TEST_F(net_vlan_create, KLIBNetVlanCreate_signal_doesNotShortenTheWait) {
+    rig.fail("nanosleep");
+    EXPECT_OUTCOME(create(), {.commands = kCommands, .events = events(0), .locks = kAllLocks, .sleeps = {1000, 1000}});
 }
 
 TEST_F(net_vlan_create, KLIBNetVlanCreate_dhcp_looksAtNoAddress) {
@@ -127,11 +149,25 @@ TEST_F(net_vlan_create, KLIBNetVlanCreate_dhcp_looksAtNoAddress) {
 TEST_F(net_vlan_create, KLIBNetVlanCreate_settings_areThereBetweenStopAndStart) {
     std::string at_stop;
     std::string at_start;
-    rig.answer(kCommands[0], 1, "", [&] { at_stop = read_file(ifcfg("eth0")) + read_file(ifcfg("eth0.10")); });
+    texts names;
+    rig.answer(kCommands[0], 1, "", [&] {
+        at_stop = read_file(ifcfg("eth0")) + read_file(ifcfg("eth0.10"));
+        names = list_dir("/etc/sysconfig/network-scripts");
+    });
     rig.answer(kStart, 127, "", [&] { at_start = read_file(ifcfg("eth0")) + read_file(ifcfg("eth0.10")); });
     EXPECT_EQ(0, create().result) << "what the script answers is not looked at";
     EXPECT_EQ(kRowFile + "<absent>", at_stop);
+    ASSERT_EQ(3U, names.size()) << "the new files are written, and wait for their places";
+    EXPECT_EQ("DEVICE_", names[0].substr(0, 7));
+    EXPECT_EQ("VLAN_", names[1].substr(0, 5));
     EXPECT_EQ(kNewRowFile + kVlanFile, at_start);
+}
+
+TEST_F(net_vlan_create, KLIBNetVlanCreate_filesForTheirOwnerAlone_areReadableByAll) {
+    write_file(ifcfg("eth0.10"), "DEVICE=old\n");
+    shell("chmod 0400 " + ifcfg("eth0") + " " + ifcfg("eth0.10"));
+    EXPECT_EQ(0, create().result);
+    expect_moved();
 }
 
 TEST_F(net_vlan_create, KLIBNetVlanCreate_noMtuSetting_isTheOrdinaryOne) {
@@ -291,6 +327,8 @@ TEST_F(net_vlan_create, KLIBNetVlanCreate_eachStepFails_stopsThereAndTellsTheRes
         texts log;
         files state;
         size_t commands;
+        size_t locks = kAllLocks.size();
+        std::string last_command{}; ///< beyond those of every call
     };
     const step steps[] = {
         {"lock of PPPoE",
@@ -300,6 +338,7 @@ TEST_F(net_vlan_create, KLIBNetVlanCreate_eachStepFails_stopsThereAndTellsTheRes
          {"ERR pppoe_check_status:N KLIBCFileLock() failed.(400)",
           begins + "Disable PPPoE interface eth0 Failed.[0x0400 pppoe_check_status:N]"},
          kOld,
+         0,
          0},
         {"switch of PPPoE",
          [&] { rig.fail("KLIBCFileGetKeyValue", 1); },
@@ -307,14 +346,24 @@ TEST_F(net_vlan_create, KLIBNetVlanCreate_eachStepFails_stopsThereAndTellsTheRes
          "platform",
          {begins + "Disable PPPoE interface eth0 Failed.[0x0900 platform:N]"},
          kOld,
-         0},
+         0,
+         2},
+        {"lock of PPPoE is given back",
+         [&] { rig.fail("KLIBCFileUnlock", 1); },
+         0xD00,
+         "platform",
+         {begins + "Disable PPPoE interface eth0 Failed.[0x0D00 platform:N]"},
+         kOld,
+         0,
+         2},
         {"MTU is read",
          [&] { rig.fail("KLIBCFileGetKeyValue", 2); },
          0x900,
          "platform",
          {"ERR conf_get_mtu_value (N) Failed to get eth0_mtu (900)", no_mtu + " Failed.[0x0900 platform:N]"},
          kOld,
-         0},
+         0,
+         2},
         {"lock of the MTU",
          [&] { rig.fail("KLIBCFileLock", 2); },
          0x400,
@@ -322,7 +371,8 @@ TEST_F(net_vlan_create, KLIBNetVlanCreate_eachStepFails_stopsThereAndTellsTheRes
          {"ERR conf_get_mtu_value:N Failed to lock kovainfo [0x0400 platform:N]",
           no_mtu + "9000 Failed.[0x0400 platform:N]"},
          kOld,
-         0},
+         0,
+         2},
         {"MTU is stored",
          [&] { rig.fail("KLIBCFileSetKeyValue"); },
          0xB00,
@@ -331,9 +381,24 @@ TEST_F(net_vlan_create, KLIBNetVlanCreate_eachStepFails_stopsThereAndTellsTheRes
           no_mtu + "9000 Failed.[0x0B00 platform:N]"},
          kOld,
          0},
+        {"lock of the MTU is given back",
+         [&] { rig.fail("KLIBCFileUnlock", 2); },
+         0xD00,
+         "platform",
+         {"ERR conf_get_mtu_value:N Failed to unlock kovainfo[0x0D00 platform:N]",
+          no_mtu + "9000 Failed.[0x0D00 platform:N]"},
+         kMtu,
+         0},
         {"VLAN file is made", [&] { rig.fail("KLIBCFileTempFileOpen", 1); }, 0x900, "platform", {}, kMtu, 0},
         {"row file is there",
          [&] { rig.hide(row_path); },
+         0x900,
+         "key_value",
+         {begins + "Failed to get key[IPV6INIT] in file[" + row_path + "]."},
+         kMtu,
+         0},
+        {"row file is a file",
+         [&] { rig.redirect(row_path, "/etc"); },
          0x900,
          "key_value",
          {begins + "Failed to get key[IPV6INIT] in file[" + row_path + "]."},
@@ -368,6 +433,7 @@ TEST_F(net_vlan_create, KLIBNetVlanCreate_eachStepFails_stopsThereAndTellsTheRes
          {begins + "Failed to write " + row_path + ": Input/output error"},
          kMtu,
          0},
+        {"row file takes its place", [&] { rig.fail("rename", 1); }, 0, "", {}, kMtu, 1},
         {"row file's mode",
          [&] { rig.fail("chmod"); },
          0,
@@ -375,6 +441,7 @@ TEST_F(net_vlan_create, KLIBNetVlanCreate_eachStepFails_stopsThereAndTellsTheRes
          {begins + "change " + row_path + "'s mode failed"},
          kRow,
          1},
+        {"VLAN file takes its place", [&] { rig.fail("rename", 2); }, 0, "", {}, kRow, 1},
         {"VLAN file's mode",
          [&] { rig.fail("chmod", 2); },
          0,
@@ -402,6 +469,33 @@ TEST_F(net_vlan_create, KLIBNetVlanCreate_eachStepFails_stopsThereAndTellsTheRes
           "ERR dhcpd_conf_change_interface:N Failed to move DHCP tag conf from [eth0] to [eth0.10]"},
          kBoth,
          5},
+        {"DHCP server's switch",
+         [&] {
+             write_file("/etc/dhcpd/dhcpd-eth0.info", "enable=yes\n");
+             rig.fail("rename", 3);
+         },
+         0,
+         "",
+         {"ERR dhcpd_conf_change_interface:N Failed to rename "
+          "[/etc/dhcpd/dhcpd-eth0.info][/etc/dhcpd/dhcpd-eth0.10.info]",
+          "ERR dhcpd_conf_change_interface:N Failed to move interface global setting from [eth0] to [eth0.10]"},
+         kBoth,
+         5},
+        {"DHCP server's subnets",
+         [&] {
+             write_file("/etc/dhcpd/dhcpd-eth0-subnet0.conf", "interface=eth0\n");
+             rig.answer("/bin/sed", 1);
+         },
+         0,
+         "",
+         {"ERR dhcpd_conf_change_interface:N Failed to sed [/bin/sed -i s/eth0/eth0.10/g "
+          "/etc/dhcpd/dhcpd-eth0.10-subnet0.conf]",
+          "ERR dhcpd_conf_change_interface:N Failed to replace tag in [/etc/dhcpd/dhcpd-eth0.10-subnet0.conf]",
+          "ERR dhcpd_conf_change_interface:N Failed to move DHCP tag conf from [eth0] to [eth0.10]"},
+         kBoth,
+         5,
+         kAllLocks.size(),
+         "/bin/sed -i s/eth0/eth0.10/g /etc/dhcpd/dhcpd-eth0.10-subnet0.conf"},
         {"DHCP server", [&] { tool(5); }, 0, "", {}, kBoth, 6},
     };
     for (const step &step : steps) {
@@ -415,7 +509,10 @@ TEST_F(net_vlan_create, KLIBNetVlanCreate_eachStepFails_stopsThereAndTellsTheRes
                          .log = step.log,
                          .commands = first(kCommands, step.commands),
                          .events = events(-1),
-                         .locks = got.locks};
+                         .locks = first(kAllLocks, step.locks)};
+        if (!step.last_command.empty()) {
+            expected.commands.push_back(step.last_command);
+        }
         if (step.commands > 1) {
             expected.sleeps = {2000};
         }
@@ -453,23 +550,31 @@ TEST_F(net_vlan_create, KLIBNetVlanCreate_eventThatCannotBeOpened_changesNothing
 }
 
 TEST_F(net_vlan_create, KLIBNetVlanCreate_eventThatFails_isLoggedAlone) {
-    rig.fail("KLIBPluginAction", 1);
-    EXPECT_OUTCOME(create(), {.code = 0x2A00,
-                              .unit = "platform",
-                              .log = {"ERR net_vlan_create:N Fail to execute net plugin (PRE) [0x2A00 platform:N]"},
-                              .commands = kCommands,
-                              .events = events(0),
-                              .locks = kAllLocks,
-                              .sleeps = {2000}});
-    begin();
-    rig.fail("KLIBPluginAction", 2);
-    EXPECT_OUTCOME(create(), {.code = 0x2A00,
-                              .unit = "platform",
-                              .log = {"ERR net_vlan_create:N Fail to execute net plugin (POST) [0x2A00 platform:N]"},
-                              .commands = kCommands,
-                              .events = events(0),
-                              .locks = kAllLocks,
-                              .sleeps = {2000}});
+    for (const int nth : {1, 2}) {
+        begin();
+        rig.fail("KLIBPluginAction", nth);
+        EXPECT_OUTCOME(create(), {.code = 0x2A00,
+                                  .unit = "platform",
+                                  .log = {std::string("ERR net_vlan_create:N Fail to execute net plugin (") +
+                                          (nth == 1 ? "PRE" : "POST") + ") [0x2A00 platform:N]"},
+                                  .commands = kCommands,
+                                  .events = events(0),
+                                  .locks = kAllLocks,
+                                  .sleeps = {2000}});
+        expect_moved();
+    }
+}
+
+TEST_F(net_vlan_create, KLIBNetVlanCreate_eventThatIsNotOpen_isNotRaised) {
+    for (const int nth : {1, 2}) {
+        begin();
+        rig.fail("KLIBPluginHasInit", nth);
+        const outcome got = create();
+        EXPECT_EQ(0, got.result);
+        EXPECT_EQ(texts{}, got.log);
+        EXPECT_EQ(nth == 1 ? texts{"net/ifname_change 5" + arguments(0)} : first(events(0), 1), got.events);
+        expect_moved();
+    }
 }
 
 TEST_F(net_vlan_create, KLIBNetVlanCreate_eventArgumentsThatCannotBeSet_areLoggedAlone) {
@@ -478,6 +583,7 @@ TEST_F(net_vlan_create, KLIBNetVlanCreate_eventArgumentsThatCannotBeSet_areLogge
     EXPECT_EQ(0, got.result);
     EXPECT_EQ(texts{"ERR net_vlan_create:N Fail to execute net plugin (PRE) [0x0200 platform:N]"}, got.log);
     EXPECT_EQ(texts{"net/ifname_change 5" + arguments(0)}, got.events);
+    expect_moved();
     begin();
     rig.fail("KLIBPluginSetArgByInt", 2);
     const outcome after = create();

@@ -89,8 +89,10 @@ TEST_F(net_vlan_get, KLIBNetVlanGetByRowDev_longName_isCut) {
     kernel.add("abcdefghijklm.4", {.row_device = "abcdefghijklm", .vlan_id = 4094});
     EXPECT_OUTCOME(get_by_row("abcdefghijklm", 4094), {.result = 1});
     expect_record("abcdefghijklm.4", "abcdefghijklm", 4094);
-    EXPECT_OUTCOME(get_by_row(long_text(4096).c_str(), 1), {.result = 0});
-    expect_record(long_text(15), "", 0);
+    for (const size_t length : {15, 16, 17, 4096}) {
+        EXPECT_OUTCOME(get_by_row(long_text(length).c_str(), 1), {.result = 0});
+        expect_record(long_text(15), "", 0);
+    }
 }
 
 TEST_F(net_vlan_get, KLIBNetVlanGetByRowDev_badArguments_areRefused) {

@@ -12,6 +12,10 @@ const std::string kRowFile = "# the office\n"
                              "DEVICE=eth0\n"
                              "IPV6ADDR=2001:db8::1\n"
                              "IPV6PREFIXLENG=64\n"
+                             "BOOTPROTO2=kept\n"
+                             "IPV6INIT2=kept\n"
+                             "IPV6ADDR2=kept\n"
+                             "IPV6PREFIXLENG2=kept\n"
                              "ONBOOT=yes\n"
                              "LOCAL_LAN=yes\n"
                              "BOOTPROTO=none\n"
@@ -29,9 +33,19 @@ const std::string kVlanFile = "DEVICE=eth0.10\n"
                               "IPV6_DEFAULTGW=2001:db8::ff\n"
                               "IPV6DNS=2001:db8::53\n"
                               "IPV6DNS2=2001:db8::54\n"
-                              "IPADDR2=not this\n";
+                              "IPADDR2=not this\n"
+                              "BOOTPROTO2=not this\n"
+                              "NETMASK2=not this\n"
+                              "IPV6INIT2=not this\n"
+                              "IPV6ADDR2=not this\n"
+                              "IPV6PREFIXLENG2=not this\n"
+                              "IPV6_DEFAULTGW2=not this\n";
 const std::string kNewRowFile = "# the office\n"
                                 "DEVICE=eth0\n"
+                                "BOOTPROTO2=kept\n"
+                                "IPV6INIT2=kept\n"
+                                "IPV6ADDR2=kept\n"
+                                "IPV6PREFIXLENG2=kept\n"
                                 "ONBOOT=yes\n"
                                 "LOCAL_LAN=yes\n"
                                 "BOOTPROTO=static\n"
@@ -92,26 +106,62 @@ protected:
         EXPECT_EQ(kInfo, read_file("/etc/kovainfo.conf"));
     }
 
+    /** What a call did that removed the VLAN. */
+    static void expect_given_back() {
+        EXPECT_EQ(kNewRowFile, read_file(ifcfg("eth0")));
+        EXPECT_EQ(texts{"ifcfg-eth0"}, list_dir("/etc/sysconfig/network-scripts"));
+        EXPECT_EQ(kNewInfo, read_file("/etc/kovainfo.conf"));
+        struct stat status = {};
+        EXPECT_EQ(0, stat(ifcfg("eth0").c_str(), &status));
+        EXPECT_EQ(0644U, status.st_mode & 07777U);
+    }
+
     std::optional<fake_kernel> kernel;
 };
 
 TEST_F(net_vlan_remove, KLIBNetVlanRemove_vlan_givesItsConfigurationBack) {
     EXPECT_OUTCOME(remove(), {.commands = kCommands, .events = events(0), .locks = kLocks, .sleeps = {2000}});
-    EXPECT_EQ(kNewRowFile, read_file(ifcfg("eth0")));
-    EXPECT_EQ(texts{"ifcfg-eth0"}, list_dir("/etc/sysconfig/network-scripts"));
-    EXPECT_EQ(kNewInfo, read_file("/etc/kovainfo.conf"));
-    struct stat status = {};
-    EXPECT_EQ(0, stat(ifcfg("eth0").c_str(), &status));
-    EXPECT_EQ(0644U, status.st_mode & 07777U);
+    expect_given_back();
+}
+
+TEST_F(net_vlan_remove, KLIBNetVlanRemove_signal_doesNotShortenTheWait) {
+    rig.fail("nanosleep");
+    EXPECT_OUTCOME(remove(), {.commands = kCommands, .events = events(0), .locks = kLocks, .sleeps = {1000, 1000}});
+}
+
+TEST_F(net_vlan_remove, KLIBNetVlanRemove_filesForTheirOwnerAlone_areReadableByAll) {
+    shell("chmod 0400 " + ifcfg("eth0") + " " + ifcfg("eth0.10"));
+    EXPECT_EQ(0, remove().result);
+    expect_given_back();
+}
+
+TEST_F(net_vlan_remove, KLIBNetVlanRemove_lastLinesWithoutNewline_areKept) {
+    write_file(ifcfg("eth0"), "BOOTPROTO=none\nLOCAL_LAN=yes");
+    write_file(ifcfg("eth0.10"), "VLAN_ID=10\nBOOTPROTO=dhcp");
+    EXPECT_EQ(0, remove().result);
+    EXPECT_EQ("LOCAL_LAN=yes\nBOOTPROTO=dhcp\n", read_file(ifcfg("eth0")));
+}
+
+TEST_F(net_vlan_remove, KLIBNetVlanRemove_emptyFiles_leaveAnEmptyOne) {
+    write_file(ifcfg("eth0"), "");
+    write_file(ifcfg("eth0.10"), "");
+    EXPECT_EQ(0, remove().result);
+    EXPECT_EQ("", read_file(ifcfg("eth0")));
 }
 
 TEST_F(net_vlan_remove, KLIBNetVlanRemove_files_changeBetweenStopAndStart) {
     std::string at_stop;
     std::string at_start;
-    rig.answer(kCommands[0], 1, "", [&] { at_stop = read_file(ifcfg("eth0")) + read_file(ifcfg("eth0.10")); });
+    texts names;
+    rig.answer(kCommands[0], 1, "", [&] {
+        at_stop = read_file(ifcfg("eth0")) + read_file(ifcfg("eth0.10"));
+        names = list_dir("/etc/sysconfig/network-scripts");
+    });
     rig.answer(kCommands[1], 127, "", [&] { at_start = read_file(ifcfg("eth0")) + read_file(ifcfg("eth0.10")); });
     EXPECT_EQ(0, remove().result) << "what the script answers is not looked at";
     EXPECT_EQ(kRowFile + kVlanFile, at_stop);
+    ASSERT_EQ(3U, names.size()) << "the new file is written, and waits for its place";
+    EXPECT_EQ("DEV_", names[0].substr(0, 4));
     EXPECT_EQ(kNewRowFile + "<absent>", at_start);
 }
 
@@ -188,6 +238,33 @@ TEST_F(net_vlan_remove, KLIBNetVlanRemove_eventThatFails_isLoggedAlone) {
                                   .events = events(0),
                                   .locks = kLocks,
                                   .sleeps = {2000}});
+        expect_given_back();
+    }
+}
+
+TEST_F(net_vlan_remove, KLIBNetVlanRemove_eventThatIsNotOpen_isNotRaised) {
+    for (const int nth : {1, 2}) {
+        begin();
+        rig.fail("KLIBPluginHasInit", nth);
+        const outcome got = remove();
+        EXPECT_EQ(0, got.result);
+        EXPECT_EQ(texts{}, got.log);
+        EXPECT_EQ(nth == 1 ? texts{"net/ifname_change 5" + arguments(0)} : first(events(0), 1), got.events);
+        expect_given_back();
+    }
+}
+
+TEST_F(net_vlan_remove, KLIBNetVlanRemove_eventArgumentsThatCannotBeSet_areLoggedAlone) {
+    for (const int nth : {1, 2}) {
+        begin();
+        rig.fail("KLIBPluginSetArgByInt", nth);
+        const outcome got = remove();
+        EXPECT_EQ(0, got.result);
+        EXPECT_EQ(texts{std::string("ERR net_vlan_remove:N Fail to execute net plugin (") +
+                        (nth == 1 ? "PRE" : "POST") + ") [0x0200 platform:N]"},
+                  got.log);
+        EXPECT_EQ(1U, got.events.size());
+        expect_given_back();
     }
 }
 
@@ -210,6 +287,7 @@ TEST_F(net_vlan_remove, KLIBNetVlanRemove_eachStepFails_stopsThereAndTellsTheRes
         texts log;
         files state;
         size_t commands;
+        std::string last_command{}; ///< beyond those of every call
     };
     const step steps[] = {
         {"lock of PPPoE",
@@ -218,6 +296,20 @@ TEST_F(net_vlan_remove, KLIBNetVlanRemove_eachStepFails_stopsThereAndTellsTheRes
          "pppoe_check_status",
          {"ERR pppoe_check_status:N KLIBCFileLock() failed.(400)",
           begins + "Disable PPPoE interface eth0.10 Failed.[0x0400 pppoe_check_status:N]"},
+         kOld,
+         0},
+        {"switch of PPPoE",
+         [&] { rig.fail("KLIBCFileGetKeyValue"); },
+         0x900,
+         "platform",
+         {begins + "Disable PPPoE interface eth0.10 Failed.[0x0900 platform:N]"},
+         kOld,
+         0},
+        {"lock of PPPoE is given back",
+         [&] { rig.fail("KLIBCFileUnlock"); },
+         0xD00,
+         "platform",
+         {begins + "Disable PPPoE interface eth0.10 Failed.[0x0D00 platform:N]"},
          kOld,
          0},
         {"file is made", [&] { rig.fail("KLIBCFileTempFileOpen"); }, 0x900, "platform", {}, kNoMtu, 0},
@@ -256,6 +348,7 @@ TEST_F(net_vlan_remove, KLIBNetVlanRemove_eachStepFails_stopsThereAndTellsTheRes
          {begins + "Failed to write " + row_path + ": Input/output error"},
          kNoMtu,
          0},
+        {"file takes its place", [&] { rig.fail("rename", 1); }, 0, "", {}, kNoMtu, 1},
         {"file's mode", [&] { rig.fail("chmod"); }, 0, "", {begins + "change " + row_path + "'s mode failed"}, kRow, 1},
         {"firewall", [&] { tool(2); }, 0, "", {begins + "Failed to /usr/kova/bin/kovafirewall" + no_tool}, kGone, 3},
         {"firewall's rules",
@@ -277,6 +370,32 @@ TEST_F(net_vlan_remove, KLIBNetVlanRemove_eachStepFails_stopsThereAndTellsTheRes
           "ERR dhcpd_conf_change_interface:N Failed to move DHCP tag conf from [eth0.10] to [eth0]"},
          kGone,
          5},
+        {"DHCP server's switch",
+         [&] {
+             write_file("/etc/dhcpd/dhcpd-eth0.10.info", "enable=yes\n");
+             rig.fail("rename", 2);
+         },
+         0,
+         "",
+         {"ERR dhcpd_conf_change_interface:N Failed to rename "
+          "[/etc/dhcpd/dhcpd-eth0.10.info][/etc/dhcpd/dhcpd-eth0.info]",
+          "ERR dhcpd_conf_change_interface:N Failed to move interface global setting from [eth0.10] to [eth0]"},
+         kGone,
+         5},
+        {"DHCP server's subnets",
+         [&] {
+             write_file("/etc/dhcpd/dhcpd-eth0.10-subnet0.conf", "interface=eth0.10\n");
+             rig.answer("/bin/sed", 1);
+         },
+         0,
+         "",
+         {"ERR dhcpd_conf_change_interface:N Failed to sed [/bin/sed -i s/eth0.10/eth0/g "
+          "/etc/dhcpd/dhcpd-eth0-subnet0.conf]",
+          "ERR dhcpd_conf_change_interface:N Failed to replace tag in [/etc/dhcpd/dhcpd-eth0-subnet0.conf]",
+          "ERR dhcpd_conf_change_interface:N Failed to move DHCP tag conf from [eth0.10] to [eth0]"},
+         kGone,
+         5,
+         "/bin/sed -i s/eth0.10/eth0/g /etc/dhcpd/dhcpd-eth0-subnet0.conf"},
         {"DHCP server", [&] { tool(5); }, 0, "", {}, kGone, 6},
     };
     for (const step &step : steps) {
@@ -291,6 +410,9 @@ TEST_F(net_vlan_remove, KLIBNetVlanRemove_eachStepFails_stopsThereAndTellsTheRes
                          .commands = first(kCommands, step.commands),
                          .events = events(-1),
                          .locks = step.code == 0x400 ? texts{} : kLocks};
+        if (!step.last_command.empty()) {
+            expected.commands.push_back(step.last_command);
+        }
         if (step.commands > 1) {
             expected.sleeps = {2000};
         }

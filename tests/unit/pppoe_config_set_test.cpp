@@ -1,5 +1,6 @@
 #include "support/rig.h"
 
+#include <algorithm>
 #include <cstring>
 #include <kovanetsdk/pppoe.h>
 #include <sys/stat.h>
@@ -22,6 +23,18 @@ PPPOE_CONF settings(const std::string &user, const std::string &password, const 
     memcpy(conf.szMTU, mtu.data(), std::min(mtu.size(), sizeof conf.szMTU));
     conf.blDefaultRoute = is_default;
     return conf;
+}
+
+/** A user name as both files have it. */
+std::string quoted(const std::string &user) {
+    std::string text = "'";
+    for (const char byte : user) {
+        if (text.size() > (byte == '\'' ? 505U : 509U)) {
+            break;
+        }
+        text += byte == '\'' ? std::string("'\"'\"'") : std::string(1, byte);
+    }
+    return text + "'";
 }
 
 mode_t mode_of(const std::string &path) {
@@ -102,6 +115,72 @@ TEST_F(pppoe_config_set, PPPoEConfigSet_secret_isNobodyElsesFromTheBeginning) {
     shell("chmod 666 " + kSecrets);
     EXPECT_EQ(0, set(settings("user", "secret")).result);
     EXPECT_EQ(0600U, mode_of(kSecrets));
+}
+
+TEST_F(pppoe_config_set, PPPoEConfigSet_secret_isNobodyElsesAtAnyMoment) {
+    const mode_t old = umask(0);
+    for (const bool is_there : {false, true}) {
+        if (is_there) {
+            shell("chmod 666 " + kSecrets + " " + kConf);
+            write_file(kNewSecrets, "left by a killed one\n");
+            shell("chmod 666 " + kNewSecrets);
+        }
+        texts seen;
+        const auto look = [&seen](const std::string &at) {
+            for (const std::string &path : {kNewSecrets, kSecrets}) {
+                if (read_file(path).find("secret") != std::string::npos) {
+                    seen.push_back(at + (mode_of(path) == 0600U ? " closed" : " open"));
+                }
+            }
+        };
+        rig.before("fsync", [&look] { look("fsync"); });
+        rig.before("fclose", [&look] { look("fclose"); });
+        rig.before("rename", [&look] { look("rename"); });
+        rig.before("chmod", [&look] { look("chmod"); });
+        rig.made.clear();
+        EXPECT_EQ(0, set(settings("user", "secret")).result);
+        EXPECT_EQ(0600U, rig.made.at(kNewSecrets));
+        EXPECT_EQ(0U, rig.made.count(kSecrets));
+        EXPECT_EQ(0600U, mode_of(kSecrets));
+        EXPECT_NE(seen.end(), std::find(seen.begin(), seen.end(), "rename closed"));
+        EXPECT_NE(seen.end(), std::find(seen.begin(), seen.end(), "chmod closed"));
+        for (const std::string &moment : seen) {
+            EXPECT_EQ(std::string::npos, moment.find("open")) << moment;
+        }
+        shell("printf old > " + kSecrets);
+    }
+    umask(old);
+}
+
+TEST_F(pppoe_config_set, PPPoEConfigSet_linkInPlaceOfTheSecrets_isReplaced) {
+    write_file("/tmp/bait", "bait\n");
+    shell("chmod 644 /tmp/bait && ln -s /tmp/bait " + kSecrets);
+    EXPECT_EQ(0, set(settings("user", "secret")).result);
+    EXPECT_EQ("bait\n", read_file("/tmp/bait"));
+    EXPECT_EQ(0644U, mode_of("/tmp/bait"));
+    EXPECT_EQ(0600U, mode_of(kSecrets));
+    shell("test -f " + kSecrets + " -a ! -L " + kSecrets + " && rm /tmp/bait");
+}
+
+TEST_F(pppoe_config_set, PPPoEConfigSet_placesThatCannotBeWritten_keepWhatIsThere) {
+    const texts edit{"ERR pppoe_config_set (N) Failed to edit /etc/ppp/pppoe.conf"};
+    ASSERT_EQ(0, set(settings("user", "old")).result);
+    const std::string conf = read_file(kConf);
+    const std::string secrets = read_file(kSecrets);
+    shell("cp -a /etc/ppp /tmp/ppp && mount -t tmpfs tmpfs /etc/ppp && cp -a /tmp/ppp/. /etc/ppp && "
+          "mount -o remount,ro /etc/ppp");
+    const outcome got = set(settings("other", "new"));
+    EXPECT_EQ(-1, got.result);
+    EXPECT_EQ(edit, got.log);
+    EXPECT_EQ(conf, read_file(kConf));
+    EXPECT_EQ(secrets, read_file(kSecrets));
+    shell("umount /etc/ppp && rm -r /tmp/ppp");
+    for (const char *break_it : {"rm /etc/ppp/pppoe.conf && mkdir /etc/ppp/pppoe.conf", "rm -r /etc/ppp"}) {
+        shell(break_it);
+        EXPECT_EQ(edit, set(settings("other", "new")).log);
+    }
+    EXPECT_EQ("<absent>", read_file(kSecrets));
+    shell("mkdir /etc/ppp");
 }
 
 TEST_F(pppoe_config_set, PPPoEConfigSet_temporaryThatIsThere_isNotWrittenInto) {
@@ -194,8 +273,10 @@ TEST_F(pppoe_config_set, PPPoEConfigGet_whatWasStored_isReadAndStoringItChangesN
                       long_text(254),
                       long_text(255),
                       long_text(101, '\'')};
-    const texts passwords{"",      "p",       "a*b", "*",    "in side", "'quoted'",    "\"q\"",
-                          "#hash", "a\\nb\\", "%s",  "\x01", "a\tb",    long_text(30), long_text(31)};
+    const texts passwords{
+        "",         "p",           "a*b",   "*",    "in side", "'quoted'",          "\"q\"",
+        "#hash",    "a\\nb\\",     "%s",    "\x01", "a\tb",    long_text(30),       long_text(31),
+        "\xc3\xbc", "\x7f\x1b[0m", "* * *", "it's", "a\"b",    long_text(31, '\''), long_text(31, '*')};
     for (const std::string &user : users) {
         for (const std::string &password : passwords) {
             SCOPED_TRACE(user + " " + password);
@@ -207,6 +288,53 @@ TEST_F(pppoe_config_set, PPPoEConfigGet_whatWasStored_isReadAndStoringItChangesN
             EXPECT_EQ(0, set(read).result);
             EXPECT_EQ(files, read_file(kConf) + read_file(kSecrets));
         }
+    }
+}
+
+TEST_F(pppoe_config_set, PPPoEConfigGet_textsOfEveryLength_areReadAsStored) {
+    for (size_t length = 0; length <= 255; ++length) {
+        const std::string password = long_text(length % 32, 'p');
+        ASSERT_EQ(0, set(settings(long_text(length, 'u'), password)).result);
+        ASSERT_EQ(quoted(long_text(length, 'u')) + "\t*\t" + password + "\n", read_file(kSecrets)) << length;
+        EXPECT_OUTCOME(get(), {.result = 0});
+        expect_read(settings(long_text(length, 'u'), password));
+    }
+}
+
+TEST_F(pppoe_config_set, PPPoEConfigGet_quotesAroundTheBound_areCutAlikeInBothFiles) {
+    for (size_t quotes = 99; quotes <= 103; ++quotes) {
+        for (size_t others = 0; others <= 16; ++others) {
+            const std::string user = long_text(quotes, '\'') + long_text(others, 'u') + "'z";
+            const std::string expected = quoted(user);
+            ASSERT_LE(expected.size(), 511U);
+            ASSERT_EQ(0, set(settings(user, "p")).result);
+            ASSERT_EQ(expected + "\t*\tp\n", read_file(kSecrets)) << quotes << " " << others;
+            ASSERT_EQ("ETH=eth0\nDEFAULTROUTE=yes\nUSER=" + expected + "\nMTU=1492\n", read_file(kConf));
+            EXPECT_OUTCOME(get(), {.result = 0});
+            EXPECT_EQ(0U, user.find(read.szUser)) << "its beginning";
+            EXPECT_STREQ("p", read.szPassword);
+        }
+    }
+}
+
+TEST_F(pppoe_config_set, PPPoEConfigGet_blanksAroundAPassword_areNotPartOfIt) {
+    for (const char *password : {" p", "p ", "\tp\t", "  p  "}) {
+        ASSERT_EQ(0, set(settings("u", password)).result);
+        EXPECT_EQ(std::string("'u'\t*\t") + password + "\n", read_file(kSecrets)) << "as given";
+        EXPECT_OUTCOME(get(), {.result = 0});
+        EXPECT_STREQ("p", read.szPassword);
+    }
+    ASSERT_EQ(0, set(settings("u", " \t ")).result);
+    EXPECT_OUTCOME(get(), {.result = 0});
+    EXPECT_STREQ("", read.szPassword);
+}
+
+TEST_F(pppoe_config_set, PPPoEConfigGet_foreignUsers_areUnquoted) {
+    write_file(kSecrets, "me * p\n");
+    for (const char *user : {"me", "'me'", "\"me\"", "'me", "me'", "m'e'", "'m'\"e\"", "'me'\r"}) {
+        write_file(kConf, std::string("ETH=eth0\nUSER=") + user + "\nMTU=1492");
+        EXPECT_OUTCOME(get(), {.result = 0});
+        expect_read(settings("me", "p", "eth0", "1492", 0));
     }
 }
 
@@ -246,7 +374,9 @@ TEST_F(pppoe_config_set, PPPoEConfigGet_linesOfOthers_arePassedOver) {
 
 TEST_F(pppoe_config_set, PPPoEConfigGet_noLineForTheUser_isAnEmptyPassword) {
     write_file(kConf, "ETH=eth0\nUSER='me'\nMTU=1492\n");
-    for (const char *content : {"", "\n", "'you'\t*\tq\n", "'me'\tq\n", "'ME'\t*\tq\n"}) {
+    // the last ones are cut off where the password should be, or before
+    for (const char *content : {"", "\n", "'you'\t*\tq\n", "'me'\tq\n", "'ME'\t*\tq\n", "'me'\t*\t", "'me'\t*",
+                                "'me'\t", "'me'", "'me", "'", "*", "\t*\tq\n", "''\t*\tq\n"}) {
         write_file(kSecrets, content);
         EXPECT_OUTCOME(get(), {.result = 0});
         expect_read(settings("me", "", "eth0", "1492", 0));
@@ -296,5 +426,8 @@ TEST_F(pppoe_config_set, PPPoEConfigGet_fileThatCannotBeRead_fails) {
 
 TEST_F(pppoe_config_set, PPPoEConfigGet_noRecord_isLogged) {
     EXPECT_OUTCOME(rig.observe([] { return PPPoEConfigGet(nullptr); }),
-                   {.result = -1, .log = {"ERR pppoe_config_set (N) bad parameter PPPoEConf"}});
+                   {.result = -1,
+                    .code = 0xD00,
+                    .unit = "pppoe_config_set",
+                    .log = {"ERR pppoe_config_set (N) bad parameter PPPoEConf"}});
 }

@@ -63,8 +63,19 @@ TEST_F(pppoe_intf_get, KOVAPPPoeIntfGet_cache_isItsFirstLine) {
     }
 }
 
+TEST_F(pppoe_intf_get, KOVAPPPoeIntfGet_foreignCache_isCutAndThenForgotten) {
+    for (const std::string &content : {long_text(100000), std::string("p\xff\x01/..\n"), std::string("ppp7\r\n")}) {
+        write_file(kCache, content);
+        EXPECT_OUTCOME(get(), {.result = 0});
+        EXPECT_EQ(content.substr(0, content.find('\n')).substr(0, 15), name);
+        EXPECT_EQ(-1, info(ip, 16, nullptr, 0).result);
+        EXPECT_EQ("<absent>", read_file(kCache));
+    }
+}
+
 TEST_F(pppoe_intf_get, KOVAPPPoeIntfGet_emptyCache_isToldAsDetail) {
-    for (const char *content : {"", "\n", "\nppp0\n"}) {
+    for (const std::string &content :
+         {std::string(), std::string("\n"), std::string("\nppp0\n"), std::string("\0ppp0", 5)}) {
         write_file(kCache, content);
         EXPECT_OUTCOME(get(), {.result = -1, .log = {"DEBUG pppoe_intf_get:N Failed to get real pppoe interface"}});
     }
@@ -88,11 +99,15 @@ TEST_F(pppoe_intf_get, KOVAPPPoeIntfGet_cacheOfSomebodyElse_isNotBelieved) {
 }
 
 TEST_F(pppoe_intf_get, KOVAPPPoeIntfGet_toolAnswers_areCutToTheirFirstWord) {
-    for (const auto &[answer, expected] :
-         std::map<std::string, std::string>{{"ppp1 Point-to-Point", "ppp1"},
-                                            {"\t ppp1\tLink Point-to-Point\n", "ppp1"},
-                                            {"x\nPoint-to-Point\n", "Point-to-Point"},
-                                            {long_text(5000) + "\nppp1 Point-to-Point\n", "ppp1"}}) {
+    for (const auto &[answer, expected] : std::map<std::string, std::string>{
+             {"ppp1 Point-to-Point", "ppp1"},
+             {"\t ppp1\tLink Point-to-Point\n", "ppp1"},
+             {"x\nPoint-to-Point\n", "Point-to-Point"},
+             {long_text(5000) + "\nppp1 Point-to-Point\n", "ppp1"},
+             {"ppp1 " + long_text(5000) + " Point-to-Point\nppp2 Point-to-Point", "ppp1"},
+             {"ppp1\r Point-to-Point\r\n", "ppp1"},
+             {"\x01\xff\nppp1\t\xff Point-to-Point", "ppp1"},
+             {"../../etc Point-to-Point", "../../etc"}}) {
         shell("rm -f " + kCache);
         rig.answer(kTool, 0, answer);
         EXPECT_OUTCOME(get(), {.result = 0, .commands = {kTool}});

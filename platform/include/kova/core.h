@@ -207,7 +207,7 @@ int KLIBCFileUnlockByFile(int fd);
  * SA_NOCLDWAIT has that put aside while a program runs, so that the status is known. With trace_commands="yes" in
  * /etc/kova/platform.conf every program is logged at LOG_DEBUG as "run: /sbin/ip link ... -> 0".
  * @param szProgram  absolute path
- * @param szArg1..4  arguments, the first NULL ends them
+ * @param szArg1, szArg2, szArg3, szArg4  arguments, the first NULL ends them
  * @return exit status; 127 with 0x2A00 and errno when it cannot be executed; 128 + signal when killed; -1 with 0xD00,
  *         0x200 or 0x2A00 (errno says why) when no process could be made or another part of the caller's process took
  *         its status

@@ -21,12 +21,24 @@ int KLIBServiceReload(const char *szService);
 int KLIBServiceIsRunning(const char *szService);
 /** Stops a job ("pppoerelay" ...). @return 0, also when it does not run; -1 with 0xD00 or 0x2A00 */
 int KLIBServicectlJobStop(const char *szJob);
+/** Whether a service is configured to run. */
+enum {
+    KLIB_SERVICE_RUN = 1,
+    KLIB_SERVICE_DO_NOT_RUN = 2,
+};
+
 /**
  * Reads whether a service is configured to run: key "run" ("yes") of /etc/kova/service/<name>.conf.
- * @param pRun  receives 1 or 0
+ * @param pRun  receives KLIB_SERVICE_RUN or KLIB_SERVICE_DO_NOT_RUN
  * @return 0; -1 with 0xD00, or 0x900 when the file is missing
  */
 int KLIBServicecfgRunKeyGet(const char *szService, int *pRun);
+/**
+ * Configures whether a service is to run, without starting or stopping it.
+ * @param nRun  KLIB_SERVICE_RUN or KLIB_SERVICE_DO_NOT_RUN
+ * @return 0; -1 with 0xD00, or as KLIBCFileSetKeyValue
+ */
+int KLIBServicecfgRunKeySet(const char *szService, int nRun);
 
 #ifdef __cplusplus
 }

@@ -4,6 +4,7 @@
 #include <climits>
 #include <cstdio>
 #include <cstring>
+#include <sys/stat.h>
 
 #include "common/report.h"
 
@@ -34,6 +35,19 @@ int run_script(const char *service, const char *verb) {
     return KLIBCExec(path, verb, nullptr, nullptr, nullptr);
 }
 
+constexpr const char *kRunKeyDirectory = "/etc/kova/service";
+constexpr const char *kRunKey = "run";
+
+using run_key_path = char[PATH_MAX];
+
+/** @return false for a name that is none */
+bool make_run_key_path(const char *service, run_key_path &path) {
+    if (is_bad_name(service))
+        return false;
+    snprintf(path, sizeof path, "%s/%s.conf", kRunKeyDirectory, service);
+    return true;
+}
+
 } // namespace
 
 int KLIBServiceReload(const char *szService) {
@@ -57,14 +71,20 @@ int KLIBServicectlJobStop(const char *szJob) {
 }
 
 int KLIBServicecfgRunKeyGet(const char *szService, int *pRun) {
-    if (is_bad_name(szService) || pRun == nullptr)
+    run_key_path path;
+    if (!make_run_key_path(szService, path) || pRun == nullptr)
         return fail(HERE, kErrArgument);
-
-    char path[PATH_MAX];
-    snprintf(path, sizeof path, "/etc/kova/service/%s.conf", szService);
-    const int result = KLIBCFileCheckKeyValue(path, "run", "yes", 0);
+    const int result = KLIBCFileCheckKeyValue(path, kRunKey, "yes", 0);
     if (result < 0)
         return -1;
-    *pRun = result;
+    *pRun = result == 1 ? KLIB_SERVICE_RUN : KLIB_SERVICE_DO_NOT_RUN;
     return 0;
+}
+
+int KLIBServicecfgRunKeySet(const char *szService, int nRun) {
+    run_key_path path;
+    if (!make_run_key_path(szService, path) || (nRun != KLIB_SERVICE_RUN && nRun != KLIB_SERVICE_DO_NOT_RUN))
+        return fail(HERE, kErrArgument);
+    mkdir(kRunKeyDirectory, 0755);
+    return KLIBCFileSetKeyValue(path, kRunKey, nRun == KLIB_SERVICE_RUN ? "yes" : "no", "%s=%s\n");
 }
