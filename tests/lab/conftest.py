@@ -5,6 +5,7 @@ import contextlib
 import json
 import os
 import pathlib
+import pty
 import re
 import shutil
 import socket
@@ -74,6 +75,22 @@ def complaint(*words, status):
     assert done.stdout == ""
     assert re.fullmatch(r"kovanet: [^\n]+\n", done.stderr), done.stderr
     return done.stderr.removeprefix("kovanet: ").rstrip("\n")
+
+
+def asked(*words, answer, question="[y/N] "):
+    """Runs kovanet on a terminal and answers its question; gives its status and what it says there."""
+    master, slave = pty.openpty()
+    with subprocess.Popen([KOVANET, *words], stdin=slave, stdout=subprocess.PIPE, stderr=slave, text=True) as process:
+        os.close(slave)
+        said = ""
+        with contextlib.suppress(OSError):  # the terminal is gone when the command is
+            while chunk := os.read(master, 4096):
+                said += chunk.decode()
+                if said.endswith(question):
+                    os.write(master, answer)
+        os.close(master)
+        assert process.stdout.read() == ""
+    return process.returncode, said.replace("\r\n", "\n")
 
 
 def documented(section):

@@ -46,6 +46,20 @@ class BridgeInfo(ctypes.Structure):
     _fields_ = [("nType", ctypes.c_int32), ("szIfname", ctypes.c_char * 16), ("szPeer", ctypes.c_char * 16)]
 
 
+class TopologyInfo(ctypes.Structure):
+    _fields_ = [("nTopology", ctypes.c_int), ("szName", ctypes.c_char * 64), ("szIfname", ctypes.c_char * 16),
+                ("blClient", ctypes.c_int), ("nIFInfoRow", ctypes.c_int)]
+
+
+class PppoeConf(ctypes.Structure):
+    _fields_ = [("szIfname", ctypes.c_char * 16), ("szUser", ctypes.c_char * 256), ("szPassword", ctypes.c_char * 32),
+                ("szMTU", ctypes.c_char * 8), ("blDefaultRoute", ctypes.c_uint32)]
+
+
+class PppoeRelayConf(ctypes.Structure):
+    _fields_ = [("blEnabled", ctypes.c_uint32), ("szServer", ctypes.c_char * 16)]
+
+
 DHCP, STATIC = 0, 1
 library = ctypes.CDLL("libkovanetsdk.so.6")
 core = ctypes.CDLL("libkovacore.so.6")

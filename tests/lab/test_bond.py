@@ -12,7 +12,7 @@ from sdk import STATIC, Bond, card, library, register
 
 SCRIPTS = pathlib.Path("/etc/sysconfig/network-scripts")
 LINKS = ("lan0", "lan1", "lan2")
-UNKNOWN, ALB, LACP, XOR, BACKUP, ROUND_ROBIN = range(6)
+UNKNOWN, ALB, LACP, XOR, BACKUP, ROUND_ROBIN, _, BALANCE_SLB = range(8)
 # mode: the kernel's name and number, what is added to the options, and the partner that goes with it
 KERNEL_MODES = {
     ALB: ("balance-alb 6", "", "bridge"),
@@ -175,6 +175,19 @@ def test_a_bond_changes_mode_and_members_and_keeps_its_vlan(partner):
     wait_for_partner()
 
 
+def test_a_vlan_above_a_bond_gives_its_address_back(partner):
+    partner("bridge", LINKS)
+    assert set_bond(bond(BACKUP, LINKS)) == 0, register()
+    before = keys("bond0")
+    static = card(STATIC, "bond0", "192.168.90.5", "255.255.255.0")
+    assert library.KLIBNetVlanCreate(b"bond0", 20, ctypes.byref(static)) == 0, register()
+    assert library.KLIBNetVlanRemove(b"bond0.20") == 0, register()
+    assert keys("bond0") == before and not path("bond0.20").exists()
+    assert (of_kernel("mode"), of_kernel("slaves")) == ("active-backup 1", "lan0 lan1 lan2")
+    assert addresses("bond0") == ["192.168.90.5/24"]
+    wait_for_partner()
+
+
 def test_a_bond_takes_over_the_lease_of_its_first_member(partner, tmp_path):
     partner("bridge")
     with DhcpServer("uplink", "192.168.60", folder=tmp_path):
@@ -187,6 +200,59 @@ def test_a_bond_takes_over_the_lease_of_its_first_member(partner, tmp_path):
         assert set_bond(bond(UNKNOWN)) == 0, register()
         assert wait_for(lambda: addresses("lan0"), 60, "the member's lease") == leased
         run("/etc/rc.network", "stop", "lan0")
+
+
+def test_a_bond_that_cannot_be_deleted_runs_on(partner):
+    partner("bridge")
+    assert set_bond(bond(BACKUP)) == 0, register()
+    files = {link: keys(link) for link in ("bond0", "lan0")}
+    kept = path("lan1").rename(SCRIPTS.parent / "kept")
+    path("lan1").mkdir()
+    try:
+        assert set_bond(bond(UNKNOWN)) == -1
+    finally:
+        path("lan1").rmdir()
+        kept.rename(path("lan1"))
+    assert {link: keys(link) for link in files} == files
+    assert of_kernel("slaves") == "lan0", "without the file of the other"
+    assert addresses("bond0") == ["192.168.90.5/24"]
+    wait_for_partner()
+    run("/etc/rc.network", "restart", "bond0")
+    assert of_kernel("slaves") == "lan0 lan1"
+
+
+@pytest.fixture
+def switch_bond():
+    """What the virtual switch leaves of a bond of lan0 and lan1: a device by its name, and the file."""
+    run("ip", "link", "add", "ovs_bond0", "type", "bridge")
+    path("ovs_bond0").write_text('DEVICE=ovs_bond0\nSLAVE_LIST="lan1 lan0 gone0"\nBOND_MODE="balance-slb"\n')
+    yield b"ovs_bond0"
+    run("ip", "link", "del", "ovs_bond0")
+    path("ovs_bond0").unlink()
+
+
+def test_a_bond_of_the_switch_is_what_its_file_says_of_links_that_are_there(switch_bond):
+    mtus = {link: pathlib.Path(f"/sys/class/net/{link}/mtu") for link in ("lan0", "lan1")}
+    found = get_bond("ovs_bond0")
+    assert (found.mode, found.members(), found.blNoPartner) == (BALANCE_SLB, ["lan0", "lan1"], 0)
+
+    assert library.KOVANetSetMTUEth(b"1400", switch_bond) == 0, register()
+    assert [mtu.read_text() for mtu in mtus.values()] == ["1400\n", "1400\n"]
+    mtus["lan1"].write_text("1500")
+    assert library.KOVAGetMTUSetting(switch_bond) == 1500
+    mtus["lan0"].write_text("1500")
+
+    wait_for(lambda: library.KOVANetIfIsLink(switch_bond) == 1, 30, "a link")
+    for link in ("lan0", "lan1"):
+        assert library.KOVANetIfIsLink(switch_bond) == 1
+        on_other_side("ip", "link", "set", link, "down")
+        wait_for(lambda: library.KOVANetIfIsLink(link.encode()) == 0, 30, f"{link} to lose its link")
+    assert library.KOVANetIfIsLink(switch_bond) == 0
+    for link in ("lan0", "lan1"):
+        on_other_side("ip", "link", "set", link, "up")
+
+    path("ovs_bond0").write_text('SLAVE_LIST="lan0 lan1"\n')
+    assert library.KOVANetLinkAggrGet(switch_bond, ctypes.byref(Bond())) == 1, "a bond, but which"
 
 
 @pytest.mark.parametrize("members", [(), ("lan0",), ("lan0", "")])

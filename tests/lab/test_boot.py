@@ -86,12 +86,12 @@ def test_boot_and_shutdown(files):
 def test_what_is_wrong_costs_nothing_else(files, keep, system_log):
     for name, text in {"gone0": STATIC + "1.2.3.4\n", "lan0.tmp1700000000": "MASTER=bond9\n", "lan2.saved": "TYPE=bridge\n",
                        "bond1": 'BONDING_OPTS="mode=77"\nONBOOT=yes\n', "lan1.9": "VLAN_ROW_DEVICE=gone0\nVLAN_ID=9\n"
-                       "ONBOOT=yes\n", "lan2.9999": "VLAN_ROW_DEVICE=lan2\nVLAN_ID=9999\nONBOOT=yes\n"}.items():  # fmt: skip
+                       "ONBOOT=yes\n", "lan2.4095": "VLAN_ROW_DEVICE=lan2\nVLAN_ID=4095\nONBOOT=yes\n"}.items():  # fmt: skip
         keep(SCRIPTS / f"ifcfg-{name}").write_text(text)
     (keep(SCRIPTS / "ifcfg-noise")).write_bytes(b"\xff\x00\nONBOOT=yes\x00\nMASTER")
     told = run("/etc/rc.network", "start", status=1).stderr
     for message in ("gone0: there is no such interface", "bond1: cannot make a bond with mode=77",
-                    'lan1.9: no row device "gone0"', "lan2.9999: cannot make the VLAN"):  # fmt: skip
+                    'lan1.9: no row device "gone0"', "lan2.4095: cannot make the VLAN"):  # fmt: skip
         assert message in told
         wait_for(lambda message=message: system_log.holds(message), what="the message in the system log")
     assert links() == WANTED

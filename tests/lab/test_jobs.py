@@ -17,15 +17,16 @@ STATE = pathlib.Path("/run/kova/jobs")
 
 @pytest.fixture
 def make_job(tmp_path):
-    """make_job(name, run=..., check=..., clean=...): a job of shell commands that notes the verbs it was run with."""
+    """make_job(name, run=..., check=..., clean=..., ready=...): a job of shell commands that notes the verbs it was run with."""
     made = []
 
-    def make(name, run_as="exec sleep 1000", check=":", clean=":"):
+    def make(name, run_as="exec sleep 1000", check=":", clean=":", ready=":"):
         notes = tmp_path / f"{name}.notes"
         job = JOBS / name
         job.write_text(
             f"#!/bin/sh\necho $1 >> {notes}\n"
-            f'case $1 in\nrun) {run_as} ;;\ncheck) {check} ;;\nclean) {clean} ;;\nesac\n'
+            f'case $1 in\nrun) {run_as} ;;\ncheck) {check} ;;\nclean) {clean} ;;\n'
+            f"ready) {ready} ;;\nesac\n"
         )
         job.chmod(0o755)
         made.append(job)
@@ -115,6 +116,20 @@ def test_second_start_is_the_same_job(make_job):
     assert pid_of("single,A=1,B=2") == pid
     wait_for(lambda: "run" in notes.read_text())
     assert notes.read_text().split().count("run") == 1
+
+
+def test_start_returns_when_the_job_is_ready(make_job, tmp_path):
+    sign = tmp_path / "sign"
+    make_job("slow", run_as=f"sleep 0.5; touch {sign}; exec sleep 1000", ready=f"until [ -e {sign} ]; do sleep 0.02; done")
+    run("/sbin/start", "slow")
+    assert sign.exists() and is_alive(pid_of("slow"))
+
+
+def test_job_that_does_not_become_ready_is_ended(make_job):
+    notes = make_job("never", ready="echo no sign >&2; exit 1")
+    assert "no sign" in run("/sbin/start", "never", status=1).stderr
+    assert not record_of("never").exists() and not processes("jobs/never")
+    assert notes.read_text().split()[-1] == "clean"
 
 
 def test_other_keys_are_another_instance(make_job):

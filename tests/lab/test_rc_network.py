@@ -267,8 +267,10 @@ def test_bond_of_the_virtual_switch_is_refused(name, text, verb, keep, system_lo
         ("kx12", "BRIDGE=eth0\n", 'kx12: no bond or bridge "eth0" to belong to'),
         ("kx12", "BRIDGE=../eth0\n", 'kx12: no bond or bridge "../eth0" to belong to'),
         ("eth0.10", "VLAN_ROW_DEVICE=gone0\nVLAN_ID=10\n", 'eth0.10: no row device "gone0"'),
-        ("eth0.10", "VLAN_ROW_DEVICE=eth0\nVLAN_ID=x\n", 'eth0.10: VLAN_ID "x" is not a number'),
-        ("eth0.10", "VLAN_ROW_DEVICE=eth0\n", 'eth0.10: VLAN_ID "" is not a number'),
+        ("eth0.10", "VLAN_ROW_DEVICE=eth0\nVLAN_ID=x\n", 'eth0.10: VLAN_ID "x" is not a VLAN id'),
+        ("eth0.10", "VLAN_ROW_DEVICE=eth0\nVLAN_ID=-1\n", 'eth0.10: VLAN_ID "-1" is not a VLAN id'),
+        ("eth0.10", "VLAN_ROW_DEVICE=eth0\nVLAN_ID=010\n", 'eth0.10: VLAN_ID "010" is not a VLAN id'),
+        ("eth0.10", "VLAN_ROW_DEVICE=eth0\n", 'eth0.10: VLAN_ID "" is not a VLAN id'),
     ],
 )
 def test_what_cannot_be_made_is_told_and_the_others_go_on(name, text, message, keep, system_log):

@@ -173,10 +173,11 @@ def test_where_the_kernel_cannot_the_file_follows_all_the_same_and_that_is_told(
 @pytest.mark.parametrize("path", CHANGES)
 def test_a_name_that_is_not_there_yet_changes_the_file(path):
     path.write_text("eth0 1\n" if path == RATES else "eth0 ping 1\n" if path == LIMITS else "eth0 drop icmp\n")
-    path.chmod(0o644)
+    path.chmod(0o600)
     program, verb = CHANGES[path]
     run(program, verb, "eth0", "eth0.10")
     assert path.read_text().startswith("eth0.10 ")
+    assert path.stat().st_mode & 0o777 == 0o600
     run(program, verb, "gone0", "gone1")
     path.unlink()
     run(program, verb, "eth0", "eth0.10")

@@ -100,6 +100,32 @@ def test_the_address_moves_to_the_vlan_and_back(keep):
     assert {path.name for path in SCRIPTS.iterdir()} == {"ifcfg-eth0"}
 
 
+def ipv6_addresses(link):
+    """The IPv6 addresses of an interface, but for the one that belongs to its link."""
+    return [word for word in run("ip", "-6", "-o", "addr", "show", "dev", link, "scope", "global").stdout.split()
+            if "/" in word]  # fmt: skip
+
+
+def test_the_ipv6_settings_move_to_the_vlan_and_back():
+    with_ipv6 = STATIC_ETH0.replace("IPV6INIT=auto\n", "IPV6INIT=static\nIPV6ADDR=2001:db8:50::5\nIPV6PREFIXLENG=64\n"
+                                    "IPV6_DEFAULTGW=2001:db8:50::1\nIPV6DNS=2001:db8:50::53\n")  # fmt: skip
+    ETH0.write_text(with_ipv6)
+    run("/etc/rc.network", "start", "eth0")
+    assert ipv6_addresses("eth0") == ["2001:db8:50::5/64"]
+
+    assert create() == 0, register()
+    assert (ipv6_addresses("eth0"), ipv6_addresses("eth0.10")) == ([], ["2001:db8:50::5/64"])
+    assert "default via 2001:db8:50::1 dev eth0.10 " in run("ip", "-6", "route", "show", "default").stdout
+    assert VLAN.read_text() == VLAN_FILE.replace("IPV6INIT=auto\n", with_ipv6[with_ipv6.index("IPV6INIT") :])
+    assert ETH0.read_text() == ("DEVICE=eth0\nONBOOT=yes\nIPV6ADDR=2001:db8:50::5\nIPV6PREFIXLENG=64\n"
+                                "BOOTPROTO=none\nIPV6INIT=off\n")  # fmt: skip
+
+    assert remove() == 0, register()
+    assert ipv6_addresses("eth0") == ["2001:db8:50::5/64"]
+    assert "default via 2001:db8:50::1 dev eth0 " in run("ip", "-6", "route", "show", "default").stdout
+    assert ETH0.read_text() == with_ipv6
+
+
 def test_a_vlan_gets_a_lease_of_its_own_network(tmp_path):
     with DhcpServer("eth0.10", "192.168.70", folder=tmp_path):
         assert create(source=DHCP) == 0, register()

@@ -68,7 +68,8 @@ make_vlan() {
     row_device=$(setting "$1" VLAN_ROW_DEVICE)
     vlan_id=$(setting "$1" VLAN_ID)
     is_ifname "$row_device" && [ -e "$net/$row_device" ] || fail "$1: no row device \"$row_device\"" || return
-    case $vlan_id in '' | *[!0-9]*) fail "$1: VLAN_ID \"$vlan_id\" is not a number" || return ;; esac
+    # a leading zero is read as octal
+    case $vlan_id in '' | *[!0-9]* | 0*) fail "$1: VLAN_ID \"$vlan_id\" is not a VLAN id" || return ;; esac
     may_make is_vlan "$1" || return
     if ! is_vlan_of "$1" "$row_device" "$vlan_id"; then
         remove_link is_vlan "$1" &&

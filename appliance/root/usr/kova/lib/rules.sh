@@ -18,9 +18,10 @@ rules_of() {
     done <"$1"
 }
 
-# rename_rules FILE OLD NEW: gives the rules of an interface to another
+# rename_rules FILE OLD NEW: gives the rules of an interface to another; who may read them stays
 rename_rules() {
     [ -n "$(rules_of "$1" "$2")" ] || return 0
+    mode=$(stat -L -c %a "$1")
     # shellcheck disable=SC2094 # the file is replaced when it has been read
     while IFS= read -r line || [ -n "$line" ]; do
         read -r interface rule <<END
@@ -28,7 +29,7 @@ $line
 END
         [ "$interface" != "$2" ] || line="$3 $rule"
         printf '%s\n' "$line"
-    done <"$1" | replace_file "$1" || fail "cannot write $1"
+    done <"$1" | replace_file "$1" && chmod "$mode" "$1" || fail "cannot write $1"
 }
 
 # load_each IF...: load of those that are there; the others have their rules loaded when they come
