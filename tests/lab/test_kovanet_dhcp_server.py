@@ -678,3 +678,16 @@ def test_a_mistyped_word_gets_a_suggestion():
     for words, meant in (("sbnet list", "subnet"), ("subnet lits", "list"), ("option delete", None), ("vendor sho", "show")):
         text = refused(*words.split(), status=USAGE)
         assert (f"did you mean {meant}?" in text) if meant else ("did you mean" not in text)
+
+
+def test_on_and_off_switch_the_whole_service():
+    server(*SUBNET)
+    server("enable", "eth0")
+    assert not running()
+    server("on")
+    assert running() and data("dhcp-server", "status")["service"] is True
+    assert (FILES / "dhcpd.info").read_text() == ON
+    server("off", "--no-restart")
+    assert running() and data("dhcp-server", "status")["service"] is False
+    server("off")
+    assert not running()

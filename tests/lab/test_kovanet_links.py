@@ -2,16 +2,12 @@
 # needs: vlan bonding bridge dummy
 """kovanet vlan, bond, bridge and mtu, compared with what the kernel, the files and iproute2 say."""
 
-import contextlib
 import ctypes
-import os
 import pathlib
-import pty
 import re
-import subprocess
 
 import pytest
-from conftest import on_other_side, run
+from conftest import asked, on_other_side, run
 from sdk import core
 from test_kovanet import (CALL_FAILED, DONE, KOVANET, NO, NO_PERMISSION, NOT_FOUND, SCRIPTS, USAGE, complaint, data,
                           default_gateway, documented, everything, interface_file, ip, kernel_addresses, keys, keys_of,
@@ -70,22 +66,6 @@ def cards():
     KOVAINFO.write_bytes(kovainfo)
     for path in SCRIPTS.glob("ifcfg-*"):
         path.unlink()
-
-
-def asked(*words, answer):
-    """Runs a command on a terminal and answers its question; gives its status and what it says there."""
-    master, slave = pty.openpty()
-    with subprocess.Popen([KOVANET, *words], stdin=slave, stdout=subprocess.PIPE, stderr=slave, text=True) as process:
-        os.close(slave)
-        said = ""
-        with contextlib.suppress(OSError):  # the terminal is gone when the command is
-            while chunk := os.read(master, 4096):
-                said += chunk.decode()
-                if said.endswith("[y/N] "):
-                    os.write(master, answer)
-        os.close(master)
-        assert process.stdout.read() == ""
-    return process.returncode, said.replace("\r\n", "\n")
 
 
 def state_of(name):
@@ -161,6 +141,9 @@ BAD = {
     "vlan create lan0 10 dhcp": "no terminal to ask on", "vlan remove row0.10 more": USAGE,
     "vlan create lan0 0 dhcp": "1 to 4094", "vlan create lan0 4095 dhcp": "1 to 4094",
     "vlan create lan0 10x dhcp": "1 to 4094", "vlan create lan0 99999999999 dhcp": "1 to 4094",
+    "vlan create lan0 -1 dhcp": "1 to 4094", "vlan create lan0 4096 dhcp": "1 to 4094",
+    "vlan create fifteen-letters 1 dhcp": "1 to 15 characters", "vlan create lan0 4094 dhcp": "no terminal to ask on",
+    "vlan remove fifteen-letters": NOT_FOUND, "vlan remove sixteen-letters1": "1 to 15 characters",
     "vlan create a/b 10 dhcp": "holds no", "vlan create sixteen-letters1 10 dhcp": "1 to 15 characters",
     "vlan create thirteen-lett 10 dhcp": "1 to 15 characters", "vlan create lo 10 dhcp": "not a network card",
     "vlan create row0 20 dhcp": "has the VLAN row0.10 already", "vlan create row0.10 20 dhcp": "is a VLAN",
@@ -203,6 +186,8 @@ BAD = {
 
     "mtu": USAGE, "mtu shw": "did you mean show?", "mtu set lan0": USAGE, "mtu set lan0 67": "68 to 65535",
     "mtu set lan0 65536": "68 to 65535", "mtu set lan0 -1": "68 to 65535", "mtu set lan0 1500b": "68 to 65535",
+    "mtu set lan0 0": "68 to 65535", "mtu set lan0 99999999999999999999": "68 to 65535", "mtu set lan0 ''": "68 to 65535",
+    "mtu set fifteen-letters 1500": NOT_FOUND, "mtu show sixteen-letters1": "1 to 15 characters",
     "mtu set nope 1500": NOT_FOUND, "mtu show nope": NOT_FOUND, "mtu set lo 1500": "loopback",
     "mtu set a/b 1500": "holds no", "mtu set lan0 1500": "no terminal to ask on",
 }  # fmt: skip
@@ -325,9 +310,18 @@ def test_mtu_that_the_kernel_refuses_is_not_kept():
     run("ip", "link", "add", "link", "lan0", "name", "twin0", "type", "macvlan")
     run("ip", "link", "set", "twin0", "up")
     try:
+        before = KOVAINFO.read_text()
         text = complaint("mtu", "set", "twin0", "9000", "--yes", status=CALL_FAILED)
         assert text.startswith("cannot set the MTU of twin0 to 9000: NET_ERR_SYSCALL (0x8100) in net_set_mtu_eth")
         assert data("mtu", "show", "twin0") == [{"name": "twin0", "mtu": 1500, "configured_mtu": 1500}]
+        assert KOVAINFO.read_text() == before, "no setting is made where there was none"
+        KOVAINFO.write_text('twin0_mtu="1400"\n')
+        complaint("mtu", "set", "twin0", "9000", "--yes", status=CALL_FAILED)
+        assert KOVAINFO.read_text() == 'twin0_mtu="1400"\n'
+        run("ip", "link", "add", "link", "twin0", "name", "twin0.5", "type", "vlan", "id", "5")
+        run("ip", "link", "set", "twin0.5", "up")
+        complaint("mtu", "set", "twin0.5", "9000", "--yes", status=CALL_FAILED)
+        assert KOVAINFO.read_text() == 'twin0_mtu="1400"\n'
     finally:
         run("ip", "link", "del", "twin0")
 

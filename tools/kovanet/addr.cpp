@@ -2,12 +2,11 @@
 #include "errors.h"
 #include "interfaces.h"
 #include "objects.h"
+#include "records.h"
 #include "rules.h"
 
 #include <algorithm>
-#include <arpa/inet.h>
 #include <charconv>
-#include <kova/core.h>
 #include <kovanetsdk/addr.h>
 #include <kovanetsdk/iface.h>
 #include <kovanetsdk/ipv6.h>
@@ -50,25 +49,6 @@ const char *scope_word(uint32_t scope) {
     }
 }
 
-std::vector<KOVAV6IP> ipv6_addresses(const std::string &name) {
-    if (KLIBCFileExist("/proc/net/if_inet6") == 0) {
-        return {}; // a kernel without IPv6
-    }
-    std::vector<KOVAV6IP> addresses(16);
-    for (;;) {
-        clear_error();
-        const int count = KOVALnxV6IPGet(name.c_str(), addresses.data(), static_cast<int>(addresses.size()));
-        if (count < 0) {
-            call_failed("cannot read the IPv6 addresses of " + name);
-        }
-        const bool all_fit = static_cast<size_t>(count) <= addresses.size();
-        addresses.resize(static_cast<size_t>(count));
-        if (all_fit) {
-            return addresses;
-        }
-    }
-}
-
 json row_of(const std::string &name, int family, const char *address, int prefix) {
     json row;
     row["interface"] = name;
@@ -76,22 +56,6 @@ json row_of(const std::string &name, int family, const char *address, int prefix
     row["address"] = address;
     row["prefix"] = known_number(prefix, 0);
     return row;
-}
-
-void add_rows(json &rows, const IFINFO &info) {
-    const std::string name = info.szIfname;
-    if (*info.szIP != '\0') {
-        json row = row_of(name, 4, info.szIP, KOVANetNetmaskToPrefix(info.szMask));
-        row["scope"] = json();
-        row["flags"] = json::array();
-        rows.push_back(row);
-    }
-    for (const KOVAV6IP &address : ipv6_addresses(name)) {
-        json row = row_of(name, 6, address.szIP, static_cast<int>(address.nPrefixLength));
-        row["scope"] = scope_word(address.nScope);
-        row["flags"] = ipv6_flags(address.nFlags);
-        rows.push_back(row);
-    }
 }
 
 std::string flag_list(const json &row) {
@@ -112,12 +76,10 @@ constexpr column kColumns[] = {
 
 void list(const std::optional<std::string> &name, bool as_json) {
     json rows = json::array();
-    if (name) {
-        add_rows(rows, require_interface(*name));
-    } else {
-        for (const IFINFO &info : all_interfaces()) {
-            add_rows(rows, info);
-        }
+    const std::vector<IFINFO> asked = name ? std::vector{require_interface(*name)} : all_interfaces();
+    for (const IFINFO &info : asked) {
+        const json found = address_rows(info);
+        rows.insert(rows.end(), found.begin(), found.end());
     }
     if (as_json) {
         print_json(rows);
@@ -142,13 +104,6 @@ interface_address checked(const std::string &given) {
     int prefix = 0;
     std::from_chars(given.data() + slash + 1, given.data() + given.size(), prefix);
     return {"-6", address, prefix};
-}
-
-bool is_same_ipv6(const std::string &one, const char *other) {
-    in6_addr first{};
-    in6_addr second{};
-    return inet_pton(AF_INET6, one.c_str(), &first) == 1 && inet_pton(AF_INET6, other, &second) == 1 &&
-           IN6_ARE_ADDR_EQUAL(&first, &second);
 }
 
 /** Whether the library lists the address on the interface; of several IPv4 addresses it knows the first. */
@@ -205,6 +160,24 @@ struct addr_words {
 };
 
 } // namespace
+
+json address_rows(const IFINFO &info) {
+    json rows = json::array();
+    const std::string name = info.szIfname;
+    if (*info.szIP != '\0') {
+        json row = row_of(name, 4, info.szIP, KOVANetNetmaskToPrefix(info.szMask));
+        row["scope"] = json();
+        row["flags"] = json::array();
+        rows.push_back(row);
+    }
+    for (const KOVAV6IP &address : ipv6_addresses(name)) {
+        json row = row_of(name, 6, address.szIP, static_cast<int>(address.nPrefixLength));
+        row["scope"] = scope_word(address.nScope);
+        row["flags"] = ipv6_flags(address.nFlags);
+        rows.push_back(row);
+    }
+    return rows;
+}
 
 void add_addr(CLI::App &object, const global_options &options) {
     auto &words = words_of<addr_words>();

@@ -20,30 +20,6 @@ using names = std::vector<std::string>;
 
 // ---- what there is
 
-/** A bond as the library reads it. */
-struct bond_record {
-    KOVALINKAGGROPT opt;
-    bool is_bond; /**< it has members, or is a bond of the virtual switch that cannot be read whole */
-};
-
-bond_record read_bond(const std::string &name) {
-    KOVALINKAGGROPT opt{};
-    clear_error();
-    const int result = KOVANetLinkAggrGet(name.c_str(), &opt);
-    if (result < 0) {
-        call_failed("cannot read bond " + name);
-    }
-    return {opt, result > 0 || opt.cSlaves > 0};
-}
-
-names members_of(const KOVALINKAGGROPT &opt) {
-    names members;
-    for (int i = 0; i < opt.cSlaves; ++i) {
-        members.emplace_back(opt.aszSlaves[i]);
-    }
-    return members;
-}
-
 std::string joined(const names &all) {
     std::string text;
     for (const std::string &name : all) {
@@ -92,9 +68,8 @@ constexpr column kShowColumns[] = {
 void list(bool as_json) {
     json rows = json::array();
     for (const IFINFO &info : all_interfaces()) {
-        const bond_record bond = read_bond(info.szIfname);
-        if (bond.is_bond) {
-            rows.push_back(describe(bond.opt));
+        if (const std::optional<KOVALINKAGGROPT> bond = find_bond(info.szIfname)) {
+            rows.push_back(describe(*bond));
         }
     }
     if (as_json) {
@@ -106,11 +81,11 @@ void list(bool as_json) {
 
 KOVALINKAGGROPT require_bond(const std::string &name) {
     require_interface(name);
-    const bond_record bond = read_bond(name);
-    if (!bond.is_bond) {
+    const std::optional<KOVALINKAGGROPT> bond = find_bond(name);
+    if (!bond) {
         throw failure{kNotFound, name + " is no bond with members; see kovanet bond list"};
     }
-    return bond.opt;
+    return *bond;
 }
 
 void show(const std::string &name, bool as_json) {
@@ -244,7 +219,7 @@ void set_bond(KOVALINKAGGROPT wanted, const std::string &what) {
 
 /** The library does not look at what the network script makes of the files. */
 void require_in_kernel(const KOVALINKAGGROPT &wanted) {
-    const KOVALINKAGGROPT now = read_bond(wanted.szName).opt;
+    const KOVALINKAGGROPT now = find_bond(wanted.szName).value_or(KOVALINKAGGROPT{});
     if (now.mode != wanted.mode || members_of(now) != members_of(wanted)) {
         throw failure{kCallFailed, std::string("the files of ") + wanted.szName +
                                        " are written, but the kernel has another bond or none; see what "
@@ -259,7 +234,7 @@ KOVALINKAGGROPT checked_new(const bond_words &words) {
     require("bond name \"" + words.name + "\"", refuse_bond_name(words.name));
     const int mode = mode_of(words.mode);
     const std::optional<IFINFO> there = find_interface(words.name);
-    if (there && read_bond(words.name).is_bond) {
+    if (there && find_bond(words.name)) {
         throw failure{kNo, "there is a bond " + words.name + " already; to change it: kovanet bond change"};
     }
     if (there && (there->nFlags & IFF_MASTER) == 0) {
@@ -403,7 +378,7 @@ void remove(const bond_words &words) {
     const step_note note{"deleting " + words.name + ", this takes a while"};
     set_bond(record_of(words.name, KOVA_LINK_AGGR_UNKNOWN, {}), "delete " + words.name);
     move_dhcp_server(false, words.name, members);
-    if (read_bond(words.name).is_bond) {
+    if (find_bond(words.name)) {
         throw failure{kCallFailed, "the file of " + words.name +
                                        " is gone, but the kernel still has the bond; see what "
                                        "/etc/rc.network restart " +

@@ -15,24 +15,16 @@ namespace {
 // by KLIB_BRIDGE_...
 constexpr const char *kRoles[] = {nullptr, "none", "master", "local-lan", "slave"};
 
+} // namespace
+
 json role_word(int role) {
     return kRoles[role] == nullptr ? json() : json(kRoles[role]);
 }
 
+namespace {
+
 bool is_bridge(int role) {
     return role == KLIB_BRIDGE_MASTER || role == KLIB_BRIDGE_LOCAL_LAN;
-}
-
-std::vector<std::string> ports_of(const std::string &name) {
-    if (KLIBNetBridgeIfIsMaster(name.c_str()) != 1) {
-        return {};
-    }
-    const owned_list ports = make_list();
-    clear_error();
-    if (KLIBNetBridgeSlaveEnum(name.c_str(), ports.get()) < 0) {
-        call_failed("cannot read the ports of " + name);
-    }
-    return texts_of(ports.get());
 }
 
 /** The part that the file of an interface gives it, of role 0 without a file. */

@@ -1,6 +1,7 @@
 #include "composition.h"
 
 #include "errors.h"
+#include "lists.h"
 
 #include <cstdio>
 #include <kova/core.h>
@@ -55,6 +56,32 @@ std::optional<VLANINFO> find_vlan_on(const std::string &row_device) {
         }
     }
     return std::nullopt;
+}
+
+std::optional<KOVALINKAGGROPT> find_bond(const std::string &name) {
+    KOVALINKAGGROPT bond{};
+    clear_error();
+    const int result = KOVANetLinkAggrGet(name.c_str(), &bond);
+    if (result < 0) {
+        call_failed("cannot read bond " + name);
+    }
+    return result > 0 || bond.cSlaves > 0 ? std::optional{bond} : std::nullopt;
+}
+
+std::vector<std::string> members_of(const KOVALINKAGGROPT &bond) {
+    return {bond.aszSlaves, bond.aszSlaves + bond.cSlaves};
+}
+
+std::vector<std::string> ports_of(const std::string &name) {
+    if (KLIBNetBridgeIfIsMaster(name.c_str()) != 1) {
+        return {};
+    }
+    const owned_list ports = make_list();
+    clear_error();
+    if (KLIBNetBridgeSlaveEnum(name.c_str(), ports.get()) < 0) {
+        call_failed("cannot read the ports of " + name);
+    }
+    return texts_of(ports.get());
 }
 
 void require_no_vlan_on(const std::string &name) {

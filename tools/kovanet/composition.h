@@ -28,6 +28,13 @@ std::optional<VLANINFO> find_vlan(const std::string &name);
 /** The VLAN on an interface, which has one at most. */
 std::optional<VLANINFO> find_vlan_on(const std::string &row_device);
 
+/** A bond with its members, nothing for what has none; one of the virtual switch may be read in part. */
+std::optional<KOVALINKAGGROPT> find_bond(const std::string &name);
+std::vector<std::string> members_of(const KOVALINKAGGROPT &bond);
+
+/** The ports of a bridge; none of what is no bridge. */
+std::vector<std::string> ports_of(const std::string &name);
+
 /** Ends the program when an interface has a VLAN. */
 void require_no_vlan_on(const std::string &name);
 /** Whether an interface is a port of a bridge, in the kernel or by its file. */
@@ -60,5 +67,8 @@ std::string loss_of(const std::string &name);
 void add_state(json &row, const std::string &name);
 /** Address and prefix of such a row as a table shows them. */
 std::string state_address(const json &row);
+
+/** The word for a role in a bridge, null for one that is not known. */
+json role_word(int role);
 
 } // namespace kova

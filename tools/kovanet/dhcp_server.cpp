@@ -2,10 +2,13 @@
 #include "dhcp_server.h"
 
 #include "dhcp_files.h"
+#include "records.h"
 #include "rules.h"
 
 #include <algorithm>
 #include <cstdio>
+#include <filesystem>
+#include <kova/core.h>
 #include <kovanetsdk/dhcp.h>
 
 namespace kova {
@@ -49,9 +52,7 @@ json served_rows() {
 
 void status(bool as_json) {
     const config_lock lock{config_lock::kShared}; // one view of all files
-    DHCP_PXE_CONF pxe{};
-    DHCPPXEConfGetEnable(&pxe);
-    const json record = {{"service", DHCPIsEnabled() == 1}, {"pxe", pxe.enabled == 1}, {"interfaces", served_rows()}};
+    const json record = dhcp_server_record();
     if (as_json) {
         print_json(record);
         return;
@@ -92,6 +93,24 @@ void restart_server() {
     const step_note note{"restarting the DHCP server"};
     if (KLIBNetDHCPServerRestart() < 0) {
         throw failure{kCallFailed, "the DHCP server does not restart; the system log tells why"};
+    }
+}
+
+/** The switch of the whole service, which the library only reads. */
+void switch_service(bool on) {
+    constexpr char kFolder[] = "/etc/dhcpd";
+    require_root();
+    {
+        const config_lock lock{config_lock::kExclusive};
+        std::error_code failed;
+        std::filesystem::create_directory(kFolder, failed); // when it fails, so does the next step
+        clear_error();
+        if (KLIBCFileSetKeyValue("/etc/dhcpd/dhcpd.info", "enable", on ? "yes" : "no", "%s=\"%s\"\n") < 0) {
+            call_failed(std::string("cannot switch the DHCP server ") + (on ? "on" : "off"));
+        }
+    }
+    if (!words_of<server_words>().no_restart) {
+        restart_server();
     }
 }
 
@@ -157,6 +176,12 @@ CLI::App &add_switch(CLI::App &object, const char *name, const char *description
 
 } // namespace
 
+json dhcp_server_record() {
+    DHCP_PXE_CONF pxe{};
+    DHCPPXEConfGetEnable(&pxe);
+    return {{"service", DHCPIsEnabled() == 1}, {"pxe", pxe.enabled == 1}, {"interfaces", served_rows()}};
+}
+
 std::string conflicting_interface(const std::string &ifname, const std::string &start, const std::string &end,
                                   const std::string &mask) {
     char other[256] = "";
@@ -200,6 +225,8 @@ void add_dhcp_server(CLI::App &object, const global_options &options) {
     auto &words = words_of<server_words>();
     object.add_subcommand("status", "the switches of the service, its interfaces and network boot")
         ->callback([&options] { status(options.json); });
+    add_change(object, "on", "switch the service on").callback([] { switch_service(true); });
+    add_change(object, "off", "switch the service off").callback([] { switch_service(false); });
     add_switch(object, "enable", "serve an interface").callback([&words] { enable(words, true); });
     add_switch(object, "disable", "serve an interface no more").callback([&words] { enable(words, false); });
     object.add_subcommand("restart", "run the server anew on its files")->callback([] {

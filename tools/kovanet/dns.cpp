@@ -3,6 +3,7 @@
 #include "interfaces.h"
 #include "lists.h"
 #include "objects.h"
+#include "records.h"
 #include "rules.h"
 
 #include <kova/core.h>
@@ -30,11 +31,7 @@ constexpr column kColumns[] = {
 
 void show(bool as_json) {
     const config_lock lock{config_lock::kShared}; // one view of all files
-    const bool is_static = KLIBCFileCheckKeyValue("/etc/kovainfo.conf", "dns_mode", "static", 0) == 1;
-    json record;
-    record["mode"] = is_static ? "static" : "auto";
-    record["servers"] = servers_of(KOVANetDNSListGet, "servers in use");
-    record["configured_servers"] = servers_of(KOVANetStaticDNSListGet, "configured servers");
+    const json record = dns_record();
     if (as_json) {
         print_json(record);
     } else {
@@ -79,6 +76,15 @@ struct dns_words {
 };
 
 } // namespace
+
+json dns_record() {
+    const bool is_static = KLIBCFileCheckKeyValue("/etc/kovainfo.conf", "dns_mode", "static", 0) == 1;
+    json record;
+    record["mode"] = is_static ? "static" : "auto";
+    record["servers"] = servers_of(KOVANetDNSListGet, "servers in use");
+    record["configured_servers"] = servers_of(KOVANetStaticDNSListGet, "configured servers");
+    return record;
+}
 
 void add_dns(CLI::App &object, const global_options &options) {
     auto &words = words_of<dns_words>();

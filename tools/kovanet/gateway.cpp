@@ -2,6 +2,7 @@
 #include "errors.h"
 #include "interfaces.h"
 #include "objects.h"
+#include "records.h"
 #include "rules.h"
 
 #include <kova/core.h>
@@ -47,11 +48,7 @@ constexpr column kColumns[] = {
 
 void show(bool as_json) {
     const config_lock lock{config_lock::kShared}; // one view of the kernel and the file
-    const default_route route = route_in_use();
-    json record;
-    record["gateway"] = known_text(route.gateway.c_str());
-    record["interface"] = known_text(route.interface.c_str());
-    record["configured_gateway"] = known_text(configured_gateway().c_str());
+    const json record = gateway_record();
     if (as_json) {
         print_json(record);
     } else {
@@ -135,6 +132,15 @@ void clear() {
 }
 
 } // namespace
+
+json gateway_record() {
+    const default_route route = route_in_use();
+    json record;
+    record["gateway"] = known_text(route.gateway.c_str());
+    record["interface"] = known_text(route.interface.c_str());
+    record["configured_gateway"] = known_text(configured_gateway().c_str());
+    return record;
+}
 
 void add_gateway(CLI::App &object, const global_options &options) {
     auto &address = words_of<std::string>();

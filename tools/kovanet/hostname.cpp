@@ -2,6 +2,7 @@
 #include "errors.h"
 #include "interfaces.h"
 #include "objects.h"
+#include "records.h"
 #include "rules.h"
 #include "table.h"
 
@@ -27,8 +28,7 @@ std::optional<std::string> current_name() {
 }
 
 void show(bool as_json) {
-    const std::optional<std::string> name = current_name();
-    const json record = {{"name", name ? json(*name) : json()}};
+    const json record = hostname_record();
     if (as_json) {
         print_json(record);
     } else {
@@ -67,6 +67,11 @@ struct hostname_words {
 };
 
 } // namespace
+
+json hostname_record() {
+    const std::optional<std::string> name = current_name();
+    return {{"name", name ? json(*name) : json()}};
+}
 
 void add_hostname(CLI::App &object, const global_options &options) {
     auto &words = words_of<hostname_words>();

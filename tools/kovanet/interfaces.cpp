@@ -50,6 +50,25 @@ IFINFO require_interface(const std::string &name) {
     return *info;
 }
 
+std::vector<KOVAV6IP> ipv6_addresses(const std::string &name) {
+    if (KLIBCFileExist("/proc/net/if_inet6") == 0) {
+        return {}; // a kernel without IPv6
+    }
+    std::vector<KOVAV6IP> addresses(16);
+    for (;;) {
+        clear_error();
+        const int count = KOVALnxV6IPGet(name.c_str(), addresses.data(), static_cast<int>(addresses.size()));
+        if (count < 0) {
+            call_failed("cannot read the IPv6 addresses of " + name);
+        }
+        const bool all_fit = static_cast<size_t>(count) <= addresses.size();
+        addresses.resize(static_cast<size_t>(count));
+        if (all_fit) {
+            return addresses;
+        }
+    }
+}
+
 std::vector<NETSTAT> all_counters() {
     clear_error();
     const std::unique_ptr<NETSTAT, decltype(&KLIBNetStatFree)> stats{KLIBNetStatInit(kMaxInterfaces), KLIBNetStatFree};

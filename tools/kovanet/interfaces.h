@@ -7,6 +7,7 @@
 #include "table.h"
 
 #include <kovanetsdk/iface.h>
+#include <kovanetsdk/ipv6.h>
 #include <kovanetsdk/stats.h>
 #include <optional>
 #include <string>
@@ -30,6 +31,9 @@ std::optional<IFINFO> find_interface(const std::string &name);
 IFINFO require_interface(const std::string &name);
 /** All interfaces there are, sorted by name, without those whose names the library refuses. */
 std::vector<IFINFO> all_interfaces();
+
+/** The IPv6 addresses that an interface has now. Ends the program when they cannot be listed. */
+std::vector<KOVAV6IP> ipv6_addresses(const std::string &name);
 
 /** Counters of all interfaces, sorted by name. */
 std::vector<NETSTAT> all_counters();

@@ -1,6 +1,8 @@
 // kovanet link: state and names of the interfaces.
 #include "errors.h"
 #include "interfaces.h"
+#include "interrupt.h"
+#include "link_changes.h"
 #include "objects.h"
 #include "rules.h"
 
@@ -76,6 +78,22 @@ void rename(const std::string &old_name, const std::string &new_name) {
     }
 }
 
+/** Raises the library's event for every link that comes or goes, until told to stop. */
+void watch() {
+    require_root("raising events");
+    stop_on_signals();
+    link_watcher links;
+    constexpr int kLookEveryMs = 1000; // a signal may come just before a wait
+    while (!is_interrupted()) {
+        for (const link_change &change : links.wait(kLookEveryMs)) {
+            if (change.link_changed) {
+                // a plug-in that fails is in the log and stops nothing
+                (change.link ? KLIBNetIfLinkUpEvent : KLIBNetIfLinkDownEvent)(change.name.c_str());
+            }
+        }
+    }
+}
+
 struct link_words {
     std::optional<std::string> shown;
     std::string name;
@@ -97,6 +115,8 @@ void add_link(CLI::App &object, const global_options &options) {
     CLI::App &down = *object.add_subcommand("down", "take an interface down");
     down.add_option("IF", words.name, "interface")->required();
     down.callback([&words] { set_state(words.name, false); });
+
+    object.add_subcommand("watch", "raise the events of links that come and go, until interrupted")->callback(watch);
 
     CLI::App &move = *object.add_subcommand("rename", "give an interface that is down another name");
     move.add_option("OLD", words.name, "interface")->required();

@@ -1,4 +1,5 @@
 // kovanet: the appliance's network for a person at a terminal and for scripts.
+#include "completion.h"
 #include "errors.h"
 #include "objects.h"
 #include "table.h"
@@ -18,6 +19,9 @@ constexpr char kExitCodes[] = "Every command takes --json and --verbose.\n"
                               "Exit codes: 0 done or yes, 1 no or an invalid value, 2 usage, 3 not found,\n"
                               "            4 the library call failed, 5 needs root";
 
+/** The second number is that of the JSON shapes: it goes up when a field changes its meaning or goes away. */
+constexpr char kVersion[] = "kovanet " KOVA_VERSION ", JSON 1";
+
 struct object {
     const char *name;
     const char *description;
@@ -26,6 +30,16 @@ struct object {
 };
 
 constexpr object kObjects[] = {
+    {"show", "what this machine's network is now, on one screen", add_show,
+     "  kovanet show\n"
+     "  kovanet show --json"},
+    {"verify", "whether the kernel's network is what the files say", add_verify,
+     "  kovanet verify\n"
+     "  kovanet verify --json"},
+    {"monitor", "changes as they happen", add_monitor,
+     "  kovanet monitor\n"
+     "  kovanet monitor --json\n"
+     "  kovanet monitor --count 1"},
     {"card", "network cards and their IPv4 configuration", add_card,
      "  kovanet card list\n"
      "  kovanet card show eth0\n"
@@ -76,10 +90,28 @@ constexpr object kObjects[] = {
      "  kovanet bridge set eth0 slave br0\n"
      "  kovanet bridge set lbr0 local-lan wlan0 static 192.168.2.1/24\n"
      "  kovanet bridge set eth0 none dhcp --yes"},
+    {"ipv6", "how the interfaces get their IPv6 addresses", add_ipv6,
+     "  kovanet ipv6 show\n"
+     "  kovanet ipv6 set eth0 auto\n"
+     "  kovanet ipv6 set eth0 static 2001:db8::10/64 gateway fe80::1\n"
+     "  kovanet ipv6 set eth0 off --yes"},
     {"mtu", "largest packets of the interfaces", add_mtu,
      "  kovanet mtu show\n"
      "  kovanet mtu set eth0 9000\n"
      "  kovanet mtu set eth0.10 1500 --yes"},
+    {"pppoe", "the PPPoE client", add_pppoe,
+     "  kovanet pppoe set eth0 user alice@provider default-route on\n"
+     "  kovanet pppoe set eth0 user alice@provider --password-file /root/secret\n"
+     "  kovanet pppoe set eth0 mtu 1400 --keep-password\n"
+     "  kovanet pppoe start\n"
+     "  kovanet pppoe status\n"
+     "  kovanet pppoe stop"},
+    {"pppoe-relay", "PPPoE from the local LAN to a server elsewhere", add_pppoe_relay,
+     "  kovanet pppoe-relay set lbr0 on eth0\n"
+     "  kovanet pppoe-relay apply lbr0\n"
+     "  kovanet pppoe-relay show\n"
+     "  kovanet pppoe-relay set lbr0 off\n"
+     "  kovanet pppoe-relay clear"},
     {"dns", "name servers, and where they come from", add_dns,
      "  kovanet dns show\n"
      "  kovanet dns set 192.168.1.1 2001:db8::53\n"
@@ -87,6 +119,7 @@ constexpr object kObjects[] = {
      "  kovanet dns update"},
     {"dhcp-server", "the DHCP and router-advertisement server", add_dhcp_server,
      "  kovanet dhcp-server status\n"
+     "  kovanet dhcp-server on\n"
      "  kovanet dhcp-server enable eth0\n"
      "  kovanet dhcp-server subnet list\n"
      "  kovanet dhcp-server subnet set eth0 0 range 192.168.1.100 192.168.1.200 mask 255.255.255.0 router 192.168.1.1\n"
@@ -97,12 +130,39 @@ constexpr object kObjects[] = {
      "  kovanet dhcp-server pxe set remote 192.168.1.5 pxelinux.0\n"
      "  kovanet dhcp-server conflict eth1 192.168.1.10 192.168.1.20 255.255.255.0\n"
      "  kovanet dhcp-server test-client eth0"},
+    {"conflict", "whether an address is somebody else's already", add_conflict,
+     "  kovanet conflict address eth0 192.168.1.20\n"
+     "  kovanet conflict bond bond0"},
+    {"lookup", "the addresses of a name", add_lookup,
+     "  kovanet lookup nas02\n"
+     "  kovanet lookup www.example.com --json"},
+    {"ports", "ports of this machine that are in use", add_ports,
+     "  kovanet ports list\n"
+     "  kovanet ports list tcp 1 1023\n"
+     "  kovanet ports used udp 53\n"
+     "  kovanet ports used tcp 8000 8010"},
+    {"wake", "wake a sleeping host", add_wake, "  kovanet wake eth0 52:54:00:12:34:56"},
     {"hostname", "the name of the appliance", add_hostname,
      "  kovanet hostname show\n"
      "  kovanet hostname set nas01"},
     {"service", "what the services are told", add_service,
      "  kovanet service notify ip\n"
      "  kovanet service notify ip,mtu action 1"},
+    {"topology", "what the interfaces of the appliance are used for", add_topology,
+     "  kovanet topology show\n"
+     "  kovanet topology show bridge\n"
+     "  kovanet topology set router"},
+    {"reach", "whether a host answers on a TCP port", add_reach,
+     "  kovanet reach nas01 445\n"
+     "  kovanet reach 192.168.1.1 80 timeout 2\n"
+     "  kovanet reach 2001:db8::1 22 --json"},
+    {"tunnel", "the IPv6 tunnel through a tunnel broker", add_tunnel,
+     "  kovanet tunnel set broker.example.net login alice\n"
+     "  kovanet tunnel set broker.example.net login alice --password-file /root/password\n"
+     "  kovanet tunnel set broker.example.net anonymous\n"
+     "  kovanet tunnel start\n"
+     "  kovanet tunnel show\n"
+     "  kovanet tunnel stop"},
     {"check", "whether a value is valid", add_check,
      "  kovanet check address 192.168.1.10 mask 255.255.255.0\n"
      "  kovanet check prefix 192.168.1.0/24\n"
@@ -153,12 +213,8 @@ command_words first_words(int argc, char **argv) {
 }
 
 /** The verbs below a verb, for the objects that have them. */
-void require_known_detail(const command_words &words, CLI::App &object) {
-    const auto has_verbs = [](CLI::App *verb) {
-        return !verb->get_subcommands([](CLI::App *) { return true; }).empty();
-    };
-    for (CLI::App *verb : object.get_subcommands(has_verbs)) {
-        verb->require_subcommand(1);
+void require_known_detail(const command_words &words, const CLI::App &object) {
+    for (const CLI::App *verb : object.get_subcommands([](const CLI::App *) { return true; })) {
         if (words.verb != nullptr && verb->get_name() == words.verb) {
             require_known("verb", words.detail, *verb);
         }
@@ -172,12 +228,24 @@ void name_groups(CLI::App &app) {
     }
 }
 
+/** A command that has others below it is not complete without one of them. */
+void require_verbs(CLI::App &command) {
+    const auto below = command.get_subcommands([](const CLI::App *) { return true; });
+    if (!below.empty()) {
+        command.require_subcommand(1);
+    }
+    for (CLI::App *each : below) {
+        require_verbs(*each);
+    }
+}
+
 /** Describes the whole first level, and below it only the object that was asked for. */
 void describe(CLI::App &app, global_options &options, const command_words &words) {
     app.require_subcommand(1);
     app.fallthrough(); // the global options may stand anywhere
     app.formatter(std::make_shared<help_format>());
     app.set_help_flag("--help", "show this help");
+    app.set_version_flag("--version", kVersion, "show the version, and that of the JSON output");
     app.add_flag("--json", options.json, "output for programs");
     app.add_flag("--verbose", options.verbose, "show the library's log");
     app.footer(std::string("Examples:\n  kovanet card list\n  kovanet card set eth0 static 192.168.1.10/24\n"
@@ -188,15 +256,21 @@ void describe(CLI::App &app, global_options &options, const command_words &words
         if (words.object != nullptr && strcmp(words.object, each.name) == 0) {
             command.footer(std::string("Examples:\n") + each.examples + "\n\n" + kExitCodes);
             each.add(command, options);
-            if (each.add != add_stats) { // which has no verbs
-                command.require_subcommand(1);
-                require_known("verb", words.verb, command);
-                require_known_detail(words, command);
-            }
+            require_verbs(command);
         }
     }
-    require_known("object", words.object, app);
     name_groups(app);
+}
+
+/** Ends the program for an object or verb that is not known, with what may have been meant. */
+void require_known_words(const CLI::App &app, const command_words &words) {
+    require_known("object", words.object, app);
+    for (const CLI::App *object : app.get_subcommands([](const CLI::App *) { return true; })) {
+        if (words.object != nullptr && object->get_name() == words.object) {
+            require_known("verb", words.verb, *object);
+            require_known_detail(words, *object);
+        }
+    }
 }
 
 void complain(const std::string &text) {
@@ -216,11 +290,29 @@ void complain_of_usage(const CLI::ParseError &error, const CLI::App &app) {
     complain((lacks_command ? "the command is not complete" : error.what()) + ("; see " + where) + " --help");
 }
 
-int run(int argc, char **argv) {
-    CLI::App app{"Shows and changes the network configuration of the appliance.", "kovanet"};
+/** kovanet --complete WORD...: for the shells. What cannot be told is no reason to disturb somebody who types. */
+int complete(CLI::App &app, int argc, char **argv) {
     global_options options;
     try {
         describe(app, options, first_words(argc, argv));
+        for (const std::string &each : completions(app, {argv + 1, argv + argc})) {
+            puts(each.c_str());
+        }
+    } catch (const failure &) {
+    }
+    return kDone;
+}
+
+int run(int argc, char **argv) {
+    CLI::App app{"Shows and changes the network configuration of the appliance.", "kovanet"};
+    if (argc > 1 && strcmp(argv[1], "--complete") == 0) {
+        return complete(app, argc - 1, argv + 1);
+    }
+    global_options options;
+    const command_words words = first_words(argc, argv);
+    try {
+        describe(app, options, words);
+        require_known_words(app, words);
         app.parse_complete_callback([&options] {
             if (options.verbose) {
                 openlog("kovanet", LOG_PERROR | LOG_PID, LOG_USER);
@@ -228,6 +320,9 @@ int run(int argc, char **argv) {
         });
         app.parse(argc, argv);
         flush_output();
+        return kDone;
+    } catch (const CLI::CallForVersion &) {
+        puts(kVersion);
         return kDone;
     } catch (const CLI::CallForHelp &) {
         fputs(app.help().c_str(), stdout);

@@ -99,15 +99,48 @@ std::vector<std::string> effects_of(const std::string &name, const std::string &
             "Connections over " + changed + " pause."};
 }
 
+/** The stored MTU of an interface, or that there is none, to be put back. */
+class stored_mtu {
+public:
+    explicit stored_mtu(const std::string &name) : key_(owner_of(name) + "_mtu") {
+        clear_error();
+        const int found = KLIBCFileGetKeyValue("/etc/kovainfo.conf", key_.c_str(), value_, sizeof value_, 0);
+        if (found < 0) {
+            call_failed("cannot read the configured MTU of " + name);
+        }
+        is_there_ = found > 0;
+    }
+    void put_back() const {
+        if (is_there_) {
+            KLIBCINFOSetKeyValue(key_.c_str(), value_);
+        } else {
+            KLIBCINFORemoveKey(key_.c_str());
+        }
+    }
+
+private:
+    /** The interface whose key it is: for a port of the virtual switch the one behind it. */
+    static std::string owner_of(const std::string &name) {
+        constexpr int kSwitchPort = 1;
+        char original[64] = "";
+        const bool is_port = KLIBNetOVSIfIsMaster(name.c_str()) == kSwitchPort &&
+                             KLIBNetOVSGetOriginalIf(name.c_str(), original, sizeof original) == 0;
+        return is_port ? original : name;
+    }
+
+    std::string key_;
+    char value_[64] = "";
+    bool is_there_ = false;
+};
+
 /** Keeps what is configured and what the kernel drops when an interface goes down; puts back what was lost. */
 class kept_settings {
 public:
-    kept_settings(std::string name, const std::optional<VLANINFO> &vlan) : name_(std::move(name)) {
+    kept_settings(const std::string &name, const std::optional<VLANINFO> &vlan) {
+        stored_.emplace_back(name);
         if (vlan) {
-            row_device_ = vlan->szRowDevice;
-            row_mtu_ = configured_mtu(row_device_);
+            stored_.emplace_back(vlan->szRowDevice);
         }
-        mtu_ = configured_mtu(name_);
         char interface[IFNAMSIZ] = "";
         DefaultGatewayGet(gateway_, sizeof gateway_, interface, sizeof interface);
     }
@@ -123,17 +156,13 @@ public:
     }
     /** A value that the kernel does not take is not kept for the next start. */
     void restore_configured() const {
-        KOVAConfSetMTUValue(mtu_.c_str(), name_.c_str());
-        if (!row_device_.empty()) {
-            KOVAConfSetMTUValue(row_mtu_.c_str(), row_device_.c_str());
+        for (const stored_mtu &mtu : stored_) {
+            mtu.put_back();
         }
     }
 
 private:
-    std::string name_;
-    std::string mtu_;
-    std::string row_device_;
-    std::string row_mtu_;
+    std::vector<stored_mtu> stored_;
     char gateway_[16] = "";
 };
 

@@ -2,6 +2,7 @@
 
 #include "errors.h"
 
+#include <arpa/inet.h>
 #include <algorithm>
 #include <kovanetsdk/addr.h>
 
@@ -204,6 +205,13 @@ void require(const std::string &what, const refusal &refused) {
     if (refused) {
         throw failure{kNo, what + " is not valid: " + *refused};
     }
+}
+
+bool is_same_ipv6(const std::string &one, const std::string &other) {
+    in6_addr first{};
+    in6_addr second{};
+    return inet_pton(AF_INET6, one.c_str(), &first) == 1 && inet_pton(AF_INET6, other.c_str(), &second) == 1 &&
+           IN6_ARE_ADDR_EQUAL(&first, &second);
 }
 
 std::string plain_address(const std::string &address) {

@@ -38,6 +38,9 @@ void require(const std::string &what, const refusal &refused);
 /** The plain decimal form of an accepted address: parts may also be written octal or hexadecimal. */
 std::string plain_address(const std::string &address);
 
+/** Whether two texts are the same IPv6 address. */
+bool is_same_ipv6(const std::string &one, const std::string &other);
+
 /** A network given as "ADDRESS/LENGTH". */
 struct network {
     std::string address;

@@ -1,12 +1,11 @@
 // kovanet stats: traffic counters, once or as rates while they change.
 #include "errors.h"
 #include "interfaces.h"
+#include "interrupt.h"
 #include "objects.h"
 
 #include <algorithm>
-#include <atomic>
 #include <cmath>
-#include <csignal>
 #include <cstdio>
 #include <ctime>
 #include <kovanetsdk/stats.h>
@@ -14,8 +13,6 @@
 
 namespace kova {
 namespace {
-
-std::atomic<bool> interrupted{false};
 
 double now(clockid_t clock) {
     timespec time{};
@@ -29,7 +26,7 @@ void wait_until(double monotonic) {
     double whole = 0;
     end.tv_nsec = static_cast<long>(modf(monotonic, &whole) * 1e9);
     end.tv_sec = static_cast<time_t>(whole);
-    while (!interrupted && clock_nanosleep(CLOCK_MONOTONIC, TIMER_ABSTIME, &end, nullptr) == EINTR) {
+    while (!is_interrupted() && clock_nanosleep(CLOCK_MONOTONIC, TIMER_ABSTIME, &end, nullptr) == EINTR) {
     }
 }
 
@@ -135,13 +132,6 @@ std::string refuse_seconds(const std::string &text) {
     return is_number && seconds >= 0.1 && seconds <= 86400 ? "" : text + " is no number of seconds from 0.1 to 86400";
 }
 
-void stop_on_signals() {
-    struct sigaction action {};
-    action.sa_handler = [](int) { interrupted = true; };
-    sigaction(SIGINT, &action, nullptr);
-    sigaction(SIGTERM, &action, nullptr);
-}
-
 struct stats_words {
     std::vector<std::string> names;
     double seconds = 1;
@@ -156,7 +146,7 @@ void watch(const stats_words &words, bool as_json) {
     int lines = 0;
     for (unsigned tick = 0; words.count == 0 || tick < words.count; ++tick, next += words.seconds) {
         wait_until(next);
-        if (interrupted) {
+        if (is_interrupted()) {
             break;
         }
         std::vector<NETSTAT> after = counters_of(words.names);

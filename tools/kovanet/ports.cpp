@@ -1,0 +1,112 @@
+// kovanet ports: which ports of this machine are in use.
+#include "errors.h"
+#include "objects.h"
+#include "table.h"
+
+#include <algorithm>
+#include <cstdio>
+#include <kovanetsdk/addr.h>
+#include <vector>
+
+namespace kova {
+namespace {
+
+constexpr int kHighestPort = 65535;
+
+struct protocol {
+    const char *name;
+    int number; /**< the library's */
+};
+constexpr protocol kProtocols[] = {{"tcp", 1}, {"udp", 2}};
+
+struct ports_words {
+    std::optional<std::string> protocol;
+    int low = 0;
+    std::optional<int> high;
+};
+
+constexpr column kColumns[] = {
+    {"PROTOCOL", [](const json &row) { return field(row, "protocol"); }},
+    {"PORT", [](const json &row) { return field(row, "port"); }, true},
+};
+
+void require_order(int low, int high) {
+    if (low > high) {
+        throw failure{kNo,
+                      "the lowest port, " + std::to_string(low) + ", is above the highest, " + std::to_string(high)};
+    }
+}
+
+std::vector<int> listening_ports(const protocol &asked, int low, int high) {
+    std::vector<int> ports(kHighestPort + 1);
+    int count = static_cast<int>(ports.size());
+    clear_error();
+    if (KOVANetGetPortUsedInRange(ports.data(), &count, low, high, asked.number) < 0) {
+        call_failed("cannot list the ports");
+    }
+    ports.resize(static_cast<size_t>(count));
+    std::sort(ports.begin(), ports.end());
+    return ports;
+}
+
+void list(const ports_words &words, bool as_json) {
+    const int high = words.high.value_or(kHighestPort);
+    require_order(words.low, high);
+    json rows = json::array();
+    for (const protocol &each : kProtocols) {
+        if (words.protocol && *words.protocol != each.name) {
+            continue;
+        }
+        for (const int port : listening_ports(each, words.low, high)) {
+            rows.push_back({{"protocol", each.name}, {"port", port}});
+        }
+    }
+    if (as_json) {
+        print_json(rows);
+    } else {
+        print_table(rows, kColumns);
+    }
+}
+
+void tell_whether_used(const ports_words &words, bool as_json) {
+    const int high = words.high.value_or(words.low);
+    require_order(words.low, high);
+    const auto &asked = *std::find_if(std::begin(kProtocols), std::end(kProtocols),
+                                      [&](const protocol &each) { return *words.protocol == each.name; });
+    const bool is_used = KOVANetIsPortRangeUsed(words.low, high, asked.number) == 1;
+    if (as_json) {
+        print_json({{"protocol", asked.name}, {"low", words.low}, {"high", high}, {"used", is_used}});
+    } else if (words.low == high) {
+        printf("%s port %d is %s\n", asked.name, high, is_used ? "used" : "free");
+    } else {
+        printf("%s %s port from %d to %d is used\n", is_used ? "a" : "no", asked.name, words.low, high);
+    }
+    if (!is_used) {
+        throw failure{kNo, ""}; // the answer is the output
+    }
+}
+
+void add_range(CLI::App &verb, ports_words &words, bool is_required) {
+    CLI::Option &low = *verb.add_option("LOW", words.low, "lowest port, 0 to 65535");
+    low.required(is_required)->check(CLI::Range(0, kHighestPort));
+    verb.add_option("HIGH", words.high, "highest port")->check(CLI::Range(0, kHighestPort));
+}
+
+} // namespace
+
+void add_ports(CLI::App &object, const global_options &options) {
+    auto &words = words_of<ports_words>();
+    const CLI::IsMember protocols({"tcp", "udp"});
+    CLI::App &listed = *object.add_subcommand("list", "the ports at which this machine listens");
+    listed.add_option("tcp|udp", words.protocol, "both if left out")->check(protocols);
+    add_range(listed, words, false);
+    listed.callback([&words, &options] { list(words, options.json); });
+
+    CLI::App &used =
+        *object.add_subcommand("used", "whether a port, or one of a range, is in use, listening or connected");
+    used.add_option("tcp|udp", words.protocol)->required()->check(protocols);
+    add_range(used, words, true);
+    used.callback([&words, &options] { tell_whether_used(words, options.json); });
+}
+
+} // namespace kova

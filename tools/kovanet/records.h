@@ -1,0 +1,20 @@
+/**
+ * @file
+ * What objects tell of themselves, for the commands that tell of several. The caller holds the configuration lock where
+ * it wants one view of them all.
+ */
+#pragma once
+
+#include "interfaces.h"
+
+namespace kova {
+
+/** What kovanet gateway show prints, and so on. */
+json gateway_record();
+json dns_record();
+json hostname_record();
+json dhcp_server_record();
+/** The rows of kovanet addr list for one interface. */
+json address_rows(const IFINFO &info);
+
+} // namespace kova
