@@ -3,7 +3,7 @@
 
 usage: ./test [--list] [--refresh] [--backend box|guest] [NAME...]
 
-A NAME is a ring (unit, platform, property, fault, crash, sanitize, valgrind, coverage, lab, guest, gates), a test file
+A NAME is a ring (unit, platform, property, fault, crash, sanitize, valgrind, coverage, arm64, lab, guest, gates), a test file
 (test_jobs, test_abi), a source unit (net_set_ip), or dhcp-fuzz, which tries 10000 random DHCP subnets with another seed
 each time; without a name everything runs. KOVA_SEED and KOVA_ROUNDS say what the random tests try. The last line counts
 the test cases.
@@ -15,6 +15,7 @@ import argparse
 import concurrent.futures
 import os
 import pathlib
+import platform
 import random
 import shutil
 import subprocess
@@ -31,11 +32,12 @@ PYTHON = "/usr/bin/python3"
 UNIT_PROGRAMS = {"unit": "tests/kovanet-unit-tests", "platform": "tests/platform/kova-platform-tests"}
 PROGRAMS = {**UNIT_PROGRAMS, "fault": "tests/kovanet-fault-tests", "crash": "tests/crash/kova-crash-tests"}
 COUNTED = [kind for kind in PROGRAMS if kind != "crash"]  # whose lines count as tested; the killed count nothing
-BUILT_ANEW = {"sanitize", "coverage"}  # rings that need the libraries once more, in a way of their own
+BUILT_ANEW = {"sanitize", "coverage", "arm64"}  # rings that need the libraries once more, in a way of their own
 FAULT_SHARDS = 2  # processes that share the sweep: it mostly waits for its own processes
 SLOWEST = 1800  # seconds for one step, on a machine that has much else to do
 
 
+MAKE_BOXES = {"test_bench", "test_debian"}  # gates that do
 OF_THE_LAB_ITSELF = {"test_box": ("lab", "box"), "test_guest": ("guest", "guest")}  # file -> ring, what it makes itself
 NOT_IN_GUEST = {"sanitize": "sanitizers do not run on its kernel", "valgrind": "valgrind does not run on its kernel"}
 
@@ -48,21 +50,27 @@ class Step:
     """
 
     def __init__(self, ring, name, command, report, environment=None, options=None, needs=frozenset(), makes=None,
-                 shown=None, last=False, note=""):
+                 shown=None, last=False, note="", refusal=""):
         self.ring, self.name, self.command, self.report = ring, name, command, report
         self.environment = {**os.environ, **(environment or {})}
         self.options, self.needs = options, needs  # of the box; None on the host
         self.makes = makes  # the backend that the tests start themselves
         self.shown, self.last, self.note = shown, last, note
+        self.refusal = refusal  # why it cannot run on this machine, whatever the backend
         self.backend, self.reasons, self.seconds = None, [], 0.0
         self.passed = self.failed = self.skipped = 0
 
     def place(self, backends):
         """Chooses the first backend that has what the step needs."""
-        if self.options is None:
+        if self.refusal:
+            self.skip(self.refusal)
+        elif self.options is None:
             if self.makes and refusal(self.makes):
                 self.skip(f"{self.makes}: {refusal(self.makes)}")
-            return
+        else:
+            self.choose(backends)
+
+    def choose(self, backends):
         refused = []
         for backend in backends:
             reason = NOT_IN_GUEST.get(self.ring) if backend == "guest" else None
@@ -115,10 +123,10 @@ class Step:
             self.failed = 1  # a step without a test proves nothing
 
 
-def gtest_step(out, ring, kind, build, unit=None, part=None, wrapper=(), without=(), **more):
+def gtest_step(out, ring, kind, build, unit=None, part=None, wrapper=(), only=(), without=(), **more):
     program = build / PROGRAMS[kind]
     report = out / f"{ring}-{kind}-{unit or part or 'all'}.xml"
-    chosen = f"{unit}.*" if unit else "*"
+    chosen = ":".join(f"{suite}.*" for suite in [unit, *only] if suite) or "*"
     command = [*wrapper, str(program), f"--gtest_output=xml:{report}", "--gtest_brief=1",
                f"--gtest_filter={chosen}{'-' + ':'.join(without) if without else ''}"]
     named = "/".join([kind, *filter(None, [unit, part])])
@@ -197,9 +205,35 @@ def coverage_steps(out):
                       environment=counts, shown="coverage of ", last=True)
 
 
+EMULATOR = ["qemu-aarch64", "-L", "/usr/aarch64-linux-gnu"]
+# the platform's tests that neither start programs nor wait for other processes
+ARM64_PLATFORM = ["crypt", "error_register", "file_lock", "file_rewrite", "ha", "key_value", "memory", "plain_file",
+                  "service", "strings", "sz_hash", "sz_list"]
+NOT_EMULATED = ["plain_file.KLIBCFileReadLines_kernelFile_isRead"]  # in /proc the emulator stands under its own name
+
+
+def arm64_refusal():
+    """Why this machine cannot build for 64-bit Arm and run that; empty when it can."""
+    if platform.machine() == "aarch64":
+        return "this machine's own processor is one, so that every other ring shows it"
+    missing = [tool for tool in ("aarch64-linux-gnu-g++", EMULATOR[0]) if not shutil.which(tool)]
+    return f"no {' and no '.join(missing)} on this machine" if missing else ""
+
+
+def arm64_steps(out):
+    refused = arm64_refusal()
+    build = BUILD / "arm64"
+    yield pytest_step(out, "arm64", ROOT / "tests" / "gates" / "test_arm64.py", refusal=refused)
+    yield gtest_step(out, "arm64", "unit", build, wrapper=EMULATOR, refusal=refused)
+    yield gtest_step(out, "arm64", "platform", build, wrapper=EMULATOR, only=ARM64_PLATFORM, without=NOT_EMULATED,
+                     refusal=refused)
+
+
 def all_steps(out):
     for path in sorted((ROOT / "tests" / "gates").glob("test_*.py")):
-        yield pytest_step(out, "gates", path, makes="box" if path.stem == "test_bench" else None)
+        if path.stem == "test_arm64":
+            continue  # a ring of its own
+        yield pytest_step(out, "gates", path, makes="box" if path.stem in MAKE_BOXES else None)
     for kind in UNIT_PROGRAMS:
         yield gtest_step(out, kind, kind, BUILD)
     yield from fault_steps(out)
@@ -209,6 +243,7 @@ def all_steps(out):
     for kind in UNIT_PROGRAMS:
         yield gtest_step(out, "valgrind", kind, BUILD, wrapper=VALGRIND, without=NOT_UNDER_VALGRIND)
     yield from coverage_steps(out)
+    yield from arm64_steps(out)
     yield property_step(out, "random", seed=1, rounds=500)
     for path in sorted((ROOT / "tests" / "lab").glob("test_*.py")):
         ring, makes = OF_THE_LAB_ITSELF.get(path.stem, ("lab", None))
@@ -221,10 +256,11 @@ VALGRIND = ["valgrind", "--quiet", "--error-exitcode=9", "--leak-check=full", "-
 
 
 # Valgrind turns vfork into fork, so that a failed execution looks like an exit, stands in /proc under its own name, and
-# knows no mount without a type. What tests exactly that runs in the other rings.
+# knows no mount without a type; and it takes time and memory of its own. What tests exactly that runs in the other rings.
 NOT_UNDER_VALGRIND = ["exec.*", "popen.*", "process.*", "plain_file.KLIBCFileReadLines_kernelFile_isRead",
                       "dhcp_server_start.DHCPServerRestart_scriptThatCannotBeRun_isNoFailure",
                       "named_lock.KLIBCFileLock_programStartedUnderIt_doesNotKeepIt",
+                      "net_is_port_range_used.*_takeTimeInProportion", "net_is_port_range_used.*_takesNoMemory",
                       "file_rewrite.KLIBCFileSetKeyValue_fileThatCannotBeReplaced_isARenameFailure",
                       "file_rewrite.KLIBCFileSetKeyValue_lockDirectoryOfAStranger_isNotUsed"]
 
