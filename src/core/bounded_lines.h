@@ -14,7 +14,8 @@ class bounded_lines {
 public:
     /** Without a line. */
     bounded_lines() = default;
-    /** @param line, size  the buffer, at least 3 bytes. @param most  ends the lines after about that many bytes; a line counts as a whole buffer */
+    /** @param line, size  the buffer, at least 3 bytes. @param most  ends the lines after about that many bytes; a line
+     * counts as a whole buffer */
     bounded_lines(FILE *stream, char *line, int size, long most = LONG_MAX)
         : stream_(stream), line_(line), size_(size), left_(most) {}
 

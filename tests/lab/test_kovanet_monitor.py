@@ -168,7 +168,7 @@ def test_link_watch_is_a_job_and_for_root_only():
     finally:
         run("/sbin/stop", "link-watch")
     done = run(KOVANET, "link", "watch", status=NO_PERMISSION, user=65534)
-    assert done.stderr == "kovanet: raising events needs root\n"
+    assert done.stderr == "kovanet: raising events needs root; run it as root or with sudo\n"
 
 
 # ---- completion -----------------------------------------------------------------------------------------------------

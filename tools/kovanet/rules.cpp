@@ -2,8 +2,8 @@
 
 #include "errors.h"
 
-#include <arpa/inet.h>
 #include <algorithm>
+#include <arpa/inet.h>
 #include <kovanetsdk/addr.h>
 
 namespace kova {
