@@ -31,7 +31,6 @@ BUILD = ROOT / "build"
 PYTHON = "/usr/bin/python3"
 UNIT_PROGRAMS = {"unit": "tests/kovanet-unit-tests", "platform": "tests/platform/kova-platform-tests"}
 PROGRAMS = {**UNIT_PROGRAMS, "fault": "tests/kovanet-fault-tests", "crash": "tests/crash/kova-crash-tests"}
-COUNTED = [kind for kind in PROGRAMS if kind != "crash"]  # whose lines count as tested; the killed count nothing
 BUILT_ANEW = {"sanitize", "coverage", "arm64"}  # rings that need the libraries once more, in a way of their own
 FAULT_SHARDS = 2  # processes that share the sweep: it mostly waits for its own processes
 SLOWEST = 1800  # seconds for one step, on a machine that has much else to do
@@ -199,7 +198,7 @@ def coverage_steps(out):
     counts = {"GCOV_PREFIX": str(out / "coverage")}
     preloaded = {"LD_LIBRARY_PATH": f"{counting / 'src'}:{counting / 'platform'}",
                  "LD_PRELOAD": str(counting / "tests" / "coverage" / "libkova-leave.so")}
-    for kind in COUNTED:
+    for kind in UNIT_PROGRAMS:
         yield gtest_step(out, "coverage", kind, BUILD, environment={**counts, **preloaded})
     yield pytest_step(out, "coverage", ROOT / "tests" / "coverage" / "test_coverage.py", options=["--capture=no"],
                       environment=counts, shown="coverage of ", last=True)
