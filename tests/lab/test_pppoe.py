@@ -176,8 +176,10 @@ def test_disable_on_an_interface_ends_a_session_over_it_and_no_other(server):
 def test_the_switch_follows_a_client_that_died(server):
     store()
     dial()
-    for pid in processes("/usr/sbin/pppoe-connect"):
+    killed = processes("/usr/sbin/pppoe-connect")
+    for pid in killed:
         os.kill(pid, signal.SIGKILL)
+    wait_for(lambda: not any(pathlib.Path(f"/proc/{pid}").exists() for pid in killed), what="the end of the client")
     assert (library.KOVAPPPoECheckStatus(0), is_enabled()) == (0, "yes")
     assert (library.KOVAPPPoECheckStatus(1), is_enabled()) == (0, "no")
 
