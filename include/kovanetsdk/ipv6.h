@@ -30,7 +30,7 @@ enum {
 };
 
 /**
- * Lists the IPv6 addresses of an interface (/proc/net/if_inet6).
+ * Lists the IPv6 addresses of an interface (/proc/net/if_inet6), in the kernel's order, which means nothing.
  * @param szIfname  interface
  * @param rgV6IP    receives the first cMax addresses; all of it is zeroed first
  * @param cMax      records in rgV6IP, above 0

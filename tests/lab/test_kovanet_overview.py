@@ -2,6 +2,7 @@
 # needs: vlan bonding bridge dummy
 """kovanet show and verify on a machine with everything, compared with what iproute2 and the files say."""
 
+import ipaddress
 import os
 import pathlib
 
@@ -77,6 +78,11 @@ def test_show_has_parts_below_what_is_made_of_them():
     assert tree[4].split()[1:3] == ["vlan", "10"] and tree[4].split()[-1] == "10.10.0.1/16"
 
 
+def widest_scope_first(address):
+    scope = ["global", "site", "link", "host"].index(address["scope"])
+    return address["family"] == "inet6", scope, ipaddress.ip_address(address["local"])
+
+
 def test_show_as_json_has_every_interface_as_the_kernel_has_it():
     shown = data("show")
     assert list(shown) == documented("kovanet show")
@@ -89,7 +95,7 @@ def test_show_as_json_has_every_interface_as_the_kernel_has_it():
         assert row["mtu"] == links[name]["mtu"] and row["mac"] == links[name]["address"]
         assert row["up"] == ("UP" in links[name]["flags"])
         assert [(one["address"], one["prefix"]) for one in row["addresses"]] == [
-            (one["local"], one["prefixlen"]) for one in links[name]["addr_info"]]
+            (one["local"], one["prefixlen"]) for one in sorted(links[name]["addr_info"], key=widest_scope_first)]
     assert rows["br7"]["parts"] == ["bond7"] and sorted(rows["bond7"]["parts"]) == ["part0", "part1"]
     assert rows["row0.10"]["parts"] == ["row0"] and rows["row0.10"]["vlan_id"] == 10
     assert {name: rows[name]["kind"] for name in ("lo", "br7", "bond7", "row0.10", "row0", "eth0")} == {

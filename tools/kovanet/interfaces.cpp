@@ -3,10 +3,14 @@
 #include "errors.h"
 #include "rules.h"
 
+#include <algorithm>
+#include <arpa/inet.h>
+#include <array>
 #include <cstring>
 #include <kova/core.h>
 #include <kovanetsdk/core.h>
 #include <memory>
+#include <tuple>
 
 namespace kova {
 namespace {
@@ -14,6 +18,18 @@ namespace {
 constexpr uint32_t kConfigName = 0x100;
 constexpr int kWaitSeconds = 5;
 constexpr int kMaxInterfaces = 1024;
+constexpr uint32_t kGlobalScope = 0;
+
+/** The widest scope first, and by value within one: the kernel's list is in an order of its own, a new one each boot.
+ */
+bool comes_before(const KOVAV6IP &one, const KOVAV6IP &other) {
+    const auto key = [](const KOVAV6IP &address) {
+        in6_addr value{};
+        inet_pton(AF_INET6, address.szIP, &value);
+        return std::tuple{address.nScope != kGlobalScope, ~address.nScope, std::to_array(value.s6_addr)};
+    };
+    return key(one) < key(other);
+}
 
 } // namespace
 
@@ -64,6 +80,7 @@ std::vector<KOVAV6IP> ipv6_addresses(const std::string &name) {
         const bool all_fit = static_cast<size_t>(count) <= addresses.size();
         addresses.resize(static_cast<size_t>(count));
         if (all_fit) {
+            std::ranges::sort(addresses, comes_before);
             return addresses;
         }
     }
