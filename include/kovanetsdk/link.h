@@ -111,7 +111,7 @@ int KOVANetLinkAggrConfSetSlave(const char *szSlave, int blEnslave, const KOVALI
  * Rewrites the files so that a bond is no more: its first member gets its file, all leave, its own is deleted. Put back
  * from the ".saved" copies when a step fails; these copies stay otherwise. The first member's is made after it got the
  * bond's file: after a failure it is a member with the bond's settings.
- * @param pOpt  the bond and its members
+ * @param pOpt  the bond and its members; without any, only the file of a bond (BONDING_OPTS) is deleted
  * @return 0; -1 with 0xD00, 0x2A00 (a copy), 0x200, or the code of the step
  */
 int KOVANetLinkAggrConfDel(const KOVALINKAGGROPT *pOpt);

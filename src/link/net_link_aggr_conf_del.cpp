@@ -69,13 +69,25 @@ void rejoin_first_slave(const KOVALINKAGGROPT &bond) {
     }
 }
 
+/** Whether it is the file of a bond, not of any other interface, that nothing belongs to any more. */
+bool is_bond_without_members(const KOVALINKAGGROPT &bond) {
+    char szOptions[512];
+    return bond.cSlaves == 0 &&
+           KLIBCFileGetKeyValue(ifcfg_path{bond.szName}.c_str(), key::kBondingOpts, szOptions, sizeof szOptions, 0) > 0;
+}
+
 } // namespace
 
 extern "C" int KOVANetLinkAggrConfDel(const KOVALINKAGGROPT *pOpt) {
     if (refuses_null(HERE, "pOpt", pOpt) || refuses_text(HERE, "pOpt->szName", field_text{pOpt->szName}.c_str()) ||
         refuses(HERE, has_usable_name(*pOpt), "has_usable_name(*pOpt)") ||
-        refuses(HERE, has_usable_slaves(*pOpt), "has_usable_slaves(*pOpt)") ||
-        refuses(HERE, pOpt->cSlaves > 0 && pOpt->aszSlaves[0][0] != '\0', "'\\0' != *pOpt->aszSlaves[0]")) {
+        refuses(HERE, has_usable_slaves(*pOpt), "has_usable_slaves(*pOpt)")) {
+        return -1;
+    }
+    if (is_bond_without_members(*pOpt)) {
+        return dissolve(*pOpt);
+    }
+    if (refuses(HERE, pOpt->cSlaves > 0 && pOpt->aszSlaves[0][0] != '\0', "'\\0' != *pOpt->aszSlaves[0]")) {
         return -1;
     }
     drop_old_copies(*pOpt);

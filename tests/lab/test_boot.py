@@ -97,3 +97,27 @@ def test_what_is_wrong_costs_nothing_else(files, keep, system_log):
     assert links() == WANTED
     run("/etc/rc.network", "stop", status=1)
     assert links() == STOPPED
+
+
+def test_a_port_that_is_a_vlan_has_its_jumbo_mtu(files, keep):
+    keep(SCRIPTS / "ifcfg-lan2.8").write_text("DEVICE=lan2.8\nVLAN_ROW_DEVICE=lan2\nVLAN_ID=8\nONBOOT=yes\nBRIDGE=abr1\n")
+    keep(SCRIPTS / "ifcfg-abr1").write_text(f"DEVICE=abr1\nTYPE=bridge\nPRIMARY=lan2.8\n{STATIC}192.168.85.5\n")
+    with open("/etc/kovainfo.conf", "a") as info:
+        info.write('lan2.8_mtu="9000"\n')
+    for verb in ("start", "restart"):
+        assert run("/etc/rc.network", verb).stderr == ""
+        found = json.loads(run("ip", "-j", "link", "show").stdout)
+        assert {link["ifname"]: (link["mtu"], link.get("master")) for link in found if link["ifname"].startswith("lan2")} == {
+            "lan2": (9000, None), "lan2.7": (8000, None), "lan2.8": (9000, "abr1")}
+    run("/etc/rc.network", "stop", "abr1", "lan2.8")
+
+
+def test_what_a_stop_took_down_comes_back_though_it_is_not_for_the_boot(files, keep):
+    run("/etc/rc.network", "start")
+    for name in ("lan0", "lan1"):
+        path = keep(SCRIPTS / f"ifcfg-{name}")
+        path.write_text(path.read_text().replace("ONBOOT=yes", "ONBOOT=no"))
+    run("/etc/rc.network", "stop", "bond0")
+    assert links()["lan0"] == STOPPED["lan0"] and "bond0" not in links()
+    run("/etc/rc.network", "start", "bond0")
+    assert links() == WANTED

@@ -58,9 +58,6 @@ protected:
         std::erase_if(found, [](const std::string &name) { return name.rfind("resolv.conf", 0) != 0; });
         EXPECT_EQ(names, found);
     }
-    static int mode_of(const std::string &path) {
-        return static_cast<int>(std::filesystem::status(path).permissions());
-    }
     /** What a change of the servers in use announces. */
     static texts change_of(const std::string &servers) {
         return {"net/dns_change 4 " + servers, "net/dns_change 5 " + servers};

@@ -334,6 +334,10 @@ texts list_dir(const std::string &path) {
     return names;
 }
 
+unsigned mode_of(const std::string &path) {
+    return fs::exists(path) ? static_cast<unsigned>(fs::status(path).permissions()) : 0;
+}
+
 std::string ifcfg(const std::string &ifname) {
     return "/etc/sysconfig/network-scripts/ifcfg-" + ifname;
 }

@@ -172,6 +172,8 @@ void write_file(const std::string &path, const std::string &content);
 std::string read_file(const std::string &path);
 /** Names in a directory, sorted. */
 texts list_dir(const std::string &path);
+/** Permission bits of a file, 0 when there is none. */
+unsigned mode_of(const std::string &path);
 /** Path and content of an interface file. */
 std::string ifcfg(const std::string &ifname);
 /** Really runs a shell command line; it has to succeed. */

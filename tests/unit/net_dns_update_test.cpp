@@ -44,7 +44,7 @@ TEST_F(net_dns_update, KOVANetDNSUpdate_auto_hasIpv4ServersBeforeIpv6) {
     write_file(kAutoIpv4, "nameserver\t10.0.0.1\n");
     EXPECT_OUTCOME(update(), done("NITEMS=2 DNS_1=10.0.0.1 DNS_2=fe80::1"));
     EXPECT_EQ("nameserver\t10.0.0.1\nnameserver\tfe80::1\n", read_file(kResolvConf));
-    EXPECT_EQ(0644, mode_of(kResolvConf));
+    EXPECT_EQ(0644U, mode_of(kResolvConf));
 }
 
 TEST_F(net_dns_update, KOVANetDNSUpdate_static_hasTheConfiguredServersAlone) {

@@ -25,11 +25,6 @@ PPPOE_RELAY_CONF settings(uint32_t enabled, const std::string &server) {
     return conf;
 }
 
-mode_t mode_of(const std::string &path) {
-    struct stat status = {};
-    return stat(path.c_str(), &status) == 0 ? status.st_mode & 07777U : 0;
-}
-
 } // namespace
 
 class net_get_pppoe_relay_config : public unit_test {

@@ -167,6 +167,21 @@ TEST_F(net_link_aggr_conf_del, KOVANetLinkAggrConfDel_memberWithoutAName_isPasse
     EXPECT_EQ(kEth1, read_file(ifcfg("eth1")));
 }
 
+TEST_F(net_link_aggr_conf_del, KOVANetLinkAggrConfDel_bondWithoutMembers_losesItsFileAlone) {
+    request("bond0", {});
+    EXPECT_OUTCOME(del(), {.locks = {"+0x105", "-0x100"}});
+    EXPECT_EQ((texts{"ifcfg-eth0", "ifcfg-eth1"}), list_dir("/etc/sysconfig/network-scripts"));
+    EXPECT_EQ(kEth0, read_file(ifcfg("eth0")));
+}
+
+TEST_F(net_link_aggr_conf_del, KOVANetLinkAggrConfDel_interfaceThatIsNoBond_keepsItsFile) {
+    for (const std::string &name : texts{"eth1", "eth7"}) {
+        request(name, {});
+        EXPECT_OUTCOME(del(), refusal(kUnit, "'\\0' != *pOpt->aszSlaves[0]"));
+    }
+    expect_untouched();
+}
+
 TEST_F(net_link_aggr_conf_del, KOVANetLinkAggrConfDel_badArguments_areRefused) {
     EXPECT_OUTCOME(rig.observe([] { return KOVANetLinkAggrConfDel(nullptr); }), refusal(kUnit, "NULL != pOpt"));
     request("", {"eth0", "eth1"});
@@ -175,8 +190,6 @@ TEST_F(net_link_aggr_conf_del, KOVANetLinkAggrConfDel_badArguments_areRefused) {
     EXPECT_OUTCOME(del(), refusal(kUnit, "has_usable_name(*pOpt)"));
     request("bond0", {"eth0", "../x"});
     EXPECT_OUTCOME(del(), refusal(kUnit, "has_usable_slaves(*pOpt)"));
-    request("bond0", {});
-    EXPECT_OUTCOME(del(), refusal(kUnit, "'\\0' != *pOpt->aszSlaves[0]"));
     request("bond0", {"", "eth1"});
     EXPECT_OUTCOME(del(), refusal(kUnit, "'\\0' != *pOpt->aszSlaves[0]"));
     expect_untouched();

@@ -1,9 +1,7 @@
-#include "support/fake_kernel.h"
+#include "vlan_change.h"
 
 #include <cstring>
 #include <kovanetsdk/link.h>
-#include <optional>
-#include <sys/stat.h>
 
 using namespace kova_test;
 
@@ -55,42 +53,21 @@ const std::string kVlanFile = "DEVICE=eth0.10\n"
                               "IPV6PREFIXLENG=64\n"
                               "IPV6DNS=2001:db8::53\n";
 
-const texts kCommands{"/etc/rc.network stop eth0",
-                      "/etc/rc.network start eth0 eth0.10",
-                      "/usr/kova/bin/kovafirewall --change-adapter eth0 eth0.10",
-                      "/usr/kova/bin/kovafirewall --change-security-adapter eth0 eth0.10",
-                      "/usr/kova/bin/tctool -change_interface eth0 eth0.10",
-                      "/etc/rc.network nat-restart-dhcp"};
-const std::string kStart = kCommands[1];
-
 const texts kPppoeLock{"+0x806", "-0x800"};
-const texts kAllLocks{"+0x806", "-0x800", "+0x806", "-0x800"};
-
-std::string arguments(int result) {
-    return " ORIGIN_IFNAME=[eth0] IFNAME=[eth0.10] RESULT=" + std::to_string(result);
-}
-
-texts events(int result) {
-    return {"net/ifname_change 4" + arguments(0), "net/ifname_change 5" + arguments(0) + arguments(result)};
-}
-
-texts first(const texts &all, size_t number) {
-    return {all.begin(), all.begin() + static_cast<long>(number)};
-}
-
-mode_t mode_of(const std::string &path) {
-    struct stat status = {};
-    return stat(path.c_str(), &status) == 0 ? status.st_mode & 07777U : 0;
-}
 
 } // namespace
 
-class net_vlan_create : public unit_test {
+class net_vlan_create : public vlan_change {
 protected:
-    void SetUp() override { begin(); }
+    net_vlan_create()
+        : vlan_change{"net_vlan_create",
+                      "eth0",
+                      "eth0.10",
+                      {"/etc/rc.network stop eth0", "/etc/rc.network start eth0 eth0.10"},
+                      {"+0x806", "-0x800", "+0x806", "-0x800"}} {}
 
     /** An appliance with eth0, whose MTU is set, and no VLAN. */
-    void begin() {
+    void begin() override {
         unit_test::SetUp();
         rig = {};
         kernel.emplace(rig);
@@ -106,41 +83,43 @@ protected:
     outcome create(const char *row = "eth0", int id = 10) {
         return rig.observe([&] { return KLIBNetVlanCreate(row, id, &ip); });
     }
-    /** What a call did that changed nothing and announced nothing. */
-    void expect_untouched() {
-        EXPECT_EQ(kRowFile, read_file(ifcfg("eth0")));
-        EXPECT_EQ("eth0_mtu=\"9000\"\n", read_file("/etc/kovainfo.conf"));
-        EXPECT_EQ(texts{"ifcfg-eth0"}, list_dir("/etc/sysconfig/network-scripts"));
+    outcome change() override { return create(); }
+    void expect_files(progress reached) override {
+        EXPECT_EQ(reached >= kRow ? kNewRowFile : kRowFile, read_file(ifcfg("eth0")));
+        EXPECT_EQ(reached == kAll ? kVlanFile : "<absent>", read_file(ifcfg("eth0.10")));
+        EXPECT_EQ(reached == kNothing ? "eth0_mtu=\"9000\"\n" : "eth0_mtu=\"9000\"\neth0.10_mtu=\"9000\"\n",
+                  read_file("/etc/kovainfo.conf"));
+        EXPECT_EQ(reached == kAll ? (texts{"ifcfg-eth0", "ifcfg-eth0.10"}) : texts{"ifcfg-eth0"},
+                  list_dir("/etc/sysconfig/network-scripts"))
+            << "no temporary stays";
+        if (reached == kAll) {
+            EXPECT_EQ(0644U, mode_of(ifcfg("eth0")));
+        }
     }
-
+    void expect_untouched() { expect_files(kNothing); }
     /** What a call did that made the VLAN. */
-    static void expect_moved() {
-        EXPECT_EQ(kNewRowFile, read_file(ifcfg("eth0")));
-        EXPECT_EQ(kVlanFile, read_file(ifcfg("eth0.10")));
-        EXPECT_EQ("eth0_mtu=\"9000\"\neth0.10_mtu=\"9000\"\n", read_file("/etc/kovainfo.conf"));
-        EXPECT_EQ((texts{"ifcfg-eth0", "ifcfg-eth0.10"}), list_dir("/etc/sysconfig/network-scripts"));
-        EXPECT_EQ(0644U, mode_of(ifcfg("eth0")));
+    void expect_moved() {
+        expect_files(kAll);
         EXPECT_EQ(0644U, mode_of(ifcfg("eth0.10")));
     }
 
-    std::optional<fake_kernel> kernel;
     NETINFO ip{.nIPSource = 1, .szIP = "192.168.1.10", .szMask = "255.255.255.0"};
 };
 
 TEST_F(net_vlan_create, KLIBNetVlanCreate_staticAddress_movesTheConfigurationToTheVlan) {
-    EXPECT_OUTCOME(create(), {.commands = kCommands, .events = events(0), .locks = kAllLocks, .sleeps = {2000}});
+    EXPECT_OUTCOME(create(), done());
     expect_moved();
 }
 
 TEST_F(net_vlan_create, KLIBNetVlanCreate_signal_doesNotShortenTheWait) {
     rig.fail("nanosleep");
-    EXPECT_OUTCOME(create(), {.commands = kCommands, .events = events(0), .locks = kAllLocks, .sleeps = {1000, 1000}});
+    EXPECT_OUTCOME(create(), {.commands = commands_, .events = events(0), .locks = locks_, .sleeps = {1000, 1000}});
 }
 
 TEST_F(net_vlan_create, KLIBNetVlanCreate_dhcp_looksAtNoAddress) {
     ip = {.szIP = "no address", .szMask = "no mask"};
     write_file(ifcfg("eth0"), "DEVICE=eth0\n");
-    EXPECT_OUTCOME(create(), {.commands = kCommands, .events = events(0), .locks = kAllLocks, .sleeps = {2000}});
+    EXPECT_OUTCOME(create(), done());
     EXPECT_EQ("DEVICE=eth0.10\nVLAN_ROW_DEVICE=eth0\nVLAN_ID=10\nONBOOT=yes\nBOOTPROTO=dhcp\n",
               read_file(ifcfg("eth0.10")));
     EXPECT_EQ("DEVICE=eth0\nBOOTPROTO=none\nIPV6INIT=off\n", read_file(ifcfg("eth0")));
@@ -150,11 +129,11 @@ TEST_F(net_vlan_create, KLIBNetVlanCreate_settings_areThereBetweenStopAndStart) 
     std::string at_stop;
     std::string at_start;
     texts names;
-    rig.answer(kCommands[0], 1, "", [&] {
+    rig.answer(commands_[0], 1, "", [&] {
         at_stop = read_file(ifcfg("eth0")) + read_file(ifcfg("eth0.10"));
         names = list_dir("/etc/sysconfig/network-scripts");
     });
-    rig.answer(kStart, 127, "", [&] { at_start = read_file(ifcfg("eth0")) + read_file(ifcfg("eth0.10")); });
+    rig.answer(commands_[1], 127, "", [&] { at_start = read_file(ifcfg("eth0")) + read_file(ifcfg("eth0.10")); });
     EXPECT_EQ(0, create().result) << "what the script answers is not looked at";
     EXPECT_EQ(kRowFile + "<absent>", at_stop);
     ASSERT_EQ(3U, names.size()) << "the new files are written, and wait for their places";
@@ -315,29 +294,14 @@ TEST_F(net_vlan_create, KLIBNetVlanCreate_eachStepFails_stopsThereAndTellsTheRes
     const std::string mine = "net_vlan_create";
     const std::string begins = "ERR net_vlan_create:N ";
     const std::string no_mtu = begins + "Set mtu config eth0.10 mtu=";
-    const std::string no_tool = " -change_interface eth0 eth0.10";
-    const auto tool = [&](size_t number) { rig.answer(kCommands[number], 1); };
-
-    enum files { kOld, kMtu, kRow, kBoth };
-    struct step {
-        const char *name;
-        std::function<void()> arrange;
-        unsigned code;
-        std::string unit;
-        texts log;
-        files state;
-        size_t commands;
-        size_t locks = kAllLocks.size();
-        std::string last_command{}; ///< beyond those of every call
-    };
-    const step steps[] = {
+    std::vector<step> steps{
         {"lock of PPPoE",
          [&] { rig.fail("KLIBCFileLock"); },
          0x400,
          "pppoe_check_status",
          {"ERR pppoe_check_status:N KLIBCFileLock() failed.(400)",
           begins + "Disable PPPoE interface eth0 Failed.[0x0400 pppoe_check_status:N]"},
-         kOld,
+         kNothing,
          0,
          0},
         {"switch of PPPoE",
@@ -345,7 +309,7 @@ TEST_F(net_vlan_create, KLIBNetVlanCreate_eachStepFails_stopsThereAndTellsTheRes
          0x900,
          "platform",
          {begins + "Disable PPPoE interface eth0 Failed.[0x0900 platform:N]"},
-         kOld,
+         kNothing,
          0,
          2},
         {"lock of PPPoE is given back",
@@ -353,7 +317,7 @@ TEST_F(net_vlan_create, KLIBNetVlanCreate_eachStepFails_stopsThereAndTellsTheRes
          0xD00,
          "platform",
          {begins + "Disable PPPoE interface eth0 Failed.[0x0D00 platform:N]"},
-         kOld,
+         kNothing,
          0,
          2},
         {"MTU is read",
@@ -361,7 +325,7 @@ TEST_F(net_vlan_create, KLIBNetVlanCreate_eachStepFails_stopsThereAndTellsTheRes
          0x900,
          "platform",
          {"ERR conf_get_mtu_value (N) Failed to get eth0_mtu (900)", no_mtu + " Failed.[0x0900 platform:N]"},
-         kOld,
+         kNothing,
          0,
          2},
         {"lock of the MTU",
@@ -370,7 +334,7 @@ TEST_F(net_vlan_create, KLIBNetVlanCreate_eachStepFails_stopsThereAndTellsTheRes
          "platform",
          {"ERR conf_get_mtu_value:N Failed to lock kovainfo [0x0400 platform:N]",
           no_mtu + "9000 Failed.[0x0400 platform:N]"},
-         kOld,
+         kNothing,
          0,
          2},
         {"MTU is stored",
@@ -379,7 +343,7 @@ TEST_F(net_vlan_create, KLIBNetVlanCreate_eachStepFails_stopsThereAndTellsTheRes
          "platform",
          {"ERR conf_get_mtu_value:N Failed to set eth0.10 MTU config value[0x0B00 platform:N]",
           no_mtu + "9000 Failed.[0x0B00 platform:N]"},
-         kOld,
+         kNothing,
          0},
         {"lock of the MTU is given back",
          [&] { rig.fail("KLIBCFileUnlock", 2); },
@@ -447,147 +411,41 @@ TEST_F(net_vlan_create, KLIBNetVlanCreate_eachStepFails_stopsThereAndTellsTheRes
          0,
          "",
          {begins + "change " + vlan_path + "'s mode failed"},
-         kBoth,
+         kAll,
          1},
-        {"firewall", [&] { tool(2); }, 0, "", {begins + "Failed to /usr/kova/bin/kovafirewall" + no_tool}, kBoth, 3},
-        {"firewall's rules",
-         [&] { tool(3); },
-         0,
-         "",
-         {begins + "Failed to /usr/kova/bin/kovafirewall" + no_tool},
-         kBoth,
-         4},
-        {"traffic control", [&] { tool(4); }, 0, "", {begins + "Failed to /usr/kova/bin/tctool" + no_tool}, kBoth, 5},
-        {"DHCP server's files",
-         [&] {
-             shell("mkdir /etc/dhcpd");
-             rig.fail("KLIBCFileEnumDir");
-         },
-         0x900,
-         "platform",
-         {"ERR dhcpd_conf_change_interface:N bad enum [dhcpd-eth0-subnet] in [/etc/dhcpd]",
-          "ERR dhcpd_conf_change_interface:N Failed to move DHCP tag conf from [eth0] to [eth0.10]"},
-         kBoth,
-         5},
-        {"DHCP server's switch",
-         [&] {
-             write_file("/etc/dhcpd/dhcpd-eth0.info", "enable=yes\n");
-             rig.fail("rename", 3);
-         },
-         0,
-         "",
-         {"ERR dhcpd_conf_change_interface:N Failed to rename "
-          "[/etc/dhcpd/dhcpd-eth0.info][/etc/dhcpd/dhcpd-eth0.10.info]",
-          "ERR dhcpd_conf_change_interface:N Failed to move interface global setting from [eth0] to [eth0.10]"},
-         kBoth,
-         5},
-        {"DHCP server's subnets",
-         [&] {
-             write_file("/etc/dhcpd/dhcpd-eth0-subnet0.conf", "interface=eth0\n");
-             rig.answer("/bin/sed", 1);
-         },
-         0,
-         "",
-         {"ERR dhcpd_conf_change_interface:N Failed to sed [/bin/sed -i s/eth0/eth0.10/g "
-          "/etc/dhcpd/dhcpd-eth0.10-subnet0.conf]",
-          "ERR dhcpd_conf_change_interface:N Failed to replace tag in [/etc/dhcpd/dhcpd-eth0.10-subnet0.conf]",
-          "ERR dhcpd_conf_change_interface:N Failed to move DHCP tag conf from [eth0] to [eth0.10]"},
-         kBoth,
-         5,
-         kAllLocks.size(),
-         "/bin/sed -i s/eth0/eth0.10/g /etc/dhcpd/dhcpd-eth0.10-subnet0.conf"},
-        {"DHCP server", [&] { tool(5); }, 0, "", {}, kBoth, 6},
     };
-    for (const step &step : steps) {
-        SCOPED_TRACE(step.name);
-        begin();
-        step.arrange();
-        const outcome got = create();
-        outcome expected{.result = -1,
-                         .code = step.code,
-                         .unit = step.unit,
-                         .log = step.log,
-                         .commands = first(kCommands, step.commands),
-                         .events = events(-1),
-                         .locks = first(kAllLocks, step.locks)};
-        if (!step.last_command.empty()) {
-            expected.commands.push_back(step.last_command);
-        }
-        if (step.commands > 1) {
-            expected.sleeps = {2000};
-        }
-        EXPECT_OUTCOME(got, expected);
-        EXPECT_EQ(step.state >= kRow ? kNewRowFile : kRowFile, read_file(row_path));
-        EXPECT_EQ(step.state == kBoth ? kVlanFile : "<absent>", read_file(vlan_path));
-        EXPECT_EQ(step.state == kOld ? "eth0_mtu=\"9000\"\n" : "eth0_mtu=\"9000\"\neth0.10_mtu=\"9000\"\n",
-                  read_file("/etc/kovainfo.conf"));
-        EXPECT_EQ(step.state == kBoth ? (texts{"ifcfg-eth0", "ifcfg-eth0.10"}) : texts{"ifcfg-eth0"},
-                  list_dir("/etc/sysconfig/network-scripts"))
-            << "no temporary stays";
+    for (step &one : steps_after_files(3)) {
+        steps.push_back(std::move(one));
     }
+    fail_each(steps);
 }
 
 TEST_F(net_vlan_create, KLIBNetVlanCreate_rowFileThatCannotBeReplaced_failsSilently) {
-    rig.answer(kCommands[0], 0, "", [&] { shell("rm " + ifcfg("eth0") + " && mkdir " + ifcfg("eth0")); });
-    EXPECT_OUTCOME(create(), {.result = -1, .commands = {kCommands[0]}, .events = events(-1), .locks = kAllLocks});
+    rig.answer(commands_[0], 0, "", [&] { shell("rm " + ifcfg("eth0") + " && mkdir " + ifcfg("eth0")); });
+    EXPECT_OUTCOME(create(), {.result = -1, .commands = {commands_[0]}, .events = events(-1), .locks = locks_});
     EXPECT_EQ(texts{"ifcfg-eth0"}, list_dir("/etc/sysconfig/network-scripts"));
 }
 
 TEST_F(net_vlan_create, KLIBNetVlanCreate_vlanFileThatCannotBeReplaced_failsSilently) {
     shell("mkdir " + ifcfg("eth0.10"));
-    EXPECT_OUTCOME(create(), {.result = -1, .commands = {kCommands[0]}, .events = events(-1), .locks = kAllLocks});
+    EXPECT_OUTCOME(create(), {.result = -1, .commands = {commands_[0]}, .events = events(-1), .locks = locks_});
     EXPECT_EQ(kNewRowFile, read_file(ifcfg("eth0")));
     EXPECT_EQ((texts{"ifcfg-eth0", "ifcfg-eth0.10"}), list_dir("/etc/sysconfig/network-scripts"));
 }
 
 TEST_F(net_vlan_create, KLIBNetVlanCreate_eventThatCannotBeOpened_changesNothing) {
-    rig.fail("KLIBPluginSDKInit");
-    EXPECT_OUTCOME(create(), {.result = -1,
-                              .code = 0x200,
-                              .unit = "platform",
-                              .log = {"ERR net_vlan_create:N Fail to init plugin) [0x0200 platform:N]"}});
-    expect_untouched();
+    event_that_cannot_be_opened();
 }
 
 TEST_F(net_vlan_create, KLIBNetVlanCreate_eventThatFails_isLoggedAlone) {
-    for (const int nth : {1, 2}) {
-        begin();
-        rig.fail("KLIBPluginAction", nth);
-        EXPECT_OUTCOME(create(), {.code = 0x2A00,
-                                  .unit = "platform",
-                                  .log = {std::string("ERR net_vlan_create:N Fail to execute net plugin (") +
-                                          (nth == 1 ? "PRE" : "POST") + ") [0x2A00 platform:N]"},
-                                  .commands = kCommands,
-                                  .events = events(0),
-                                  .locks = kAllLocks,
-                                  .sleeps = {2000}});
-        expect_moved();
-    }
+    events_that_fail();
 }
 
 TEST_F(net_vlan_create, KLIBNetVlanCreate_eventThatIsNotOpen_isNotRaised) {
-    for (const int nth : {1, 2}) {
-        begin();
-        rig.fail("KLIBPluginHasInit", nth);
-        const outcome got = create();
-        EXPECT_EQ(0, got.result);
-        EXPECT_EQ(texts{}, got.log);
-        EXPECT_EQ(nth == 1 ? texts{"net/ifname_change 5" + arguments(0)} : first(events(0), 1), got.events);
-        expect_moved();
-    }
+    events_that_are_not_open();
 }
 
 TEST_F(net_vlan_create, KLIBNetVlanCreate_eventArgumentsThatCannotBeSet_areLoggedAlone) {
-    rig.fail("KLIBPluginSetArgByArray", 1);
-    const outcome got = create();
-    EXPECT_EQ(0, got.result);
-    EXPECT_EQ(texts{"ERR net_vlan_create:N Fail to execute net plugin (PRE) [0x0200 platform:N]"}, got.log);
-    EXPECT_EQ(texts{"net/ifname_change 5" + arguments(0)}, got.events);
-    expect_moved();
-    begin();
-    rig.fail("KLIBPluginSetArgByInt", 2);
-    const outcome after = create();
-    EXPECT_EQ(0, after.result);
-    EXPECT_EQ(texts{"ERR net_vlan_create:N Fail to execute net plugin (POST) [0x0200 platform:N]"}, after.log);
-    EXPECT_EQ(first(events(0), 1), after.events);
+    event_arguments_that_cannot_be_set_before("KLIBPluginSetArgByArray", 1, "");
+    event_arguments_that_cannot_be_set_after("KLIBPluginSetArgByInt", 2);
 }

@@ -1,8 +1,6 @@
-#include "support/fake_kernel.h"
+#include "vlan_change.h"
 
 #include <kovanetsdk/link.h>
-#include <optional>
-#include <sys/stat.h>
 
 using namespace kova_test;
 
@@ -60,34 +58,19 @@ const std::string kNewRowFile = "# the office\n"
 const std::string kInfo = "eth0_mtu=\"9000\"\neth0.10_mtu=\"9000\"\n";
 const std::string kNewInfo = "eth0_mtu=\"9000\"\n";
 
-const texts kCommands{"/etc/rc.network stop eth0 eth0.10",
-                      "/etc/rc.network start eth0",
-                      "/usr/kova/bin/kovafirewall --change-adapter eth0.10 eth0",
-                      "/usr/kova/bin/kovafirewall --change-security-adapter eth0.10 eth0",
-                      "/usr/kova/bin/tctool -change_interface eth0.10 eth0",
-                      "/etc/rc.network nat-restart-dhcp"};
-const texts kLocks{"+0x806", "-0x800"};
-
-std::string arguments(int result) {
-    return " ORIGIN_IFNAME=[eth0.10] IFNAME=[eth0] RESULT=" + std::to_string(result);
-}
-
-texts events(int result) {
-    return {"net/ifname_change 4" + arguments(0), "net/ifname_change 5" + arguments(0) + arguments(result)};
-}
-
-texts first(const texts &all, size_t number) {
-    return {all.begin(), all.begin() + static_cast<long>(number)};
-}
-
 } // namespace
 
-class net_vlan_remove : public unit_test {
+class net_vlan_remove : public vlan_change {
 protected:
-    void SetUp() override { begin(); }
+    net_vlan_remove()
+        : vlan_change{"net_vlan_remove",
+                      "eth0.10",
+                      "eth0",
+                      {"/etc/rc.network stop eth0 eth0.10", "/etc/rc.network start eth0"},
+                      {"+0x806", "-0x800"}} {}
 
     /** An appliance with the VLAN eth0.10. */
-    void begin() {
+    void begin() override {
         unit_test::SetUp();
         rig = {};
         kernel.emplace(rig);
@@ -100,33 +83,31 @@ protected:
     outcome remove(const char *vlan = "eth0.10") {
         return rig.observe([=] { return KLIBNetVlanRemove(vlan); });
     }
-    static void expect_untouched() {
-        EXPECT_EQ(kRowFile, read_file(ifcfg("eth0")));
-        EXPECT_EQ(kVlanFile, read_file(ifcfg("eth0.10")));
-        EXPECT_EQ(kInfo, read_file("/etc/kovainfo.conf"));
+    outcome change() override { return remove(); }
+    void expect_files(progress reached) override {
+        EXPECT_EQ(reached >= kRow ? kNewRowFile : kRowFile, read_file(ifcfg("eth0")));
+        EXPECT_EQ(reached == kAll ? "<absent>" : kVlanFile, read_file(ifcfg("eth0.10")));
+        EXPECT_EQ(reached == kNothing ? kInfo : kNewInfo, read_file("/etc/kovainfo.conf"));
+        EXPECT_EQ(reached == kAll ? texts{"ifcfg-eth0"} : (texts{"ifcfg-eth0", "ifcfg-eth0.10"}),
+                  list_dir("/etc/sysconfig/network-scripts"))
+            << "no temporary stays";
+        if (reached == kAll) {
+            EXPECT_EQ(0644U, mode_of(ifcfg("eth0")));
+        }
     }
-
+    void expect_untouched() { expect_files(kNothing); }
     /** What a call did that removed the VLAN. */
-    static void expect_given_back() {
-        EXPECT_EQ(kNewRowFile, read_file(ifcfg("eth0")));
-        EXPECT_EQ(texts{"ifcfg-eth0"}, list_dir("/etc/sysconfig/network-scripts"));
-        EXPECT_EQ(kNewInfo, read_file("/etc/kovainfo.conf"));
-        struct stat status = {};
-        EXPECT_EQ(0, stat(ifcfg("eth0").c_str(), &status));
-        EXPECT_EQ(0644U, status.st_mode & 07777U);
-    }
-
-    std::optional<fake_kernel> kernel;
+    void expect_given_back() { expect_files(kAll); }
 };
 
 TEST_F(net_vlan_remove, KLIBNetVlanRemove_vlan_givesItsConfigurationBack) {
-    EXPECT_OUTCOME(remove(), {.commands = kCommands, .events = events(0), .locks = kLocks, .sleeps = {2000}});
+    EXPECT_OUTCOME(remove(), done());
     expect_given_back();
 }
 
 TEST_F(net_vlan_remove, KLIBNetVlanRemove_signal_doesNotShortenTheWait) {
     rig.fail("nanosleep");
-    EXPECT_OUTCOME(remove(), {.commands = kCommands, .events = events(0), .locks = kLocks, .sleeps = {1000, 1000}});
+    EXPECT_OUTCOME(remove(), {.commands = commands_, .events = events(0), .locks = locks_, .sleeps = {1000, 1000}});
 }
 
 TEST_F(net_vlan_remove, KLIBNetVlanRemove_filesForTheirOwnerAlone_areReadableByAll) {
@@ -153,11 +134,11 @@ TEST_F(net_vlan_remove, KLIBNetVlanRemove_files_changeBetweenStopAndStart) {
     std::string at_stop;
     std::string at_start;
     texts names;
-    rig.answer(kCommands[0], 1, "", [&] {
+    rig.answer(commands_[0], 1, "", [&] {
         at_stop = read_file(ifcfg("eth0")) + read_file(ifcfg("eth0.10"));
         names = list_dir("/etc/sysconfig/network-scripts");
     });
-    rig.answer(kCommands[1], 127, "", [&] { at_start = read_file(ifcfg("eth0")) + read_file(ifcfg("eth0.10")); });
+    rig.answer(commands_[1], 127, "", [&] { at_start = read_file(ifcfg("eth0")) + read_file(ifcfg("eth0.10")); });
     EXPECT_EQ(0, remove().result) << "what the script answers is not looked at";
     EXPECT_EQ(kRowFile + kVlanFile, at_stop);
     ASSERT_EQ(3U, names.size()) << "the new file is written, and waits for its place";
@@ -218,54 +199,20 @@ TEST_F(net_vlan_remove, KLIBNetVlanRemove_noSocket_is3400) {
 }
 
 TEST_F(net_vlan_remove, KLIBNetVlanRemove_eventThatCannotBeOpened_changesNothing) {
-    rig.fail("KLIBPluginSDKInit");
-    EXPECT_OUTCOME(remove(), {.result = -1,
-                              .code = 0x200,
-                              .unit = "platform",
-                              .log = {"ERR net_vlan_remove:N Fail to init plugin) [0x0200 platform:N]"}});
-    expect_untouched();
+    event_that_cannot_be_opened();
 }
 
 TEST_F(net_vlan_remove, KLIBNetVlanRemove_eventThatFails_isLoggedAlone) {
-    for (const int nth : {1, 2}) {
-        begin();
-        rig.fail("KLIBPluginAction", nth);
-        EXPECT_OUTCOME(remove(), {.code = 0x2A00,
-                                  .unit = "platform",
-                                  .log = {std::string("ERR net_vlan_remove:N Fail to execute net plugin (") +
-                                          (nth == 1 ? "PRE" : "POST") + ") [0x2A00 platform:N]"},
-                                  .commands = kCommands,
-                                  .events = events(0),
-                                  .locks = kLocks,
-                                  .sleeps = {2000}});
-        expect_given_back();
-    }
+    events_that_fail();
 }
 
 TEST_F(net_vlan_remove, KLIBNetVlanRemove_eventThatIsNotOpen_isNotRaised) {
-    for (const int nth : {1, 2}) {
-        begin();
-        rig.fail("KLIBPluginHasInit", nth);
-        const outcome got = remove();
-        EXPECT_EQ(0, got.result);
-        EXPECT_EQ(texts{}, got.log);
-        EXPECT_EQ(nth == 1 ? texts{"net/ifname_change 5" + arguments(0)} : first(events(0), 1), got.events);
-        expect_given_back();
-    }
+    events_that_are_not_open();
 }
 
 TEST_F(net_vlan_remove, KLIBNetVlanRemove_eventArgumentsThatCannotBeSet_areLoggedAlone) {
-    for (const int nth : {1, 2}) {
-        begin();
-        rig.fail("KLIBPluginSetArgByInt", nth);
-        const outcome got = remove();
-        EXPECT_EQ(0, got.result);
-        EXPECT_EQ(texts{std::string("ERR net_vlan_remove:N Fail to execute net plugin (") +
-                        (nth == 1 ? "PRE" : "POST") + ") [0x0200 platform:N]"},
-                  got.log);
-        EXPECT_EQ(1U, got.events.size());
-        expect_given_back();
-    }
+    event_arguments_that_cannot_be_set_before("KLIBPluginSetArgByInt", 1, " ORIGIN_IFNAME=[eth0.10] IFNAME=[eth0]");
+    event_arguments_that_cannot_be_set_after("KLIBPluginSetArgByInt", 2);
 }
 
 // ---- each step fails in turn
@@ -275,160 +222,85 @@ TEST_F(net_vlan_remove, KLIBNetVlanRemove_eachStepFails_stopsThereAndTellsTheRes
     const std::string vlan_path = ifcfg("eth0.10");
     const std::string mine = "net_vlan_remove";
     const std::string begins = "ERR net_vlan_remove:N ";
-    const std::string no_tool = " -change_interface eth0.10 eth0";
-    const auto tool = [&](size_t number) { rig.answer(kCommands[number], 1); };
-
-    enum files { kOld, kNoMtu, kRow, kGone };
-    struct step {
-        const char *name;
-        std::function<void()> arrange;
-        unsigned code;
-        std::string unit;
-        texts log;
-        files state;
-        size_t commands;
-        std::string last_command{}; ///< beyond those of every call
-    };
-    const step steps[] = {
+    std::vector<step> steps{
         {"lock of PPPoE",
          [&] { rig.fail("KLIBCFileLock"); },
          0x400,
          "pppoe_check_status",
          {"ERR pppoe_check_status:N KLIBCFileLock() failed.(400)",
           begins + "Disable PPPoE interface eth0.10 Failed.[0x0400 pppoe_check_status:N]"},
-         kOld,
+         kNothing,
+         0,
          0},
         {"switch of PPPoE",
          [&] { rig.fail("KLIBCFileGetKeyValue"); },
          0x900,
          "platform",
          {begins + "Disable PPPoE interface eth0.10 Failed.[0x0900 platform:N]"},
-         kOld,
+         kNothing,
          0},
         {"lock of PPPoE is given back",
          [&] { rig.fail("KLIBCFileUnlock"); },
          0xD00,
          "platform",
          {begins + "Disable PPPoE interface eth0.10 Failed.[0x0D00 platform:N]"},
-         kOld,
+         kNothing,
          0},
-        {"file is made", [&] { rig.fail("KLIBCFileTempFileOpen"); }, 0x900, "platform", {}, kNoMtu, 0},
+        {"file is made", [&] { rig.fail("KLIBCFileTempFileOpen"); }, 0x900, "platform", {}, kMtu, 0},
         {"row file is opened",
          [&] { rig.hide(row_path); },
          0x900,
          mine,
          {begins + "Failed to open " + row_path + ": No such file or directory"},
-         kNoMtu,
+         kMtu,
          0},
         {"row file is read",
          [&] { rig.redirect(row_path, "/etc"); },
          0x900,
          mine,
          {begins + "Failed to read " + row_path + ": Is a directory"},
-         kNoMtu,
+         kMtu,
          0},
         {"VLAN file is opened",
          [&] { rig.hide(vlan_path); },
          0x900,
          mine,
          {begins + "Failed to open " + vlan_path + ": No such file or directory"},
-         kNoMtu,
+         kMtu,
          0},
         {"VLAN file is read",
          [&] { rig.redirect(vlan_path, "/etc"); },
          0x900,
          mine,
          {begins + "Failed to read " + vlan_path + ": Is a directory"},
-         kNoMtu,
+         kMtu,
          0},
         {"file reaches the disk",
          [&] { rig.fail("fsync", 3); },
          0xB00,
          mine,
          {begins + "Failed to write " + row_path + ": Input/output error"},
-         kNoMtu,
+         kMtu,
          0},
-        {"file takes its place", [&] { rig.fail("rename", 1); }, 0, "", {}, kNoMtu, 1},
+        {"file takes its place", [&] { rig.fail("rename", 1); }, 0, "", {}, kMtu, 1},
         {"file's mode", [&] { rig.fail("chmod"); }, 0, "", {begins + "change " + row_path + "'s mode failed"}, kRow, 1},
-        {"firewall", [&] { tool(2); }, 0, "", {begins + "Failed to /usr/kova/bin/kovafirewall" + no_tool}, kGone, 3},
-        {"firewall's rules",
-         [&] { tool(3); },
-         0,
-         "",
-         {begins + "Failed to /usr/kova/bin/kovafirewall" + no_tool},
-         kGone,
-         4},
-        {"traffic control", [&] { tool(4); }, 0, "", {begins + "Failed to /usr/kova/bin/tctool" + no_tool}, kGone, 5},
-        {"DHCP server's files",
-         [&] {
-             shell("mkdir /etc/dhcpd");
-             rig.fail("KLIBCFileEnumDir");
-         },
-         0x900,
-         "platform",
-         {"ERR dhcpd_conf_change_interface:N bad enum [dhcpd-eth0.10-subnet] in [/etc/dhcpd]",
-          "ERR dhcpd_conf_change_interface:N Failed to move DHCP tag conf from [eth0.10] to [eth0]"},
-         kGone,
-         5},
-        {"DHCP server's switch",
-         [&] {
-             write_file("/etc/dhcpd/dhcpd-eth0.10.info", "enable=yes\n");
-             rig.fail("rename", 2);
-         },
-         0,
-         "",
-         {"ERR dhcpd_conf_change_interface:N Failed to rename "
-          "[/etc/dhcpd/dhcpd-eth0.10.info][/etc/dhcpd/dhcpd-eth0.info]",
-          "ERR dhcpd_conf_change_interface:N Failed to move interface global setting from [eth0.10] to [eth0]"},
-         kGone,
-         5},
-        {"DHCP server's subnets",
-         [&] {
-             write_file("/etc/dhcpd/dhcpd-eth0.10-subnet0.conf", "interface=eth0.10\n");
-             rig.answer("/bin/sed", 1);
-         },
-         0,
-         "",
-         {"ERR dhcpd_conf_change_interface:N Failed to sed [/bin/sed -i s/eth0.10/eth0/g "
-          "/etc/dhcpd/dhcpd-eth0-subnet0.conf]",
-          "ERR dhcpd_conf_change_interface:N Failed to replace tag in [/etc/dhcpd/dhcpd-eth0-subnet0.conf]",
-          "ERR dhcpd_conf_change_interface:N Failed to move DHCP tag conf from [eth0.10] to [eth0]"},
-         kGone,
-         5,
-         "/bin/sed -i s/eth0.10/eth0/g /etc/dhcpd/dhcpd-eth0-subnet0.conf"},
-        {"DHCP server", [&] { tool(5); }, 0, "", {}, kGone, 6},
     };
-    for (const step &step : steps) {
-        SCOPED_TRACE(step.name);
-        begin();
-        step.arrange();
-        const outcome got = remove();
-        outcome expected{.result = -1,
-                         .code = step.code,
-                         .unit = step.unit,
-                         .log = step.log,
-                         .commands = first(kCommands, step.commands),
-                         .events = events(-1),
-                         .locks = step.code == 0x400 ? texts{} : kLocks};
-        if (!step.last_command.empty()) {
-            expected.commands.push_back(step.last_command);
-        }
-        if (step.commands > 1) {
-            expected.sleeps = {2000};
-        }
-        EXPECT_OUTCOME(got, expected);
-        EXPECT_EQ(step.state >= kRow ? kNewRowFile : kRowFile, read_file(row_path));
-        EXPECT_EQ(step.state == kGone ? "<absent>" : kVlanFile, read_file(vlan_path));
-        EXPECT_EQ(step.state == kOld ? kInfo : kNewInfo, read_file("/etc/kovainfo.conf"));
-        EXPECT_EQ(step.state == kGone ? texts{"ifcfg-eth0"} : (texts{"ifcfg-eth0", "ifcfg-eth0.10"}),
-                  list_dir("/etc/sysconfig/network-scripts"))
-            << "no temporary stays";
+    for (step &one : steps_after_files(2)) {
+        steps.push_back(std::move(one));
     }
+    fail_each(steps);
+}
+
+TEST_F(net_vlan_remove, KLIBNetVlanRemove_vlanFileThatStays_isNotLookedAt) {
+    rig.answer(commands_[0], 0, "", [] { shell("rm " + ifcfg("eth0.10") + " && mkdir " + ifcfg("eth0.10")); });
+    EXPECT_OUTCOME(remove(), done());
+    EXPECT_EQ(kNewRowFile, read_file(ifcfg("eth0")));
+    EXPECT_EQ((texts{"ifcfg-eth0", "ifcfg-eth0.10"}), list_dir("/etc/sysconfig/network-scripts"));
 }
 
 TEST_F(net_vlan_remove, KLIBNetVlanRemove_rowFileThatCannotBeReplaced_failsSilently) {
-    rig.answer(kCommands[0], 0, "", [&] { shell("rm " + ifcfg("eth0") + " && mkdir " + ifcfg("eth0")); });
-    EXPECT_OUTCOME(remove(), {.result = -1, .commands = {kCommands[0]}, .events = events(-1), .locks = kLocks});
+    rig.answer(commands_[0], 0, "", [&] { shell("rm " + ifcfg("eth0") + " && mkdir " + ifcfg("eth0")); });
+    EXPECT_OUTCOME(remove(), {.result = -1, .commands = {commands_[0]}, .events = events(-1), .locks = locks_});
     EXPECT_EQ(kVlanFile, read_file(ifcfg("eth0.10")));
     EXPECT_EQ((texts{"ifcfg-eth0", "ifcfg-eth0.10"}), list_dir("/etc/sysconfig/network-scripts"));
 }

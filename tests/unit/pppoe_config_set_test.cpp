@@ -37,11 +37,6 @@ std::string quoted(const std::string &user) {
     return text + "'";
 }
 
-mode_t mode_of(const std::string &path) {
-    struct stat status = {};
-    return stat(path.c_str(), &status) == 0 ? status.st_mode & 07777U : 0;
-}
-
 } // namespace
 
 class pppoe_config_set : public unit_test {

@@ -344,11 +344,11 @@ void change(const bond_words &words) {
     set_bond(wanted, "change " + words.name);
     const names before = members_of(current);
     const names after = members_of(wanted);
-    start_former(missing_in(before, after));
     if (before != after) { // who leaves gets its switches back, the bond keeps its own
         move_dhcp_server(false, words.name, before);
         move_dhcp_server(true, words.name, after);
     }
+    start_former(missing_in(before, after));
     require_in_kernel(wanted);
 }
 

@@ -4,6 +4,9 @@
 #include "errors.h"
 #include "objects.h"
 
+#include <cstring>
+#include <kova/core.h>
+#include <kovanetsdk/pppoe.h>
 #include <net/if.h>
 
 namespace kova {
@@ -134,6 +137,17 @@ plan checked(const vlan_words &words) {
     return wanted;
 }
 
+/** The library stops the connection before it changes the interface that it goes over. */
+std::vector<std::string> with_pppoe(std::vector<std::string> effects, const char *name) {
+    char dialled[IFNAMSIZ] = "";
+    if (KOVAPPPoECheckStatus(0) == 1 &&
+        KLIBCFileGetKeyValue("/etc/ppp/pppoe.conf", "ETH", dialled, sizeof dialled, 0) > 0 &&
+        strcmp(dialled, name) == 0) {
+        effects.push_back(std::string("The PPPoE connection over ") + name + " ends, and is switched off.");
+    }
+    return effects;
+}
+
 std::vector<std::string> effects_of(const plan &wanted) {
     std::vector<std::string> effects = {
         wanted.name + " is made on " + wanted.row_device + " and gets " + text_of(wanted.settings) + ".",
@@ -143,7 +157,7 @@ std::vector<std::string> effects_of(const plan &wanted) {
     if (has_file(wanted.name)) {
         effects.push_back("The file that " + wanted.name + " has from before is replaced.");
     }
-    return effects;
+    return with_pppoe(std::move(effects), wanted.row_device.c_str());
 }
 
 void create(const vlan_words &words) {
@@ -182,9 +196,11 @@ VLANINFO require_vlan(const std::string &name) {
 void remove(const vlan_words &words) {
     require_root();
     const VLANINFO shown = require_vlan(words.name);
-    confirm({loss_of(words.name) + " and is removed.",
-             std::string(shown.szRowDevice) + " gets its IPv6 settings and " + text_of(settings_of(words.name)) + ".",
-             "Connections over " + words.name + " end."},
+    confirm(with_pppoe({loss_of(words.name) + " and is removed.",
+                        std::string(shown.szRowDevice) + " gets its IPv6 settings and " +
+                            text_of(settings_of(words.name)) + ".",
+                        "Connections over " + words.name + " end."},
+                       words.name.c_str()),
             words.is_confirmed);
     const change_lock lock;
     require_vlan(words.name);

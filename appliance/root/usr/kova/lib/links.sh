@@ -75,8 +75,8 @@ make_vlan() {
         remove_link is_vlan "$1" &&
             ip link add link "$row_device" name "$1" type vlan id "$vlan_id" || fail "$1: cannot make the VLAN" || return
     fi
-    # a VLAN does not come up above what is down
-    ip link set dev "$row_device" up
+    # a VLAN does not come up above what is down, nor carries more than that
+    ip link set dev "$row_device" up && set_mtu "$row_device"
 }
 
 # join IF MASTER IS_KIND: the interface becomes a part of the bond or bridge, and is up
