@@ -1,7 +1,8 @@
 # box: --link eth0 --link lan0 --link lan1 --link lan2
-# needs: bonding bridge vlan
+# needs: bonding bridge dummy vlan
 """Bonds: made, changed and deleted by the library over links that run, with traffic while one of them is cut."""
 
+import contextlib
 import ctypes
 import pathlib
 import re
@@ -11,6 +12,8 @@ from conftest import SLOWNESS, DhcpServer, addresses, is_up, on_other_side, run,
 from sdk import STATIC, Bond, card, library, register
 
 SCRIPTS = pathlib.Path("/etc/sysconfig/network-scripts")
+PLUGIN = pathlib.Path("/usr/kova/plugins/net/ifname_change/50-pull-out")
+NETWORK_SCRIPT = pathlib.Path("/etc/rc.network")
 LINKS = ("lan0", "lan1", "lan2")
 UNKNOWN, ALB, LACP, XOR, BACKUP, ROUND_ROBIN, _, BALANCE_SLB = range(8)
 # mode: the kernel's name and number, what is added to the options, and the partner that goes with it
@@ -219,6 +222,75 @@ def test_a_bond_that_cannot_be_deleted_runs_on(partner):
     wait_for_partner()
     run("/etc/rc.network", "restart", "bond0")
     assert of_kernel("slaves") == "lan0 lan1"
+
+
+def plug_in_spare():
+    run("ip", "link", "add", "spare0", "type", "dummy")
+
+
+@pytest.fixture
+def spare():
+    """A card that can be pulled out."""
+    path("spare0").write_text(FILE.format("spare0", 3))
+    plug_in_spare()
+    yield
+    run("ip", "link", "del", "spare0", status=None)
+
+
+@contextlib.contextmanager
+def pulled_out_by(script, when):
+    """Meanwhile a script begins with pulling out the spare card, where a condition of the shell holds."""
+    before = script.read_text() if script.exists() else None
+    script.parent.mkdir(parents=True, exist_ok=True)
+    script.write_text(f"#!/bin/sh\nif {when}; then /sbin/ip link del spare0; fi\n{before or ''}")
+    script.chmod(0o755)
+    try:
+        yield
+    finally:
+        if before is None:
+            script.unlink()
+        else:
+            script.write_text(before)
+
+
+def all_files():
+    names = [file.name.removeprefix("ifcfg-") for file in SCRIPTS.glob("ifcfg-*")]
+    return {name: keys(name) for name in names}
+
+
+def test_a_member_that_vanishes_midway(spare, system_log):
+    """Nothing is given up for it: the other member works, and it belongs again once it is back."""
+
+    def set_and_lose(wanted):
+        system_log.messages.clear()
+        assert set_bond(wanted) == 0, register()
+        assert not pathlib.Path("/sys/class/net/spare0").exists()
+        wait_for(lambda: system_log.holds("spare0: there is no such interface"), 30, "the complaint")
+
+    before, members = all_files(), ("lan0", "spare0")
+    joined = {link: sorted([*before[link], "MASTER=bond0", "SLAVE=yes", "USERCTL=no"]) for link in members}
+    before_change, at_start = '[ "$PLUGIN_PHASE" = PRE ]', '[ "$1" = start ]'  # a change raises no event
+    for mode, script, when in (BACKUP, PLUGIN, before_change), (XOR, NETWORK_SCRIPT, at_start):
+        with pulled_out_by(script, when):
+            set_and_lose(bond(mode, members))
+        kernel_mode, more, _ = KERNEL_MODES[mode]
+        options = f'BONDING_OPTS="mode={kernel_mode[-1]} use_carrier=0 miimon=100 updelay=100{more}"'
+        bonded = sorted([*FILE.format("bond0", 0).splitlines(), "USERCTL=no", options])
+        assert all_files() == {**before, **joined, "bond0": bonded}
+        assert (of_kernel("mode"), of_kernel("slaves")) == (kernel_mode, "lan0")
+        assert addresses("bond0") == ["192.168.90.5/24"]
+        plug_in_spare()
+        run(NETWORK_SCRIPT, "restart", "bond0")
+        assert (of_kernel("slaves"), addresses("bond0")) == ("lan0 spare0", ["192.168.90.5/24"])
+
+    with pulled_out_by(PLUGIN, before_change):
+        set_and_lose(bond(UNKNOWN))
+    assert all_files() == {**before, "lan0.saved": bonded, "spare0.saved": joined["spare0"]}
+    assert not pathlib.Path("/sys/class/net/bond0").exists()
+    assert addresses("lan0") == ["192.168.90.5/24"]
+    plug_in_spare()
+    run(NETWORK_SCRIPT, "start", "spare0")
+    assert addresses("spare0") == ["192.168.93.5/24"]
 
 
 @pytest.fixture

@@ -434,6 +434,48 @@ def test_bond_create_change_and_delete(served):
     assert served("lan1") == ON_AGAIN
 
 
+def test_a_change_that_fails_halfway_is_told(served, keep):
+    keep("/usr/kova/bin/kovafirewall").write_text("#!/bin/sh\nexit 1\n")
+    text = complaint("vlan", "create", "lan0", "20", "keep", "--yes", status=CALL_FAILED)
+    assert text.startswith("cannot make lan0.20 whole, what was done stays (kovanet vlan list): ")
+    assert (kernel_addresses("lan0.20"), kernel_addresses("lan0")) == (["10.9.0.7/24"], [])
+    text = complaint("vlan", "remove", "lan0.20", "--yes", status=CALL_FAILED)
+    assert text.startswith("cannot remove lan0.20 wholly, what was done stays (kovanet vlan list): ")
+    assert "lan0.20" not in mtus() and not interface_file("lan0.20").exists()
+    assert kernel_addresses("lan0") == ["10.9.0.7/24"]
+
+    unreadable = DHCPD / "dhcpd-lan0.info"
+    unreadable.unlink()
+    unreadable.mkdir()
+    try:
+        text = complaint("bond", "create", "bond1", "active-backup", "lan0", "lan1", "--yes", status=CALL_FAILED)
+    finally:
+        unreadable.rmdir()
+    assert text.startswith("the bond is changed, but the DHCP server's switches could not be moved: ")
+    shown = data("bond", "show", "bond1")
+    assert (shown["members"], shown["up"], shown["address"]) == (["lan0", "lan1"], True, "10.9.0.7")
+    assert served("lan1") == {"enable": '"yes"'}
+    kovanet("bond", "delete", "bond1", "--yes")
+
+
+def test_a_kernel_that_keeps_what_is_gone_is_a_failure(idle_network_script):
+    run("ip", "-batch", "-", input="link add link lan0 name lan0.20 type vlan id 20\nlink add bond1 type bond\n"
+                                   "link set lan1 down\nlink set lan1 master bond1\n")  # fmt: skip
+    interface_file("lan0.20").write_text("DEVICE=lan0.20\nVLAN_ROW_DEVICE=lan0\nVLAN_ID=20\nBOOTPROTO=dhcp\n")
+    interface_file("bond1").write_text("DEVICE=bond1\nBOOTPROTO=static\nBONDING_OPTS=\"mode=0\"\n")
+    try:
+        text = complaint("vlan", "remove", "lan0.20", "--yes", status=CALL_FAILED)
+        assert text == ("the file of lan0.20 is gone, but the kernel still has it; see what /etc/rc.network restart lan0 "
+                        "says")
+        text = complaint("bond", "delete", "bond1", "--yes", status=CALL_FAILED)
+        assert text == ("the file of bond1 is gone, but the kernel still has the bond; see what /etc/rc.network restart "
+                        "lan1 says")
+        assert not interface_file("lan0.20").exists() and not interface_file("bond1").exists()
+    finally:
+        run("ip", "link", "del", "lan0.20")
+        run("ip", "link", "del", "bond1")
+
+
 # ---- help -----------------------------------------------------------------------------------------------------------
 
 VERBS = {"vlan": ["", "list", "show", "create", "remove"], "bond": ["", "list", "show", "create", "change", "delete"],

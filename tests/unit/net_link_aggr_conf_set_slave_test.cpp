@@ -117,6 +117,21 @@ TEST_F(net_link_aggr_conf_set_slave, KOVANetLinkAggrConfSetSlave_noMemory_is200A
     EXPECT_EQ("<absent>", read_file(kSaved));
 }
 
+TEST_F(net_link_aggr_conf_set_slave, KOVANetLinkAggrConfSetSlave_longNames_areTakenWhole) {
+    for (const size_t length : {15U, 16U, 17U}) {
+        const std::string name = long_text(length);
+        const std::string path = ifcfg(name);
+        const outcome copied{.commands = {"/bin/cp -f " + path + " " + path + ".saved"}};
+        const std::string joined = "DEVICE=" + name + "\nUSERCTL=no\nMASTER=bond0\nSLAVE=yes\n";
+        EXPECT_OUTCOME(rig.observe([&] { return KOVANetLinkAggrConfSetSlave(name.c_str(), 1, &bond); }), copied);
+        EXPECT_EQ(joined, read_file(path));
+        EXPECT_OUTCOME(rig.observe([&] { return KOVANetLinkAggrConfSetSlave(name.c_str(), 0, nullptr); }), copied);
+        EXPECT_EQ("DEVICE=" + name + "\nBOOTPROTO=dhcp\n", read_file(path));
+        EXPECT_EQ(joined, read_file(path + ".saved"));
+    }
+    EXPECT_EQ(6U, list_dir("/etc/sysconfig/network-scripts").size());
+}
+
 TEST_F(net_link_aggr_conf_set_slave, KOVANetLinkAggrConfSetSlave_badArguments_areRefused) {
     const auto set = [this](const char *slave, int on, const KOVALINKAGGROPT *opt) {
         return rig.observe([=] { return KOVANetLinkAggrConfSetSlave(slave, on, opt); });

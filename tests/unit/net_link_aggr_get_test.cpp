@@ -138,6 +138,27 @@ TEST_F(net_link_aggr_get, KOVANetLinkAggrGet_modeFile_hasToBeReadable) {
                                           "errno=[0/Success]"}});
 }
 
+TEST_F(net_link_aggr_get, KOVANetLinkAggrGet_directoryInPlaceOfAFile_isNoBondNoModeOrNoPartner) {
+    const std::string bonding = "/sys/class/net/bond0/bonding/";
+    const std::string directory = "/tmp/no-file";
+    shell("mkdir -p " + directory);
+    add_kernel_bond("eth0 eth1\n", "802.3ad 4\n");
+    rig.redirect("/proc/net/bonding//bond0", directory);
+    EXPECT_OUTCOME(get("bond0"), {.code = 0xBC00, .unit = "net_link_aggr_opt_slsave_add"}); // of a member added
+    EXPECT_EQ(KOVA_LINK_AGGR_8023AD, bond.mode);
+    EXPECT_EQ(1, bond.blNoPartner);
+    rig.redirect(bonding + "mode", directory);
+    EXPECT_OUTCOME(get("bond0"),
+                   {.result = -1,
+                    .code = 0xA00,
+                    .unit = "net_link_aggr_get",
+                    .log = {"ERR net_link_aggr_get:N Fail to read [" + bonding + "mode], errno=[21/Is a directory]"}});
+    rig.redirect(bonding + "slaves", directory);
+    EXPECT_OUTCOME(get("bond0"), {.code = 0xA00, .unit = "net_link_aggr_phy_get"});
+    EXPECT_EQ(0, bond.mode + bond.cSlaves);
+    EXPECT_TRUE(is_clean());
+}
+
 TEST_F(net_link_aggr_get, KOVANetLinkAggrGet_32Members_areTaken) {
     texts names;
     std::string line;

@@ -65,6 +65,24 @@ TEST_F(net_link_aggr_phy_get, KOVANetLinkAggrPhyGet_noBond_is900) {
     EXPECT_OUTCOME(get("bond0"), {.result = -1, .code = 0x900, .unit = "net_link_aggr_phy_get"});
 }
 
+TEST_F(net_link_aggr_phy_get, KOVANetLinkAggrPhyGet_directoryInPlaceOfTheFile_isA00) {
+    shell("mkdir -p /tmp/no-file");
+    rig.redirect(kSlaves, "/tmp/no-file");
+    EXPECT_OUTCOME(get("bond0"), {.result = -1, .code = 0xA00, .unit = "net_link_aggr_phy_get"});
+    EXPECT_EQ(texts{}, names());
+}
+
+TEST_F(net_link_aggr_phy_get, KOVANetLinkAggrPhyGet_longNames_areAskedWhole) {
+    for (const size_t length : {15U, 16U, 17U}) {
+        rig.replace_file("/sys/class/net/" + long_text(length) + "/bonding/slaves", "of" + std::to_string(length));
+    }
+    for (const size_t length : {15U, 16U, 17U}) {
+        EXPECT_OUTCOME(get(long_text(length).c_str()), {.result = 1});
+    }
+    EXPECT_OUTCOME(get(long_text(18).c_str()), {.result = -1, .code = 0x900, .unit = "net_link_aggr_phy_get"});
+    EXPECT_EQ((texts{"of15", "of16", "of17"}), names());
+}
+
 TEST_F(net_link_aggr_phy_get, KOVANetLinkAggrPhyGet_noMemory_fails) {
     rig.replace_file(kSlaves, "eth0 eth1\n");
     rig.fail("KLIBCSzListPush", 2);

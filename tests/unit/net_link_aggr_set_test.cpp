@@ -1,5 +1,6 @@
 #include "support/fake_kernel.h"
 
+#include <algorithm>
 #include <cstring>
 #include <kovanetsdk/link.h>
 #include <optional>
@@ -15,12 +16,13 @@ const std::string kDel = "net_link_aggr_conf_del";
 using files = std::map<std::string, std::string>;
 
 const std::string kLine802 = "BONDING_OPTS=\"mode=4 use_carrier=0 miimon=100 updelay=100 lacp_rate=fast\"\n";
+const std::string kLineRr = "BONDING_OPTS=\"mode=0 use_carrier=0 miimon=100 updelay=100\"\n";
 const std::string kEth0 = "DEVICE=eth0\nBOOTPROTO=static\nONBOOT=yes\nIPADDR=10.0.0.1\nNETMASK=255.0.0.0\n";
 const std::string kEth1 = "DEVICE=eth1\nBOOTPROTO=dhcp\nONBOOT=yes\n";
 const std::string kEth2 = "DEVICE=eth2\nBOOTPROTO=none\nONBOOT=yes\n";
-const std::string kBond = "DEVICE=bond0\nBOOTPROTO=static\nONBOOT=yes\nIPADDR=10.0.0.1\nNETMASK=255.0.0.0\n"
-                          "USERCTL=no\n" +
-                          kLine802;
+const std::string kAddress = "DEVICE=bond0\nBOOTPROTO=static\nONBOOT=yes\nIPADDR=10.0.0.1\nNETMASK=255.0.0.0\n"
+                             "USERCTL=no\n";
+const std::string kBond = kAddress + kLine802;
 const std::string kMember = "USERCTL=no\nMASTER=bond0\nSLAVE=yes\n";
 
 const files kApart{{"eth0", kEth0}, {"eth1", kEth1}, {"eth2", kEth2}};
@@ -59,6 +61,23 @@ texts made(int result) {
 texts deleted(int result) {
     return events("bond0", "eth0 eth1", result);
 }
+
+/** The three changes, by the mode that asks for each. */
+constexpr int kCreate = KOVA_LINK_AGGR_8023AD;
+constexpr int kChange = KOVA_LINK_AGGR_BALANCE_RR;
+constexpr int kDelete = KOVA_LINK_AGGR_UNKNOWN;
+
+/** A copy that fails, alone or along with a rewrite, whose rollback then meets the file that is not there. */
+struct failed_copy {
+    int operation;
+    std::string command;
+    int occurrence;
+    int failing_rewrite; ///< 0 for none
+    long result;
+    texts log;
+    texts commands; ///< between stop and start
+    files left;
+};
 
 /** Calls of one operation, counted from 1, each of which fails alone: what comes of the change then. */
 struct failing {
@@ -103,7 +122,7 @@ protected:
         }
         begin(wanted);
     }
-    void request(const std::string &name, KOVA_LINK_AGGR_MODE mode, const texts &slaves) {
+    void request(const std::string &name, int mode, const texts &slaves) {
         memset(&bond, 0, sizeof bond);
         memcpy(bond.szName, name.c_str(), name.size());
         bond.mode = mode;
@@ -114,6 +133,75 @@ protected:
     }
     outcome set() {
         return rig.observe([this] { return KOVANetLinkAggrSet(&bond); });
+    }
+    /** A clean appliance before one of the three changes. */
+    void begin_for(int operation) {
+        begin(operation == kCreate ? kApart : kBonded);
+        bond.mode = operation;
+    }
+    /** A copy that fails at its first run, or at its second: that of a change which writes the bond anew. */
+    void fail_copy(const std::string &command, int occurrence, int status) {
+        const auto fail_it = [=, this] { rig.answer(command, status); };
+        if (occurrence == 1) {
+            fail_it();
+        }
+        rig.before("KLIBCFileSetKeys", [=, this, calls = 0]() mutable {
+            constexpr int kOfTheBond = 3; // behind those of the members that leave
+            if (++calls == kOfTheBond && occurrence == 1) {
+                rig.let_run(command);
+            } else if (calls == kOfTheBond) {
+                fail_it();
+            }
+        });
+    }
+    void expect_failed_copy(const failed_copy &row, int status) {
+        SCOPED_TRACE(std::to_string(row.operation) + " " + row.command + " " + std::to_string(row.occurrence) +
+                     ", rewrite " + std::to_string(row.failing_rewrite) + ", status " + std::to_string(status));
+        begin_for(row.operation);
+        fail_copy(row.command, row.occurrence, status);
+        if (row.failing_rewrite != 0) {
+            rig.fail("KLIBCFileSetKeys", row.failing_rewrite);
+        }
+        const outcome got = set();
+        EXPECT_EQ(row.result, got.result);
+        EXPECT_EQ(row.log, got.log);
+        EXPECT_EQ(between_stop_and_start(row.commands), got.commands);
+        expect_files(row.left);
+        const bool has_lease = row.operation != kDelete && row.command != kLease;
+        EXPECT_EQ(has_lease ? "lease { interface \"bond0\"; } # bond0\n" : "<absent>",
+                  read_file("/tmp/dhcpv4.leases.bond0"));
+    }
+    /** An event that cannot be opened ends the change; one that cannot be raised is a line in the log, and no more. */
+    void expect_events_that_fail(int operation, const texts &commands, const files &present, const files &meant) {
+        begin_for(operation);
+        rig.fail("KLIBPluginSDKInit");
+        EXPECT_OUTCOME(set(), {.result = -1,
+                               .code = 0x200,
+                               .unit = "platform",
+                               .log = {"ERR net_link_aggr_set:N plugin sdk init failed"}});
+        expect_files(present);
+        const auto expect_one_line = [&](const char *call, int nth, const char *phase, const char *code,
+                                         size_t raised) {
+            SCOPED_TRACE(call + std::string(" ") + std::to_string(nth));
+            begin_for(operation);
+            rig.fail(call, nth);
+            const outcome got = set();
+            EXPECT_EQ(0, got.result);
+            EXPECT_EQ(texts{std::string("ERR net_link_aggr_set:N Fail to execute net plugin (") + phase + ") [" + code +
+                            " platform:N]"},
+                      got.log);
+            EXPECT_EQ(between_stop_and_start(commands), got.commands);
+            EXPECT_EQ(raised, got.events.size());
+            expect_files(meant);
+        };
+        for (const auto &[call, first_of_post, last] :
+             {std::tuple{"KLIBPluginSetArgByArray", 3, 4}, std::tuple{"KLIBPluginSetArgByInt", 2, 2}}) {
+            for (int nth = 1; nth <= last; ++nth) {
+                expect_one_line(call, nth, nth < first_of_post ? "PRE" : "POST", "0x0200", 1);
+            }
+        }
+        expect_one_line("KLIBPluginAction", 1, "PRE", "0x2A00", 2); // it was raised, and failed
+        expect_one_line("KLIBPluginAction", 2, "POST", "0x2A00", 2);
     }
     static files found_files() {
         files found;
@@ -255,12 +343,6 @@ TEST_F(net_link_aggr_set, KOVANetLinkAggrSet_copiesOfEarlierChanges_areNotPutBac
     expect_files(kApart);
 }
 
-TEST_F(net_link_aggr_set, KOVANetLinkAggrSet_scriptThatFails_isNotLookedAt) {
-    rig.answer("/etc/rc.network", 127);
-    EXPECT_EQ(0, set().result);
-    expect_files(kBonded);
-}
-
 TEST_F(net_link_aggr_set, KOVANetLinkAggrSet_makingFailsAtAStep_putsEverythingBackAndStartsIt) {
     const std::string member = "net_link_aggr_conf_set_slave";
     const texts taken_over{copy("eth0", "bond0"), kLease};
@@ -286,30 +368,6 @@ TEST_F(net_link_aggr_set, KOVANetLinkAggrSet_makingFailsAtAStep_putsEverythingBa
     };
     expect_all(
         rows, [this] { begin(kApart); }, made);
-}
-
-TEST_F(net_link_aggr_set, KOVANetLinkAggrSet_makingWhereACopyFails_goesOn) {
-    rig.answer(copy("eth0", "bond0"), 1);
-    EXPECT_EQ(0, set().result);
-    EXPECT_EQ("BOOTPROTO=dhcp\nDEVICE=bond0\nONBOOT=yes\nUSERCTL=no\n" + kLine802, read_file(ifcfg("bond0")));
-    begin(kApart);
-    rig.answer(kLease, 1);
-    EXPECT_EQ(0, set().result);
-    expect_files(kBonded);
-    EXPECT_EQ("<absent>", read_file("/tmp/dhcpv4.leases.bond0"));
-    begin(kApart);
-    rig.answer(save("eth1"), 1);
-    const outcome got = set();
-    EXPECT_EQ(0, got.result);
-    EXPECT_EQ(texts{"INFO net_link_aggr_set:N remove file " + ifcfg("eth1.saved") + " failed"}, got.log);
-    expect_files(kBonded);
-}
-
-TEST_F(net_link_aggr_set, KOVANetLinkAggrSet_memberWithoutACopy_staysAsWritten) {
-    rig.answer(save("eth0"), 1);
-    rig.fail("KLIBCFileSetKeys", 3);
-    EXPECT_EQ(-1, set().result);
-    expect_files({{"eth0", kEth0 + kMember}, {"eth1", kEth1}, {"eth2", kEth2}});
 }
 
 TEST_F(net_link_aggr_set, KOVANetLinkAggrSet_memberWhoseFileVanishes_getsOne) {
@@ -482,31 +540,6 @@ TEST_F(net_link_aggr_set, KOVANetLinkAggrSet_deletingWhereTheFirstCopyFailsHalfw
     }
 }
 
-TEST_F(net_link_aggr_set, KOVANetLinkAggrSet_deletingWhereACopyToGoBackToFails_goesOn) {
-    for (const char *const name : {"eth0", "eth1"}) {
-        begin_bonded();
-        rig.answer(save(name), 1);
-        bond.mode = 0;
-        const outcome got = set();
-        EXPECT_EQ(0, got.result);
-        EXPECT_EQ(texts{}, got.log);
-        files left = kApart;
-        left["eth0.saved"] = kBond;
-        left["eth1.saved"] = kEth1 + kMember;
-        left.erase(name + std::string(".saved"));
-        expect_files(left);
-    }
-}
-
-TEST_F(net_link_aggr_set, KOVANetLinkAggrSet_deletingFailsWithoutACopyToGoBackTo_keepsTheFirstMember) {
-    begin_bonded();
-    rig.answer(save("eth0"), 1);
-    rig.fail("KLIBCFileSetKeys", 2);
-    bond.mode = 0;
-    EXPECT_EQ(-1, set().result);
-    expect_files(kBonded);
-}
-
 TEST_F(net_link_aggr_set, KOVANetLinkAggrSet_deletingFailsBehindAMembersAddress_keepsTheMember) {
     const std::string same = "DEVICE=eth1\nBOOTPROTO=static\nIPADDR=10.0.0.1\n" + kMember;
     begin_bonded({{"eth1", same}});
@@ -632,48 +665,233 @@ TEST_F(net_link_aggr_set, KOVANetLinkAggrSet_changeFailsAtAStep_leavesTheBondOrT
     expect_all(rows, prepare, [](int) { return texts{}; });
 }
 
-TEST_F(net_link_aggr_set, KOVANetLinkAggrSet_changeWhereTheFirstCopyFails_goesOnWithTheMembersFile) {
-    begin_bonded();
-    bond.mode = KOVA_LINK_AGGR_BALANCE_RR;
-    rig.answer(copy("bond0", "eth0"), 1);
-    const outcome got = set();
-    EXPECT_EQ(0, got.result);
-    EXPECT_EQ(between_stop_and_start(texts{copy("bond0", "eth0")} + kPutBack +
-                                     texts{copy("eth0", "bond0"), kLease, save("eth0"), save("eth1")}),
-              got.commands);
+// ---- copies that fail, are put back, or cannot be
+
+TEST_F(net_link_aggr_set, KOVANetLinkAggrSet_eachCopyFails_leavesTheFilesOfItsRow) {
+    const auto kept = [](const std::string &name) {
+        return texts{"INFO net_link_aggr_set:N remove file " + ifcfg(name + ".saved") + " failed"};
+    };
+    const std::string from_bond = copy("bond0", "eth0");
+    const std::string to_bond = copy("eth0", "bond0");
+    const texts not_left{"ERR " + kDel + ":N Failed to copy " + ifcfg("bond0") + " to " + ifcfg("eth0")};
+    const texts join{to_bond, kLease, save("eth0"), save("eth1")};
+    const texts leave{from_bond, save("eth0"), save("eth1")};
+    const texts stay = texts{from_bond} + kPutBack;
+    const texts change = leave + join;
+    const texts back = kPutBack;
+    files bond_alone = kBonded; // which starts from nothing
+    bond_alone["bond0"] = "BOOTPROTO=dhcp\nDEVICE=bond0\nONBOOT=yes\nUSERCTL=no\n" + kLine802;
     files changed = kBonded;
-    changed["bond0"] = "DEVICE=bond0\nBOOTPROTO=static\nONBOOT=yes\nIPADDR=10.0.0.1\n"
-                       "NETMASK=255.0.0.0\nUSERCTL=no\nBONDING_OPTS=\"mode=0 use_carrier=0 miimon=100 updelay=100\"\n";
-    expect_files(changed);
+    changed["bond0"] = kAddress + kLineRr;
+    files changed_alone = kBonded;
+    changed_alone["bond0"] = "BOOTPROTO=dhcp\nDEVICE=bond0\nONBOOT=yes\nUSERCTL=no\n" + kLineRr;
+    files first_joined = kApart;
+    first_joined["eth0"] += kMember;
+    files both_joined = first_joined; // as they were before
+    both_joined["eth1"] += kMember;
+    files apart = kApart;
+    apart["eth0.saved"] = kBond;
+    apart["eth1.saved"] = kEth1 + kMember;
+    const auto without = [](files left, const std::string &name) {
+        left.erase(name);
+        return left;
+    };
+    const std::vector<failed_copy> rows{
+        {kCreate, to_bond, 1, 0, 0, {}, join, bond_alone},
+        {kCreate, to_bond, 1, 3, -1, {}, join + back, kApart},
+        {kCreate, kLease, 1, 0, 0, {}, join, kBonded},
+        {kCreate, kLease, 1, 3, -1, {}, join + back, kApart},
+        {kCreate, save("eth0"), 1, 0, 0, kept("eth0"), join, kBonded},
+        {kCreate, save("eth0"), 1, 3, -1, {}, join + back, first_joined},
+        {kCreate, save("eth1"), 1, 0, 0, kept("eth1"), join, kBonded},
+        {kCreate, save("eth1"), 1, 3, -1, {}, join + back, kApart},
+        {kChange, from_bond, 1, 0, 0, not_left, stay + join, changed},
+        {kChange, from_bond, 1, 3, -1, not_left, stay + join + back, both_joined},
+        {kChange, save("eth0"), 1, 0, 0, {}, change, changed},
+        {kChange, save("eth0"), 1, 5, -1, {}, change + back, kApart},
+        {kChange, save("eth1"), 1, 0, 0, {}, change, changed},
+        {kChange, save("eth1"), 1, 5, -1, {}, change + back, kApart},
+        {kChange, to_bond, 1, 0, 0, {}, change, changed_alone},
+        {kChange, to_bond, 1, 5, -1, {}, change + back, kApart},
+        {kChange, kLease, 1, 0, 0, {}, change, changed},
+        {kChange, kLease, 1, 5, -1, {}, change + back, kApart},
+        {kChange, save("eth0"), 2, 0, 0, kept("eth0"), change, changed},
+        {kChange, save("eth0"), 2, 5, -1, {}, change + back, first_joined},
+        {kChange, save("eth1"), 2, 0, 0, kept("eth1"), change, changed},
+        {kChange, save("eth1"), 2, 5, -1, {}, change + back, kApart},
+        {kDelete, from_bond, 1, 0, -1, not_left, stay, kBonded},
+        {kDelete, save("eth0"), 1, 0, 0, {}, leave, without(apart, "eth0.saved")},
+        {kDelete, save("eth0"), 1, 2, -1, {}, leave + back, kBonded},
+        {kDelete, save("eth1"), 1, 0, 0, {}, leave, without(apart, "eth1.saved")},
+        {kDelete, save("eth1"), 1, 2, -1, {}, leave + back, kBonded},
+    };
+    for (const failed_copy &row : rows) {
+        for (const int status : {1, 127, -1}) {
+            expect_failed_copy(row, status);
+        }
+    }
+}
+
+TEST_F(net_link_aggr_set, KOVANetLinkAggrSet_rollbackThatFails_isNotLookedAt) {
+    const struct {
+        int operation;
+        int failing_rewrite;
+        files back;
+        files copies;
+    } rows[] = {
+        {kCreate, 3, kApart, {{"eth0.saved", kEth0}, {"eth1.saved", kEth1}}},
+        {kChange, 5, kApart, {{"eth0.saved", kEth0}, {"eth1.saved", kEth1}}},
+        {kDelete, 2, kBonded, {{"eth0.saved", kBond}, {"eth1.saved", kEth1 + kMember}}},
+    };
+    for (const auto &row : rows) {
+        for (const texts &names : {texts{"eth0"}, texts{"eth1"}, texts{"eth0", "eth1"}}) {
+            SCOPED_TRACE(std::to_string(row.operation) + " " + names.front() + " " + names.back());
+            begin_for(row.operation);
+            rig.fail("KLIBCFileSetKeys", row.failing_rewrite); // that of eth1, which is as it was
+            files left = row.back;
+            for (const std::string &name : names) {
+                rig.answer(put_back(name), 1);
+                left[name + ".saved"] = row.copies.at(name + ".saved");
+                left[name] = name == "eth0" ? kEth0 + kMember : left[name];
+            }
+            EXPECT_EQ(-1, set().result);
+            const texts &commands = rig.now.commands;
+            EXPECT_EQ(kPutBack + texts{kStart}, texts(commands.end() - 3, commands.end()));
+            expect_files(left);
+        }
+    }
+}
+
+TEST_F(net_link_aggr_set, KOVANetLinkAggrSet_scriptThatFails_isNotLookedAt) {
+    for (const int operation : {kCreate, kChange, kDelete}) {
+        begin_for(operation);
+        const outcome clean = set();
+        const files meant = found_files();
+        EXPECT_EQ(0, clean.result);
+        for (const std::string &run : {kStop, kStart}) {
+            SCOPED_TRACE(std::to_string(operation) + " " + run);
+            begin_for(operation);
+            rig.answer(run, 127);
+            EXPECT_OUTCOME(set(), clean);
+            expect_files(meant);
+        }
+    }
+}
+
+TEST_F(net_link_aggr_set, KOVANetLinkAggrSet_memberWhoseFileVanishesFromABond_endsTheDeletionAndNoChange) {
+    const std::string stop = "/etc/rc.network stop";
+    const std::string from_bond = copy("bond0", "eth0");
+    const texts unread{"ERR net_lnx_get_ip:N Failed to get [IPADDR] from [" + ifcfg("eth1") + "], kovaerr=[0x0900]",
+                       "ERR " + kDel + ":N get IP on eth1 failed"};
+    const texts left_one{from_bond, save("eth0")};
+    const texts left_both = left_one + texts{save("eth1")};
+    const texts joined{copy("eth0", "bond0"), kLease, save("eth0"), save("eth1")};
+    const texts no_copy{"INFO net_link_aggr_set:N remove file " + ifcfg("eth1.saved") + " failed"};
+    files changed = kBonded;
+    changed["bond0"] = kAddress + kLineRr;
+    changed["eth1"] = "DEVICE=eth1\n" + kMember;
+    files kept = kBonded;
+    kept.erase("eth1");
+    files apart = kApart;
+    apart["eth0.saved"] = kBond;
+    apart["eth1"] = "DEVICE=eth1\n";
+    apart["eth1.saved"] = kEth1 + kMember;
+    const struct {
+        int operation;
+        std::string command; ///< behind which the file is gone
+        long result;
+        texts log;
+        texts commands;
+        files left;
+    } rows[] = {
+        {kChange, stop, 0, unread + no_copy, left_one + kPutBack + joined, changed},
+        {kChange, from_bond, 0, unread + no_copy, left_one + kPutBack + joined, changed},
+        {kChange, save("eth1"), 0, {}, left_both + joined, changed},
+        {kDelete, stop, -1, unread, left_one + kPutBack, kept},
+        {kDelete, from_bond, -1, unread, left_one + kPutBack, kept},
+        {kDelete, save("eth1"), 0, {}, left_both, apart},
+    };
+    for (const auto &row : rows) {
+        SCOPED_TRACE(std::to_string(row.operation) + " " + row.command);
+        begin_for(row.operation);
+        const std::string really = row.command.rfind("/bin/", 0) == 0 ? row.command + " && " : "";
+        rig.answer(row.command, 0, "", [&, really] {
+            shell(really + "rm " + ifcfg("eth1"));
+            rig.before("KLIBCFileSetKeys", [&] { rig.let_run(row.command); }); // once
+        });
+        const outcome got = set();
+        EXPECT_EQ(row.result, got.result);
+        EXPECT_EQ(row.log, got.log);
+        EXPECT_EQ(between_stop_and_start(row.commands), got.commands);
+        expect_files(row.left);
+    }
+}
+
+// ---- names
+
+TEST_F(net_link_aggr_set, KOVANetLinkAggrSet_namesOf15Characters_areTakenWhole) {
+    const std::string bond_name = long_text(15, 'b');
+    const std::string first = long_text(15, 'c');
+    const std::string second = long_text(15, 'd');
+    const auto longer = [&](std::string text) {
+        for (const auto &[name, full] : {std::pair{"bond0", bond_name}, {"eth0", first}, {"eth1", second}}) {
+            for (size_t at = 0; (at = text.find(name, at)) != std::string::npos; at += full.size()) {
+                text.replace(at, strlen(name), full);
+            }
+        }
+        return text;
+    };
+    const auto all_longer = [&](texts lines) {
+        std::transform(lines.begin(), lines.end(), lines.begin(), longer);
+        return lines;
+    };
+    const auto files_longer = [&](const files &named) {
+        files found;
+        for (const auto &[name, content] : named) {
+            found[longer(name)] = longer(content);
+        }
+        return found;
+    };
+    for (const int operation : {kCreate, kChange, kDelete}) {
+        SCOPED_TRACE(operation);
+        begin_for(operation);
+        outcome expected = set();
+        EXPECT_EQ(0, expected.result);
+        expected.commands = all_longer(expected.commands);
+        expected.events = all_longer(expected.events);
+        const files meant = files_longer(found_files());
+
+        begin_for(operation);
+        const files present = files_longer(found_files());
+        lay_out_clean_appliance();
+        for (const auto &[name, content] : present) {
+            write_file(ifcfg(name), content);
+        }
+        if (operation != kCreate) {
+            rig.redirect("/sys/class/net/" + bond_name, "/tmp/sys-bond0");
+            write_file("/tmp/sys-bond0/bonding/slaves", first + " " + second + "\n");
+        }
+        write_file("/tmp/dhcpv4.leases." + first, "lease " + first + "\n");
+        request(bond_name, operation, {first, second});
+        EXPECT_OUTCOME(set(), expected);
+        expect_files(meant);
+        EXPECT_EQ(operation == kDelete ? "<absent>" : "lease " + bond_name + "\n",
+                  read_file("/tmp/dhcpv4.leases." + bond_name));
+        shell("rm -f /tmp/dhcpv4.leases." + first + " /tmp/dhcpv4.leases." + bond_name);
+    }
 }
 
 // ---- events
 
-TEST_F(net_link_aggr_set, KOVANetLinkAggrSet_eventThatCannotBeOpened_changesNothing) {
-    rig.fail("KLIBPluginSDKInit");
-    EXPECT_OUTCOME(
-        set(),
-        {.result = -1, .code = 0x200, .unit = "platform", .log = {"ERR net_link_aggr_set:N plugin sdk init failed"}});
-    expect_files(kApart);
+TEST_F(net_link_aggr_set, KOVANetLinkAggrSet_makingWhereAnEventFails_isLoggedAlone) {
+    expect_events_that_fail(kCreate, {copy("eth0", "bond0"), kLease, save("eth0"), save("eth1")}, kApart, kBonded);
 }
 
-TEST_F(net_link_aggr_set, KOVANetLinkAggrSet_eventThatFails_isLoggedAlone) {
-    for (const int nth : {1, 2}) {
-        begin(kApart);
-        rig.fail("KLIBPluginAction", nth);
-        const outcome got = set();
-        EXPECT_EQ(0, got.result);
-        EXPECT_EQ(texts{std::string("ERR net_link_aggr_set:N Fail to execute net plugin (") +
-                        (nth == 1 ? "PRE" : "POST") + ") [0x2A00 platform:N]"},
-                  got.log);
-        EXPECT_EQ(made(0), got.events);
-        expect_files(kBonded);
-        begin(kApart);
-        rig.fail("KLIBPluginSetArgByInt", nth);
-        EXPECT_EQ(0, set().result);
-        EXPECT_EQ(1U, rig.now.log.size());
-        EXPECT_EQ(1U, rig.now.events.size());
-    }
+TEST_F(net_link_aggr_set, KOVANetLinkAggrSet_deletingWhereAnEventFails_isLoggedAlone) {
+    files left = kApart;
+    left["eth0.saved"] = kBond;
+    left["eth1.saved"] = kEth1 + kMember;
+    expect_events_that_fail(kDelete, {copy("bond0", "eth0"), save("eth0"), save("eth1")}, kBonded, left);
 }
 
 // ---- what is refused

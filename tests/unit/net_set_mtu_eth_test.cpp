@@ -166,6 +166,22 @@ TEST_F(net_set_mtu_eth, KOVANetSetMTUEth_switchBondMemberFails_stopsThere) {
     EXPECT_EQ((texts{"eth1 down", "eth1 up"}), kernel.changes);
 }
 
+TEST_F(net_set_mtu_eth, KOVANetSetMTUEth_switchBondMemberVanishes_stopsBehindTheFirst) {
+    kernel.add("eth1");
+    kernel.add("eth2", {.failing = {{SIOCSIFMTU, ENODEV}}});
+    kernel.add("eth3");
+    add_switch_bond("\"eth1 eth2 eth3\"");
+    EXPECT_OUTCOME(set("9000", "ovs_bond0"),
+                   {.result = -1,
+                    .code = 0x8100,
+                    .unit = kUnit,
+                    .log = {kNotice, kNotice, "ERR net_set_mtu_eth:N Kernel refuses MTU 9000 of eth2: No such device",
+                            "ERR net_set_mtu_eth:N Failed to set the MTU 9000 to OVS bonding slave eth2"}});
+    EXPECT_EQ((texts{"eth1 down", "eth1 mtu 9000", "eth1 up", "eth2 down", "eth2 up"}), kernel.changes);
+    EXPECT_EQ(9000, kernel.at("eth1").mtu);
+    EXPECT_EQ(1500, kernel.at("eth3").mtu);
+}
+
 TEST_F(net_set_mtu_eth, KOVANetSetMTUEth_switchBondWithoutMembersOrFile_fails) {
     add_switch_bond("");
     EXPECT_OUTCOME(set("9000", "ovs_bond0"), {.result = -1});

@@ -254,6 +254,24 @@ TEST_F(net_set_mtu_value, KOVANetSetMTUValue_switchBondThatFails_isAnnouncedAllT
                                               .sleeps = {5000}});
 }
 
+TEST_F(net_set_mtu_value, KOVANetSetMTUValue_switchBondMemberVanishes_stopsBehindTheFirstAndIsAnnounced) {
+    kernel.add("eth1", {.failing = {{SIOCSIFMTU, ENODEV}}});
+    kernel.add("eth2");
+    add_switch_bond("\"eth0 eth1 eth2\"");
+    EXPECT_OUTCOME(set("9000", "ovs_bond0"),
+                   {.result = -1,
+                    .code = 0x8100,
+                    .unit = "net_set_mtu_eth",
+                    .log = {kNotice, kNotice, "ERR net_set_mtu_eth:N Kernel refuses MTU 9000 of eth1: No such device",
+                            "ERR net_set_mtu_eth:N Failed to set MTU 9000 of eth1",
+                            kBegin + "KOVANetSetMTUEth [eth1] failed (0x8100)"},
+                    .events = event("ovs_bond0"),
+                    .locks = {"+0x806", "-0x800", "+0x806", "-0x800", "+0x806", "-0x800"},
+                    .sleeps = {5000}});
+    EXPECT_EQ((texts{"eth0 down", "eth0 mtu 9000", "eth0 up", "eth1 down", "eth1 up"}), kernel.changes);
+    EXPECT_EQ("ovs_bond0_mtu=\"9000\"\neth0_mtu=\"9000\"\neth1_mtu=\"9000\"\n", read_file(kInfo));
+}
+
 TEST_F(net_set_mtu_value, KOVANetSetMTUValue_longNames_areThoseThatTheKernelCanHave) {
     kernel.add(long_text(15));
     EXPECT_EQ(0, set("9000", long_text(15).c_str()).result);
