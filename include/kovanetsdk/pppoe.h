@@ -118,8 +118,9 @@ int KOVANetIsSamePPPoERelayConfig(const PPPOE_RELAY_CONF *pConf, const PPPOE_REL
 /**
  * Brings the relay process of an interface into step with its settings. It is to run when the interface is a bridge of
  * the local LAN by its file, up, and enabled: then "/usr/sbin/pppoe-relay -C <name> -S <server>" is started unless it
- * runs with that server. One with another server, or that is not to run, is sent SIGTERM. The start is waited for; the
- * relay goes to the background by itself. The end of a relay that was sent SIGTERM is not waited for. Takes no lock.
+ * runs with that server. One with another server, or that is not to run, is sent SIGTERM, and its end is waited for, at
+ * most a second. The start is waited for; the relay goes to the background by itself. Takes no lock: of two calls at
+ * the same moment each may start a relay.
  * @param szIfname  interface
  * @return 0; -1, logged, with 0xD00 without a name, as KOVANetGetPPPoERelayConfig, when the relay cannot be stopped (as
  *         KLIBCKill) or its start fails (0x2A00)

@@ -67,10 +67,10 @@ int KOVATunnelConfigSet(const TUNNEL_CONF *pConf);
  * the client may have written, is renamed to "tsp-broker-list.txt.bak", and a running name-server relay ("kovarelayd")
  * is reloaded.
  *
- * A client that runs without an address on the interface "tun" after a restart or a stop hangs: it is killed. After a
- * start it may go on and get its address later. That there is neither client nor address is no failure: the account may
- * be refused, or the broker away; KOVALnxV6IPGet("tun", ...) tells. Locks /etc/gogoc/gogoc.conf by file while it is
- * written and deleted.
+ * A client that runs without an address on the interface "tun" after a restart or a stop hangs: it is killed, and
+ * /etc/gogoc/gogoc.conf deleted whoever wrote it. After a start it may go on and get its address later. That there is
+ * neither client nor address is no failure: the account may be refused, or the broker away; KOVALnxV6IPGet("tun", ...)
+ * tells. Locks /etc/gogoc/gogoc.conf by file while it is written and deleted.
  * @param nAction  KOVA_TUNNEL_START, KOVA_TUNNEL_STOP or KOVA_TUNNEL_RESTART; for another value nothing is run, and
  *                 /etc/gogoc/gogoc.conf is deleted whoever wrote it
  * @param pConf    the account, or NULL for the stored one; only a start and a restart look at it, and of an anonymous

@@ -2,6 +2,7 @@
 
 #include "core/commands.h"
 #include "core/guards.h"
+#include "core/pause.h"
 #include "core/report.h"
 #include "pppoe/relay_files.h"
 
@@ -27,6 +28,15 @@ int start(const char *szIfname, const char *szServer) {
     return 0;
 }
 
+/** Waits shortly until a relay that is to end has ended: two on one bridge would both answer its clients. */
+void wait_for_end(const path_text &relay) {
+    constexpr int kAttempts = 40;
+    constexpr timespec kPause{0, 25'000'000};
+    for (int i = 0; i < kAttempts && KLIBCIsProcAlive(relay.c_str()) == 1; ++i) {
+        pause_for(kPause);
+    }
+}
+
 } // namespace
 
 extern "C" int KOVANetApplyPPPoERelayConfig(const char *szIfname) {
@@ -49,6 +59,7 @@ extern "C" int KOVANetApplyPPPoERelayConfig(const char *szIfname) {
     if (KLIBCKill(relay.c_str(), SIGTERM) < 0) {
         return fail_keeping_code(HERE, -1, "Failed to kill process");
     }
+    wait_for_end(relay);
     return is_wanted ? start(szIfname, conf.szServer) : 0;
 }
 

@@ -94,6 +94,11 @@ void delete_client_conf(written_conf &written) {
     written.remove();
 }
 
+void delete_client_conf_of_anyone() {
+    const client_conf_lock lock;
+    unlink(kClientConf);
+}
+
 /** Makes the file, empty and its owner's alone, before anything goes into it. */
 int create_client_conf() {
     unlink(kClientConf);
@@ -204,8 +209,7 @@ void run_script(const void *data) {
     const char *const szWord = script_word(about.nAction);
     prctl(PR_SET_DUMPABLE, 0); // it has the password in its memory
     if (szWord == nullptr) {
-        const client_conf_lock lock;
-        unlink(kClientConf);
+        delete_client_conf_of_anyone();
         return;
     }
     if (needs_client_conf(about.nAction) && make_client_conf(about) < 0) {
@@ -257,6 +261,7 @@ int check_tunnel(int nAction) {
     }
     log_err(HERE, "gogoc hangs, terminate it.");
     (void)KLIBCKill(kClient, SIGKILL);
+    delete_client_conf_of_anyone(); // nobody is left to read it
     return -1;
 }
 

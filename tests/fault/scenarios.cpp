@@ -513,7 +513,8 @@ void relay(world &it) {
     write_file("/tmp/fault-processes/version", "");
 }
 
-/** The only process is a relay of that bridge to a server. It is no real one, so that it outlives every signal. */
+/** The only process is a relay of that bridge to a server, which ends when it is waited for. It is no real one, so that
+ * nothing else ends it. */
 void relay_to(world &it, const std::string &server) {
     relay(it);
     it.rig.redirect("/proc", "/tmp/fault-relay");
@@ -523,6 +524,7 @@ void relay_to(world &it, const std::string &server) {
     const std::string process = "/tmp/fault-relay/" + std::to_string(kNoProcess);
     write_file(process + "/stat", std::to_string(kNoProcess) + " (pppoe-relay) S 1\n");
     write_file(process + "/cmdline", arguments);
+    it.rig.on_sleep([process](long) { std::filesystem::remove_all(process); });
 }
 
 void relay_that_runs(world &it) {

@@ -13,6 +13,7 @@ from sdk import PppoeRelayConf, library, register
 
 SCRIPTS = pathlib.Path("/etc/sysconfig/network-scripts")
 EXEC = 0x2A00
+IP, HOSTNAME = 1, 2  # changes that the services are told of
 BRIDGES = {"lbr0": "lan0", "lbr1": "lan1"}
 
 
@@ -161,6 +162,20 @@ def test_the_relay_is_stopped_before_an_address_changes():
     assert relays() == {}
     assert apply() == 0, "and can be started again"
     relays_are("-C lbr0 -S eth0")
+
+
+def test_the_relays_that_are_switched_on_come_back_once_an_address_has_changed():
+    store()
+    store("lbr1", enabled=0)
+    assert library.KLIBServicePlugin(0, HOSTNAME) == 0
+    assert not pathlib.Path("/run/kova/jobs/services,SERVICE=pppoe_relays").exists()
+    assert library.KLIBServicePlugin(0, IP) == 0
+    relays_are("-C lbr0 -S eth0")
+    [pid] = relays()
+    assert library.KLIBServicePlugin(0, IP) == 0
+    wait_for(lambda: not processes("/etc/kova/jobs/services run"), what="the end of the job")
+    assert list(relays()) == [pid], "one that runs stays"
+    assert 'unknown service "radio"' in run("/sbin/start", "services", "SERVICE=radio", status=1).stderr
 
 
 def test_the_job_runs_the_relay_too(tmp_path):

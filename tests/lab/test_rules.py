@@ -116,11 +116,17 @@ def test_what_the_kernel_does_not_take_is_told_and_the_others_are_in_force():
     assert ports_reached(7001, 7009) == [7009]
 
 
+def shaping(link):
+    """What limits how fast an interface sends; nothing when nothing does."""
+    found = run("tc", "qdisc", "show", "dev", link).stdout
+    return found if "tbf" in found else ""
+
+
 def test_an_interface_sends_no_faster_than_it_may():
     RATES.write_text("eth0 1000\n")
     for _ in range(2):
         run(SHAPER, "-start", "eth0", "gone0")
-        assert "tbf 6b6f: root refcnt 2 rate 1Mbit" in run("tc", "qdisc", "show", "dev", "eth0").stdout
+        assert "tbf 6b6f: root refcnt 2 rate 1Mbit" in shaping("eth0")
     with socket_on_other_side(socket.AF_INET, socket.SOCK_DGRAM) as receiver:
         receiver.bind((PARTNER, 7001))
         receiver.settimeout(30)
@@ -133,15 +139,22 @@ def test_an_interface_sends_no_faster_than_it_may():
     assert time.monotonic() - begin > 0.25
     RATES.write_text("")
     run(SHAPER, "-change_interface", "eth0", "lan0")
-    assert "tbf" not in run("tc", "qdisc", "show", "dev", "eth0").stdout
+    assert shaping("eth0") == ""
 
 
-@pytest.mark.parametrize("value", ["0", "fast", "1000 more", "-5", "999999999"])
-def test_a_rate_that_is_none_is_told(value):
+@pytest.mark.parametrize("value", ["0", "fast", "1000 more", "-5", "999999999", ""])
+def test_a_rate_that_is_none_is_left_out_and_told(value, system_log):
+    told = f"{RATES}: left out, not a number of kbit/s: eth0 {value}\n"
     RATES.write_text(f"eth0 {value}\nlan0 2000\n")
     run("tc", "qdisc", "add", "dev", "lan0", "root", "pfifo")
-    assert f"{RATES}: not a number of kbit/s: eth0 {value}" in run(SHAPER, "-start", "eth0", "lan0", status=1).stderr
-    assert "rate 2Mbit" in run("tc", "qdisc", "show", "dev", "lan0").stdout
+    assert run(SHAPER, "-start", "eth0", "lan0").stderr == f"tctool: {told}"
+    assert shaping("eth0") == "" and "rate 2Mbit" in shaping("lan0")
+
+    RATES.write_text(f"eth0 {value}\neth0 3000\neth0 4000\n")
+    assert run(SHAPER, "-change_interface", "eth0", "lan0").stderr == f"tctool: {told.replace('eth0', 'lan0')}"
+    assert RATES.read_text() == f"lan0 {value}\nlan0 3000\nlan0 4000\n", "a line that is none may be put right later"
+    assert shaping("eth0") == "" and "rate 3Mbit" in shaping("lan0")
+    wait_for(lambda: system_log.holds(told.replace("eth0", "lan0").rstrip()), what="the message in the system log")
 
 
 def test_rules_follow_a_new_name_in_files_and_kernel():
@@ -155,8 +168,7 @@ def test_rules_follow_a_new_name_in_files_and_kernel():
     assert RULES.read_text() == "# eth0\nlan0 drop udp 7001\n\nlan0 drop   tcp 22\neth01 drop tcp 1\nlan0 drop tcp 2\n"
     assert (LIMITS.read_text(), RATES.read_text()) == ("lan0 syn 7\n", "lan0 3000\n")
     assert filters("eth0") == "" and "dst_port 7001" in filters("lan0") and "pkts_rate 7" in filters("lan0")
-    assert "rate 3Mbit" in run("tc", "qdisc", "show", "dev", "lan0").stdout
-    assert "tbf" not in run("tc", "qdisc", "show", "dev", "eth0").stdout
+    assert "rate 3Mbit" in shaping("lan0") and shaping("eth0") == ""
     assert ports_reached(7001, 7009) == [7001, 7009]
 
 

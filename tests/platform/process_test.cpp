@@ -201,6 +201,20 @@ TEST_F(process, KLIBCIsProcAlive_interpreterBeforeIt_isPassedOver) {
     EXPECT_WORKS(KLIBCIsProcAlive("-C lbr0"), 0);
 }
 
+TEST_F(process, KLIBCIsProcAlive_programOnItsWayToTheBackground_isNotMissed) {
+    // as daemons do, it goes on in a child of its child
+    const std::string daemon = path("kova-daemon");
+    write_file(daemon, "#!/bin/sh\n( ( read line < " + path("fifo") + " ) & ) &\n", 0755);
+    for (int i = 0; i < 100; ++i) {
+        const std::string number = std::to_string(i);
+        const std::string command = daemon + " -C " + number;
+        ASSERT_EQ(KLIBCExec(daemon.c_str(), "-C", number.c_str(), nullptr, nullptr), 0);
+        EXPECT_EQ(KLIBCIsProcAlive(command.c_str()), 1) << i;
+        EXPECT_EQ(KLIBCKill(command.c_str(), SIGKILL), 0);
+        EXPECT_TRUE(eventually([&] { return KLIBCIsProcAlive(command.c_str()) == 0; })) << i;
+    }
+}
+
 TEST_F(process, KLIBCKill_commandLine_endsEveryMatch) {
     sleeper first{script_, {script_, "-C", "lbr0"}};
     sleeper second{script_, {script_, "-C", "lbr0", "-S", "eth0"}};

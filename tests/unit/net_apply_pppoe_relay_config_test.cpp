@@ -56,9 +56,21 @@ public:
         return ended_by_ < 0 ? 0 : ended_by_;
     }
     int wait_for_end() {
-        int status = 0;
-        waitpid(pid_, &status, 0);
-        return ended_by_ = WTERMSIG(status);
+        if (ended_by_ < 0) {
+            int status = 0;
+            waitpid(pid_, &status, 0);
+            ended_by_ = WTERMSIG(status);
+        }
+        return ended_by_;
+    }
+    /** Goes when it has been told to end, after some pauses. */
+    void end_after(test_rig &rig, int pauses = 1) {
+        rig.on_sleep([this, pauses](long) mutable {
+            if (--pauses == 0) {
+                wait_for_end();
+                shell("rm -r " + kProcesses + "/" + std::to_string(pid_));
+            }
+        });
     }
 
 private:
@@ -121,10 +133,23 @@ TEST_F(net_apply_pppoe_relay_config, KOVANetApplyPPPoERelayConfig_wantedAndRuns_
 TEST_F(net_apply_pppoe_relay_config, KOVANetApplyPPPoERelayConfig_otherServer_isStartedAnew) {
     for (const char *command : {"/usr/sbin/pppoe-relay -C lbr0 -S eth10", "/usr/sbin/pppoe-relay -C lbr0 -S eth0"}) {
         process relay(command);
-        EXPECT_OUTCOME(apply(), {.result = 0, .commands = {started("lbr0", "eth1")}});
-        EXPECT_EQ(SIGTERM, relay.wait_for_end());
-        shell("rm -r " + kProcesses + "/[0-9]*");
+        relay.end_after(rig);
+        EXPECT_OUTCOME(apply(), {.result = 0, .commands = {started("lbr0", "eth1")}, .sleeps = {25}});
+        EXPECT_EQ(SIGTERM, relay.ended_by());
     }
+}
+
+TEST_F(net_apply_pppoe_relay_config, KOVANetApplyPPPoERelayConfig_relayThatTakesItsTime_isWaitedForASecond) {
+    process relay("/usr/sbin/pppoe-relay -C lbr0 -S eth0");
+    relay.end_after(rig, 3);
+    EXPECT_OUTCOME(apply(), {.result = 0, .commands = {started("lbr0", "eth1")}, .sleeps = {25, 25, 25}});
+    process other("/usr/sbin/pppoe-relay -C lbr0 -S eth0");
+    other.end_after(rig, 100);
+    const std::vector<long> second(40, 25);
+    EXPECT_OUTCOME(apply(), {.result = 0, .commands = {started("lbr0", "eth1")}, .sleeps = second});
+    write_file(kDirectory + "/lbr0", "enable=no\n");
+    EXPECT_OUTCOME(apply(), {.result = 0, .sleeps = second});
+    EXPECT_EQ(SIGTERM, other.wait_for_end());
 }
 
 TEST_F(net_apply_pppoe_relay_config, KOVANetApplyPPPoERelayConfig_notWanted_isStopped) {
@@ -145,8 +170,9 @@ TEST_F(net_apply_pppoe_relay_config, KOVANetApplyPPPoERelayConfig_notWanted_isSt
         EXPECT_OUTCOME(apply(), {.result = 0});
         process relay("/usr/sbin/pppoe-relay -C lbr0 -S eth1");
         process other("/usr/sbin/pppoe-relay -C lbr1 -S eth1");
-        EXPECT_OUTCOME(apply(), {.result = 0});
-        EXPECT_EQ(SIGTERM, relay.wait_for_end());
+        relay.end_after(rig);
+        EXPECT_OUTCOME(apply(), {.result = 0, .sleeps = {25}});
+        EXPECT_EQ(SIGTERM, relay.ended_by());
         EXPECT_EQ(0, other.ended_by());
         shell("rm -r " + kProcesses + "/[0-9]*");
     }
@@ -154,11 +180,13 @@ TEST_F(net_apply_pppoe_relay_config, KOVANetApplyPPPoERelayConfig_notWanted_isSt
 
 TEST_F(net_apply_pppoe_relay_config, KOVANetApplyPPPoERelayConfig_unknownInterface_isStoppedAndGetsAFile) {
     process relay("/usr/sbin/pppoe-relay -C br7 -S eth1");
+    relay.end_after(rig);
     EXPECT_OUTCOME(apply("br7"),
                    {.result = 0,
                     .log = {"ERR net_get_bridge_config:N Failed to access [/etc/sysconfig/network-scripts/ifcfg-br7].",
-                            "ERR net_get_bridge_config:N Failed to get PPPoE relay config"}});
-    EXPECT_EQ(SIGTERM, relay.wait_for_end());
+                            "ERR net_get_bridge_config:N Failed to get PPPoE relay config"},
+                    .sleeps = {25}});
+    EXPECT_EQ(SIGTERM, relay.ended_by());
     EXPECT_EQ("", read_file(kDirectory + "/br7"));
 }
 

@@ -504,14 +504,16 @@ TEST_F(service_tunnel_execute, KOVATunnelExecute_clientWithoutAddress_isKilledUn
     EXPECT_OUTCOME(execute(KOVA_TUNNEL_RESTART, &conf), {.result = -1,
                                                          .log = {kDone, kNoBrokers, kHangs},
                                                          .commands = {"/etc/gogoc/rc.tun restart"},
-                                                         .locks = conf_locks(3)});
+                                                         .locks = conf_locks(4)});
     EXPECT_TRUE(client.after_kill().was_killed());
     client.end();
     fake_client other;
+    write_file(kConf, "passwd=left by a call that was killed\n");
     EXPECT_OUTCOME(execute(KOVA_TUNNEL_STOP), {.result = -1,
                                                .log = {kDone, kNoBrokers, kHangs},
                                                .commands = {"/etc/gogoc/rc.tun stop"},
-                                               .locks = conf_locks(1)});
+                                               .locks = conf_locks(2)});
+    EXPECT_EQ("<absent>", read_file(kConf));
     EXPECT_TRUE(other.after_kill().was_killed());
     other.end();
 }
@@ -524,7 +526,7 @@ TEST_F(service_tunnel_execute, KOVATunnelExecute_hangingRestart_killsAfterTheTim
     EXPECT_OUTCOME(execute(KOVA_TUNNEL_RESTART, &conf), {.result = -1,
                                                          .log = {kTimeout, kNoBrokers, kHangs, kDone},
                                                          .commands = {"/etc/gogoc/rc.tun restart"},
-                                                         .locks = conf_locks(3),
+                                                         .locks = conf_locks(4),
                                                          .sleeps = std::vector<long>(45, 1000)});
     EXPECT_TRUE(client.after_kill().was_killed());
     client.end();

@@ -247,13 +247,14 @@ int KLIBCReadPidFile(const char *szPath);
  */
 int KLIBCProcGetByPid(pid_t pid, char *szName, int cbName);
 /**
+ * Whether a process runs; one that is on its way to the background is not missed.
  * @param szProc  digits: a pid; anything else: the beginning of a command line up to the end of one of its arguments,
  *                with or without an interpreter before it
  * @return 1 when such a process lives (zombies and the caller excepted), else 0
  */
 int KLIBCIsProcAlive(const char *szProc);
 /**
- * Sends a signal to what KLIBCIsProcAlive matches.
+ * Sends a signal to what KLIBCIsProcAlive matches, once to each of the first 64.
  * @return 0, also when there is nothing to kill; -1 with 0xD00 or 0x8100
  */
 int KLIBCKill(const char *szProc, int signal);

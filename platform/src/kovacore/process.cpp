@@ -1,9 +1,11 @@
 #include "kova/core.h"
 
 #include <algorithm>
+#include <array>
 #include <charconv>
 #include <climits>
 #include <csignal>
+#include <cstdint>
 #include <cstdio>
 #include <cstring>
 #include <dirent.h>
@@ -154,21 +156,98 @@ int copy_text(string_view text, char *to, int size) {
     return 0;
 }
 
-/** Calls for every living process. @return false when the processes cannot be listed */
-template<class Visit> bool for_each_process(Visit visit) {
+/** Calls for every process, until the call says that it is enough. @return false when they cannot be listed */
+template<class Visit> bool for_each_listed(Visit visit) {
     DIR *directory = opendir("/proc");
     if (directory == nullptr)
         return false;
-    while (const dirent *entry = readdir(directory)) {
+    bool goes_on = true;
+    while (const dirent *entry = goes_on ? readdir(directory) : nullptr) {
         const pid_t pid = parse_pid(entry->d_name);
-        if (pid > 0 && is_alive(pid))
-            visit(pid);
+        goes_on = pid <= 0 || visit(pid);
     }
     closedir(directory);
     return true;
 }
 
-/** Calls for every living process, but this one, that a pid or a command line names. */
+/** Calls for every living process. @return false when the processes cannot be listed */
+template<class Visit> bool for_each_process(Visit visit) {
+    return for_each_listed([&](pid_t pid) {
+        if (is_alive(pid))
+            visit(pid);
+        return true;
+    });
+}
+
+/** Pids, of which no more are remembered than there is room for. */
+class pid_memory {
+public:
+    /** @return whether it is a new one */
+    bool add(pid_t pid) {
+        const auto end = pids_.begin() + count_;
+        if (std::find(pids_.begin(), end, pid) != end)
+            return false;
+        if (end != pids_.end())
+            pids_[static_cast<size_t>(count_++)] = pid;
+        return true;
+    }
+
+private:
+    std::array<pid_t, 64> pids_{};
+    std::ptrdiff_t count_ = 0;
+};
+
+/** The search for the processes of a command line. One that goes to the background ends and goes on as another, which a
+ * list of all may lack: there is something new to find as long as a list holds other processes that are ending than the
+ * one before. */
+class command_search {
+public:
+    explicit command_search(string_view command) : command_(command) {}
+
+    /** Calls once for each of them, but this process, until the call says that it is enough. */
+    template<class Visit> void run(Visit visit) {
+        constexpr int kMostLists = 10;
+        for (int i = 0; i < kMostLists && look(visit); ++i) {
+        }
+    }
+
+private:
+    enum class kind { other, wanted, ending };
+
+    [[nodiscard]] kind kind_of(pid_t pid) const {
+        const command_line command{pid};
+        if (command.program().empty()) // or one of the kernel's own, which stay
+            return kind::ending;
+        if (pid == getpid() || !command.runs(command_))
+            return kind::other;
+        return is_alive(pid) ? kind::wanted : kind::ending;
+    }
+
+    /** @return whether another look may find more */
+    template<class Visit> bool look(Visit visit) {
+        const int64_t ending_before = ending_;
+        bool is_enough = false;
+        bool has_new = false;
+        ending_ = 0;
+        for_each_listed([&](pid_t pid) {
+            const kind found = kind_of(pid);
+            ending_ += found == kind::ending ? pid : 0;
+            if (found == kind::wanted && visited_.add(pid)) {
+                has_new = true;
+                is_enough = !visit(pid);
+            }
+            return !is_enough;
+        });
+        return !is_enough && (has_new || ending_ != ending_before);
+    }
+
+    string_view command_;
+    pid_memory visited_;
+    int64_t ending_ = 0; // the sum of their pids on the last list
+};
+
+/** Calls for every living process, but this one, that a pid or a command line names, until the call says that
+ * it is enough. */
 template<class Visit> void for_each_match(const char *process, Visit visit) {
     if (is_digits(process)) {
         const pid_t pid = parse_pid(process);
@@ -176,10 +255,7 @@ template<class Visit> void for_each_match(const char *process, Visit visit) {
             visit(pid);
         return;
     }
-    for_each_process([&](pid_t pid) {
-        if (pid != getpid() && command_line{pid}.runs(process))
-            visit(pid);
-    });
+    command_search{process}.run(visit);
 }
 
 } // namespace
@@ -235,7 +311,10 @@ int KLIBCIsProcAlive(const char *szProc) {
     if (is_empty(szProc))
         return fail(HERE, kErrArgument), 0;
     int alive = 0;
-    for_each_match(szProc, [&](pid_t) { alive = 1; });
+    for_each_match(szProc, [&](pid_t) {
+        alive = 1;
+        return false;
+    });
     return alive;
 }
 
@@ -244,6 +323,9 @@ int KLIBCKill(const char *szProc, int signal) {
         return fail(HERE, kErrArgument);
 
     bool refused = false;
-    for_each_match(szProc, [&](pid_t pid) { refused |= kill(pid, signal) < 0 && errno != ESRCH; });
+    for_each_match(szProc, [&](pid_t pid) {
+        refused |= kill(pid, signal) < 0 && errno != ESRCH;
+        return true;
+    });
     return refused ? fail(HERE, kErrSyscall) : 0;
 }

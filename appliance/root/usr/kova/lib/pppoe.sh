@@ -4,7 +4,8 @@
 # The job "pppoe" is a process pppoe-connect, which dials with pppd. Its state, as long as the job is there:
 #   interface  name of the connection's interface, while it has an address
 #   ended      exit status of a pppoe-connect that has given up
-#   was-up     there since it had one for the first time
+#   kept       there when a dial that fails is not the last one: since the connection was up for the first time, or from
+#              the beginning of one that is meant to be up since the boot
 #   log        what pppd said of the last dial
 #   dns.info   DNS=ADDRESS..., the name servers that the other side told
 
@@ -19,6 +20,13 @@ connection_is_lost() {
     [ -e "$pppoe_state/dns.info" ] || return 0
     rm -f "$pppoe_state/dns.info"
     /usr/kova/lib/resolver-source 4
+}
+
+# connections: prints the pids of the processes that keep one up
+connections() {
+    for process in /proc/[0-9]*; do
+        { read -r name <"$process/comm"; } 2>/dev/null && [ "$name" = pppoe-connect ] && echo "${process#/proc/}"
+    done
 }
 
 # uptime: prints the seconds since the machine started
