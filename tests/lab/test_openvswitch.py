@@ -8,7 +8,7 @@ import pathlib
 
 import pytest
 from conftest import (
-    CALL_FAILED, NO, Daemon, addresses, asked, complaint, data, documented, is_up, keys_of, kovanet, on_other_side, run,
+    CALL_FAILED, NO, Daemon, addresses, asked, complaint, data, is_up, keys_of, kovanet, on_other_side, run,
     wait_for, wait_for_partner,
 )  # fmt: skip
 from dhcp_lab import FILES, clean_server, serve, served_lines, udhcpc
@@ -51,6 +51,10 @@ def of_switch():
     links = {link["ifname"]: link for link in ip("-d", "link", "show")}
     kinds = {name: (link.get("linkinfo", {}).get("info_kind"), link.get("master")) for name, link in links.items()}
     return vsctl("show"), kinds
+
+
+def ip_names():
+    return sorted(link["ifname"] for link in ip("link", "show"))
 
 
 def write(name, text):
@@ -109,9 +113,239 @@ def test_the_devices_are_told_apart():
 
     assert sorted(vsctl("list-ifaces", "ovs_bond0").split()) == MEMBERS
     for question in (library.KLIBNetOVSIfIsSlave, library.KOVANetIfIsBondingPassive):
-        assert [name for name in sorted(ip_names()) if question(name.encode())] == MEMBERS
+        assert [name for name in ip_names() if question(name.encode())] == MEMBERS
     assert not any(library.KLIBNetBridgeIfIsSlave(name.encode()) for name in ip_names()), "a switch is no kernel's bridge"
 
 
-def ip_names():
-    return [link["ifname"] for link in ip("link", "show")]
+@pytest.mark.parametrize("kind", [PHYSICAL, LOGICAL, LOGICAL_AND_BELOW])
+def test_enumerations_hold_ports_and_bonds_and_no_members(kind):
+    links = {link["ifname"]: link for link in ip("addr", "show")}
+    found = interfaces(kind)
+    assert found.keys() == {"eth0", "ovs_eth0", "ovs_bond0"}
+    for name, record in found.items():
+        assert ":".join(f"{byte:02x}" for byte in record.abMac) == links[name]["address"]
+        assert record.nLink == 2 and "LOWER_UP" in links[name]["flags"]
+        shown = [one["local"] for one in links[name]["addr_info"] if one["family"] == "inet"] or [""]
+        assert [record.szIP.decode()] == shown
+        assert library.KOVANetIsDevTypeMatch(name.encode(), kind) == 1
+    assert library.KOVANetIsDevTypeMatch(b"lan0", kind) == 0
+
+
+def test_a_port_has_the_ethernet_link_of_the_interface_behind_it():
+    told = {}
+    for name in (b"eth0", b"ovs_eth0"):
+        told[name] = EthInfo()
+        assert library.KOVANetGetEthInfo(ctypes.byref(told[name]), name) == 0, register()
+    assert bytes(told[b"ovs_eth0"]) == bytes(told[b"eth0"])
+    assert told[b"eth0"].nSpeed == int(pathlib.Path("/sys/class/net/eth0/speed").read_text())
+    assert told[b"eth0"].nMTU == link_of("eth0")["mtu"]
+    of_bond = EthInfo()
+    assert library.KOVANetGetEthInfo(ctypes.byref(of_bond), b"ovs_bond0") == 0, register()
+    assert (of_bond.nSpeed, of_bond.nDuplex, of_bond.nMTU) == (-1, told[b"eth0"].nDuplex, link_of("lan0")["mtu"])
+
+
+def test_the_link_of_a_port_is_that_of_the_interface_behind_it():
+    assert library.KOVANetIfIsLink(b"ovs_eth0") == 1
+    on_other_side("ip", "link", "set", "eth0", "down")
+    try:
+        wait_for(lambda: library.KOVANetIfIsLink(b"ovs_eth0") == 0, 30, "the end of the link")
+        assert "LOWER_UP" in link_of("ovs_eth0")["flags"], "the switch's device runs on"
+        assert vsctl("get", "interface", "eth0", "link_state") in ("up", "down")
+        assert interfaces(LOGICAL)["ovs_eth0"].nLink == 0
+        assert [data("link", "show", name)[0]["link"] for name in ("eth0", "ovs_eth0")] == ["down", "down"]
+    finally:
+        on_other_side("ip", "link", "set", "eth0", "up")
+    wait_for(lambda: library.KOVANetIfIsLink(b"ovs_eth0") == 1, 30, "the link")
+    wait_for_partner("192.168.50.1")
+
+
+def received(link):
+    return int(pathlib.Path(f"/sys/class/net/{link}/statistics/rx_packets").read_text())
+
+
+@pytest.mark.parametrize("mode", MODES)
+def test_a_bond_is_read_and_carries_traffic_while_a_link_is_cut(mode, partner):
+    name, settings, kind = MODES[mode]
+    partner(kind)
+    vsctl("set", "port", "bond0", *settings)
+    write("ovs_bond0", BOND_FILE.format(name))
+    found = Bond()
+    assert library.KOVANetLinkAggrGet(b"ovs_bond0", ctypes.byref(found)) == 0, register()
+    assert (found.mode, found.members(), found.blNoPartner) == (mode, MEMBERS, 0)
+    assert library.KOVANetLinkAggrModeToString(mode).decode().removeprefix("ovs-") == vsctl("get", "port", "bond0", "bond_mode")
+    row = data("bond", "show", "ovs_bond0")
+    assert (row["name"], row["mode"], row["members"], row["partner"]) == ("ovs_bond0", name, MEMBERS, None)
+    assert (row["up"], row["link"], row["address"], row["prefix"]) == (True, "up", "192.168.90.5", 24)
+    assert data("bond", "list") == [row]
+
+    wait_for_members(lan0="enabled", lan1="enabled")
+    wait_for_partner()
+    for cut, kept in (("lan0", "lan1"), ("lan1", "lan0")):
+        on_other_side("ip", "link", "set", cut, "down")
+        wait_for_members(**{cut: "disabled", kept: "enabled"})
+        before = received(kept)
+        wait_for_partner()
+        assert received(kept) > before
+        assert [library.KOVANetIfIsLink(link.encode()) for link in (cut, kept, "ovs_bond0")] == [0, 1, 1]
+        on_other_side("ip", "link", "set", cut, "up")
+        wait_for_members(lan0="enabled", lan1="enabled")
+    wait_for_partner()
+    vsctl("set", "port", "bond0", *MODES[6][1])
+
+
+def test_a_bond_without_a_link_has_none():
+    for link in MEMBERS:
+        on_other_side("ip", "link", "set", link, "down")
+    wait_for_members(lan0="disabled", lan1="disabled")
+    assert library.KOVANetIfIsLink(b"ovs_bond0") == 0
+    assert interfaces(LOGICAL)["ovs_bond0"].nLink == 0
+    assert data("bond", "show", "ovs_bond0")["link"] == "down"
+    for link in MEMBERS:
+        on_other_side("ip", "link", "set", link, "up")
+
+
+def test_show_has_what_is_behind_ports_and_bonds_below_them():
+    rows = {row["name"]: row for row in data("show")["interfaces"]}
+    assert (rows["ovs_eth0"]["kind"], rows["ovs_eth0"]["parts"]) == ("switch-port", ["eth0"])
+    assert (rows["ovs_bond0"]["kind"], rows["ovs_bond0"]["parts"], rows["ovs_bond0"]["bond_mode"]) == (
+        "bond", MEMBERS, "ovs-active-backup")  # fmt: skip
+    lines = kovanet("show").stdout.splitlines()
+    [header] = [line for line in lines if line.startswith("INTERFACE")]
+    tree = [line[: header.index("ROLE")].rstrip() for line in lines[lines.index(header) + 1 :]]
+    assert tree == ["ovs-system", "ovs_bond0", "|-lan0", "`-lan1", "ovs_eth0", "`-eth0"]
+    links = {link["ifname"]: link for link in ip("addr", "show")}
+    for row in data("link", "show"):
+        assert (row["mac"], row["up"]) == (links[row["name"]]["address"], "UP" in links[row["name"]]["flags"])
+
+
+def test_verify_agrees_with_a_switch_that_is_as_the_files_say():
+    assert data("verify")["differences"] == []
+    run("ip", "addr", "flush", "dev", "ovs_bond0")
+    assert [(row["key"], row["wanted"]) for row in data("verify", status=NO)["differences"]] == [
+        ("IPADDR", "192.168.90.5"), ("NETMASK", "255.255.255.0")]  # fmt: skip
+
+
+def test_a_card_of_the_switch_gets_an_address():
+    for name, address, other in (("ovs_eth0", "192.168.50.20", "192.168.50.1"), ("ovs_bond0", "192.168.90.20", None)):
+        assert set_card(card(STATIC, name, address, "255.255.255.0")) == 0, register()
+        assert addresses(name) == [f"{address}/24"]
+        kept = keys_of(interface_file(name))
+        assert (kept["BOOTPROTO"], kept["IPADDR"]) == ("static", address)
+        assert ("SLAVE_LIST" in kept) == (name == "ovs_bond0")
+        if other:
+            wait_for_partner(other)
+
+
+@pytest.mark.parametrize(
+    ("words", "message"),
+    [
+        ("change ovs_bond0 802.3ad lan0 lan1", "ovs_bond0 is a bond of the virtual switch, which is not changed here"),
+        ("delete ovs_bond0", "ovs_bond0 is a bond of the virtual switch, which is not changed here"),
+        ("create ovs_bond1 802.3ad lan0 lan1", 'bond name "ovs_bond1" is not valid: names that begin with ovs_ are the '
+                                               "virtual switch's"),
+        ("create bond1 balance-slb lan0 lan1", 'mode "balance-slb" is one of the virtual switch, whose bonds are not made '
+                                               "here"),
+    ],
+)  # fmt: skip
+def test_a_bond_of_the_switch_is_not_made_or_changed(words, message):
+    before = keys_of(interface_file("ovs_bond0"))
+    assert complaint("bond", *words.split(), "--yes", status=NO) == message
+    assert keys_of(interface_file("ovs_bond0")) == before
+
+
+# ---- MTU
+
+
+def mtu(link):
+    return link_of(link)["mtu"]
+
+
+def stored():
+    return {key: value.strip('"') for key, value in keys_of(KOVAINFO).items() if key.endswith("_mtu")}
+
+
+@pytest.fixture
+def usual_mtu():
+    yield
+    for side in ([], ["-n", "net"]):
+        for link in ("eth0", *MEMBERS):
+            run("ip", *side, "link", "set", link, "mtu", "1500")
+    for link in ("ovs_eth0", "ovs_bond0"):
+        wait_for(lambda: mtu(link) == 1500, 30, f"the MTU of {link}")
+
+
+def test_the_mtu_of_a_bond_is_its_members(partner, usual_mtu):
+    partner("bridge")
+    on_other_side("ip", "-batch", "-", input="".join(f"link set {link} mtu 9000\n" for link in (*MEMBERS, "uplink")))
+    status, said = asked("mtu", "set", "ovs_bond0", "9000", answer=b"y\n")
+    assert status == 0 and said.startswith("lan0 and lan1 get the MTU 9000 and go down for a moment.\n")
+    assert [mtu(link) for link in MEMBERS] == [9000, 9000]
+    assert stored() == {"ovs_bond0_mtu": "9000", "lan0_mtu": "9000", "lan1_mtu": "9000"}
+    assert data("mtu", "show", "ovs_bond0") == [{"name": "ovs_bond0", "mtu": 9000, "configured_mtu": 9000}]
+    wait_for(lambda: mtu("ovs_bond0") == 9000, 30, "the switch's own device to follow")
+    wait_for_members(lan0="enabled", lan1="enabled")
+    wait_for_partner()
+    run("ping", "-c", "1", "-W", "30", "-M", "do", "-s", "8972", "192.168.90.1")
+    assert data("verify")["differences"] == []
+
+
+def test_the_mtu_of_a_port_is_that_of_the_interface_behind_it(usual_mtu):
+    status, said = asked("mtu", "set", "ovs_eth0", "1400", answer=b"y\n")
+    assert status == 0 and said.startswith("eth0 gets the MTU 1400 and goes down for a moment.\n")
+    assert mtu("eth0") == 1400 and stored() == {"eth0_mtu": "1400"}
+    assert data("mtu", "show", "ovs_eth0") == [{"name": "ovs_eth0", "mtu": 1400, "configured_mtu": 1400}]
+    wait_for(lambda: mtu("ovs_eth0") == 1400, 30, "the switch's own device to follow")
+    assert addresses("ovs_eth0") == ["192.168.50.10/24"]
+    wait_for_partner("192.168.50.1")
+
+
+@pytest.mark.parametrize("before", ["", 'lan0_mtu="1480"\novs_bond0_mtu="1480"\n'])
+def test_an_mtu_that_a_member_refuses_is_not_kept_by_the_bond_nor_by_the_other(before, usual_mtu):
+    KOVAINFO.write_text(before)
+    # takes no more than the interface it stands on
+    run("ip", "link", "add", "link", "lan1", "name", "twin0", "type", "macvlan")
+    run("ip", "link", "set", "twin0", "up")
+    write("ovs_bond0", BOND_FILE.format("balance-slb").replace("lan1", "twin0"))
+    try:
+        text = complaint("mtu", "set", "ovs_bond0", "9000", "--yes", status=CALL_FAILED)
+    finally:
+        run("ip", "link", "del", "twin0")
+    assert text.startswith("cannot set the MTU of ovs_bond0 to 9000: NET_ERR_SYSCALL (0x8100) in net_set_mtu_eth")
+    assert KOVAINFO.read_text() == before
+    assert [mtu(link) for link in MEMBERS] == [1500, 1500] and all(is_up(link) for link in MEMBERS)
+
+
+# ---- files
+
+
+@pytest.mark.parametrize("names", [["eth0"], ["ovs_eth0"], MEMBERS, ["ovs_bond0"], []])
+def test_the_network_script_leaves_the_switch_as_it_is(names, partner):
+    partner("bridge")
+    before = of_switch()
+    run("/etc/rc.network", "stop", *names)
+    taken_down = names or ["eth0", *MEMBERS, "ovs_eth0", "ovs_bond0"]
+    assert [name for name in ip_names() if is_up(name) and name in taken_down] == []
+    assert of_switch() == before
+    for verb in ("start", "restart"):
+        run("/etc/rc.network", verb, *names)
+        assert of_switch() == before
+        assert all(is_up(name) for name in taken_down)
+        assert (addresses("ovs_eth0"), addresses("ovs_bond0")) == (["192.168.50.10/24"], ["192.168.90.5/24"])
+        assert [addresses(name) for name in ("eth0", *MEMBERS)] == [[], [], []]
+        wait_for_partner("192.168.50.1")
+        wait_for_partner()
+
+
+def test_the_dhcp_server_goes_along_to_the_port_and_back(tmp_path):
+    on_other_side("ip", "addr", "flush", "dev", "eth0")
+    run("ip", "addr", "flush", "dev", "ovs_eth0")
+    with clean_server("eth0", "ovs_eth0"):
+        serve("eth0", "192.168.60")
+        run("ip", "addr", "flush", "dev", "eth0")
+        run("ip", "addr", "replace", "192.168.60.1/24", "dev", "ovs_eth0")
+        assert library.DHCPDConfChangeInterface(b"eth0", b"ovs_eth0") == 0, register()
+        assert library.DHCPServerRestart() == 0, register()
+        assert "interface=ovs_eth0" in served_lines()
+        assert udhcpc("eth0", tmp_path)["router"] == "192.168.60.1"
+        assert library.DHCPDConfChangeInterface(b"ovs_eth0", b"eth0") == 0, register()
+        assert not list(FILES.glob("*ovs_eth0*")) and list(FILES.glob("dhcpd-eth0-subnet0.*"))
