@@ -83,22 +83,49 @@ def switch():
             wait_for(lambda: not run("ip", "-o", "link", "show", "type", "openvswitch").stdout, what="the devices' end")
 
 
-@pytest.fixture(autouse=True)
-def configured(keep):
-    """Everything up by its file; the switch is in the end what it was."""
-    keep(KOVAINFO)
+def write_files():
     for name in ("eth0", *MEMBERS):
         write(name, "BOOTPROTO=none\n")
     write("ovs_eth0", STATIC_FILE.format("192.168.50.10"))
     write("ovs_bond0", BOND_FILE.format(MODES[6][0]))
+
+
+@pytest.fixture(scope="module", autouse=True)
+def started(switch):
+    """Everything up by its file; eth0 leads to 192.168.50.1."""
+    write_files()
     on_other_side("ip", "addr", "replace", "192.168.50.1/24", "dev", "eth0")
     run("/etc/rc.network", "start")
-    wait_for(lambda: member_states() == dict.fromkeys(MEMBERS, "enabled"), 30, "both members")
+
+
+@pytest.fixture(autouse=True)
+def kept_switch(started, keep):
+    """The files are there, and the switch is in the end what it was."""
+    keep(KOVAINFO)
+    write_files()
+    wait_for_members(lan0="enabled", lan1="enabled")
     before = of_switch()
     yield
     assert of_switch() == before
-    for path in SCRIPTS.glob("ifcfg-*"):
-        path.unlink()
+
+
+@pytest.fixture
+def started_again():
+    """For what changes addresses."""
+    yield
+    write_files()
+    run("/etc/rc.network", "start", "ovs_eth0", "ovs_bond0")
+
+
+@pytest.fixture
+def bond_in():
+    """bond_in(mode): the switch's bond in another mode, until the test ends."""
+
+    def work(mode):
+        vsctl("set", "port", "bond0", *MODES[mode][1])
+
+    yield work
+    work(6)
 
 
 def test_the_devices_are_told_apart():
@@ -164,15 +191,15 @@ def received(link):
 
 
 @pytest.mark.parametrize("mode", MODES)
-def test_a_bond_is_read_and_carries_traffic_while_a_link_is_cut(mode, partner):
-    name, settings, kind = MODES[mode]
+def test_a_bond_is_read_and_carries_traffic_while_a_link_is_cut(mode, partner, bond_in):
+    name, _, kind = MODES[mode]
     partner(kind)
-    vsctl("set", "port", "bond0", *settings)
+    bond_in(mode)
     write("ovs_bond0", BOND_FILE.format(name))
     found = Bond()
     assert library.KOVANetLinkAggrGet(b"ovs_bond0", ctypes.byref(found)) == 0, register()
     assert (found.mode, found.members(), found.blNoPartner) == (mode, MEMBERS, 0)
-    assert library.KOVANetLinkAggrModeToString(mode).decode().removeprefix("ovs-") == vsctl("get", "port", "bond0", "bond_mode")
+    assert name.removeprefix("ovs-") == vsctl("get", "port", "bond0", "bond_mode")
     row = data("bond", "show", "ovs_bond0")
     assert (row["name"], row["mode"], row["members"], row["partner"]) == ("ovs_bond0", name, MEMBERS, None)
     assert (row["up"], row["link"], row["address"], row["prefix"]) == (True, "up", "192.168.90.5", 24)
@@ -190,7 +217,6 @@ def test_a_bond_is_read_and_carries_traffic_while_a_link_is_cut(mode, partner):
         on_other_side("ip", "link", "set", cut, "up")
         wait_for_members(lan0="enabled", lan1="enabled")
     wait_for_partner()
-    vsctl("set", "port", "bond0", *MODES[6][1])
 
 
 def test_a_bond_without_a_link_has_none():
@@ -218,14 +244,14 @@ def test_show_has_what_is_behind_ports_and_bonds_below_them():
         assert (row["mac"], row["up"]) == (links[row["name"]]["address"], "UP" in links[row["name"]]["flags"])
 
 
-def test_verify_agrees_with_a_switch_that_is_as_the_files_say():
+def test_verify_agrees_with_a_switch_that_is_as_the_files_say(started_again):
     assert data("verify")["differences"] == []
     run("ip", "addr", "flush", "dev", "ovs_bond0")
     assert [(row["key"], row["wanted"]) for row in data("verify", status=NO)["differences"]] == [
         ("IPADDR", "192.168.90.5"), ("NETMASK", "255.255.255.0")]  # fmt: skip
 
 
-def test_a_card_of_the_switch_gets_an_address():
+def test_a_card_of_the_switch_gets_an_address(started_again):
     for name, address, other in (("ovs_eth0", "192.168.50.20", "192.168.50.1"), ("ovs_bond0", "192.168.90.20", None)):
         assert set_card(card(STATIC, name, address, "255.255.255.0")) == 0, register()
         assert addresses(name) == [f"{address}/24"]
@@ -318,25 +344,22 @@ def test_an_mtu_that_a_member_refuses_is_not_kept_by_the_bond_nor_by_the_other(b
 # ---- files
 
 
-@pytest.mark.parametrize("names", [["eth0"], ["ovs_eth0"], MEMBERS, ["ovs_bond0"], []])
-def test_the_network_script_leaves_the_switch_as_it_is(names, partner):
+def test_the_network_script_leaves_the_switch_as_it_is(partner):
     partner("bridge")
     before = of_switch()
-    run("/etc/rc.network", "stop", *names)
-    taken_down = names or ["eth0", *MEMBERS, "ovs_eth0", "ovs_bond0"]
-    assert [name for name in ip_names() if is_up(name) and name in taken_down] == []
+    run("/etc/rc.network", "stop")
+    assert not any(is_up(name) for name in ("eth0", *MEMBERS, "ovs_eth0", "ovs_bond0"))
     assert of_switch() == before
-    for verb in ("start", "restart"):
-        run("/etc/rc.network", verb, *names)
+    for words in (["start"], ["restart", "eth0", "lan0"], ["restart", "ovs_eth0", "ovs_bond0"]):
+        run("/etc/rc.network", *words)
         assert of_switch() == before
-        assert all(is_up(name) for name in taken_down)
         assert (addresses("ovs_eth0"), addresses("ovs_bond0")) == (["192.168.50.10/24"], ["192.168.90.5/24"])
         assert [addresses(name) for name in ("eth0", *MEMBERS)] == [[], [], []]
         wait_for_partner("192.168.50.1")
         wait_for_partner()
 
 
-def test_the_dhcp_server_goes_along_to_the_port_and_back(tmp_path):
+def test_the_dhcp_server_goes_along_to_the_port_and_back(tmp_path, started_again):
     on_other_side("ip", "addr", "flush", "dev", "eth0")
     run("ip", "addr", "flush", "dev", "ovs_eth0")
     with clean_server("eth0", "ovs_eth0"):
