@@ -84,8 +84,7 @@ names given_with(const std::string &name) {
     return members.empty() ? names{name} : members;
 }
 
-/** Whether a link counts as too slow for an MTU, which is then kept for a faster one. A bond of the switch never does.
- */
+/** Whether a link is too slow for an MTU, which is then kept for a faster one; a bond of the switch never is. */
 bool is_too_slow_for(const std::string &name, const std::string &mtu) {
     constexpr int kGigabit = 1000;
     constexpr int kJumbo = 1500;
