@@ -167,7 +167,7 @@ int KOVANetSetMTUEth(const char *szValue, const char *szIfname);
 /**
  * Stores an MTU and sets it in the kernel, waits 5 seconds for the link and announces "net/mtu_change". On a link below
  * 1000 Mb/s, or of unknown speed, an MTU of 1500 and more is stored and announced, but not set. For a bond of the
- * virtual switch its members are set, and the event is raised whatever comes of it.
+ * virtual switch its members are set, and the event is raised whatever comes of it; the register keeps the failure.
  * @param szValue   MTU in decimal
  * @param szIfname  interface, at most 16 characters
  * @return 0; -1 as KOVAConfSetMTUValue, KOVANetGetEthInfo and KOVANetSetMTUEth; no event then, but for such a bond

@@ -15,10 +15,20 @@ namespace {
 /** Links need a while to come back; who listens to the event may rely on them. */
 constexpr int kSettleSeconds = 5;
 
-int announce(const char *szIfname, const char *szValue, int result) {
+int announce(const char *szIfname, const char *szValue) {
     pause_for_seconds(kSettleSeconds);
     (void)KOVANetMTUChangeHook(szIfname, szValue); // what was changed stays changed
-    return result;
+    return 0;
+}
+
+/** The register goes on telling why the change failed, whatever the event's listeners do. */
+int announce_failure(const char *szIfname, const char *szValue) {
+    const uint32_t code = KLIBCErrGet();
+    const char *const unit = KLIBCErrorGetFile();
+    const int line = KLIBCErrorGetLine();
+    announce(szIfname, szValue);
+    KLIBCErrSetEx(code, unit, line);
+    return -1;
 }
 
 int set_ovs_slave(const char *szValue, const char *szSlave) {
@@ -74,7 +84,7 @@ int set_interface(const char *szValue, const char *szIfname) {
         log_err(HERE, "Failed to ifconfig MTU Value(0x%04X)", KLIBCErrGet());
         return fail_to_set(szValue, szIfname);
     }
-    return announce(szIfname, szValue, 0);
+    return announce(szIfname, szValue);
 }
 
 } // namespace
@@ -86,7 +96,7 @@ extern "C" int KOVANetSetMTUValue(const char *szValue, const char *szIfname) {
     char szOriginal[1024];
     switch (KLIBNetOVSIfIsMaster(szIfname)) {
     case kOvsBond:
-        return announce(szIfname, szValue, set_ovs_bond(szValue, szIfname));
+        return set_ovs_bond(szValue, szIfname) < 0 ? announce_failure(szIfname, szValue) : announce(szIfname, szValue);
     case kOvsPort:
         if (KLIBNetOVSGetOriginalIf(szIfname, szOriginal, sizeof szOriginal) < 0) {
             return fail_keeping_code(HERE, -1, "get ovs origin interface error");

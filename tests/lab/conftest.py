@@ -248,6 +248,11 @@ def routes(*selection):
     return [line.strip() for line in run("ip", "-4", "route", "show", *selection).stdout.splitlines()]
 
 
+def wait_for_partner(address="192.168.90.1"):
+    wait_for(lambda: run("ping", "-c", "1", "-W", str(SLOWNESS), address, status=None).returncode == 0, 30,
+             f"an answer of {address}")  # fmt: skip
+
+
 def is_up(link):
     return bool(int(pathlib.Path(f"/sys/class/net/{link}/flags").read_text(), 16) & 1)
 
@@ -281,3 +286,20 @@ def keep():
         else:
             path.write_bytes(before[0])
             path.chmod(before[1])
+
+
+@pytest.fixture
+def partner():
+    """partner(kind): the other side of links as one bridge or bond "uplink" with the address 192.168.90.1."""
+    used = set()
+
+    def make(kind, links=("lan0", "lan1")):
+        used.update(links)
+        on_other_side("ip", "link", "del", "uplink", status=None)
+        more = " miimon 50" if kind.startswith("bond") else ""
+        joined = "".join(f"link set {link} down\nlink set {link} master uplink\nlink set {link} up\n" for link in links)
+        on_other_side("ip", "-batch", "-", input=f"link add uplink type {kind}{more}\n{joined}link set uplink up\n"
+                                                 "addr add 192.168.90.1/24 dev uplink\n")  # fmt: skip
+
+    yield make
+    on_other_side("ip", "-batch", "-", input="link del uplink\n" + "".join(f"link set {link} up\n" for link in used))

@@ -7,6 +7,17 @@ class NetInfo(ctypes.Structure):
                 ("abMac", ctypes.c_ubyte * 6), ("szIP", ctypes.c_char * 20), ("szMask", ctypes.c_char * 20)]
 
 
+class IfInfo(ctypes.Structure):
+    _fields_ = [("szIfname", ctypes.c_char * 16), ("abMac", ctypes.c_ubyte * 6), ("szIP", ctypes.c_char * 64),
+                ("nLink", ctypes.c_uint32), ("nFlags", ctypes.c_uint32), ("szMask", ctypes.c_char * 20)]
+
+
+class EthInfo(ctypes.Structure):
+    _fields_ = [("nSpeed", ctypes.c_int32), ("nDuplex", ctypes.c_int32), ("nMTU", ctypes.c_int32),
+                ("nSupported", ctypes.c_uint32), ("nBestSpeed", ctypes.c_int32), ("nBestDuplex", ctypes.c_int32),
+                ("szBestMode", ctypes.c_char * 16)]
+
+
 class DhcpOption(ctypes.Structure):
     pass  # its fields name it
 
@@ -87,6 +98,20 @@ def get_card(index):
 def register():
     """The error register: code and unit."""
     return core.KLIBCErrGet(), core.KLIBCErrorGetFile().decode()
+
+
+def enumerated(call, kind):
+    """The records of an enumeration, by name."""
+    records = (IfInfo * 32)()
+    count = call(records, len(records), kind)
+    assert count >= 0, register()
+    found = {record.szIfname.decode(): record for record in records[:count]}
+    assert len(found) == count
+    return found
+
+
+def interfaces(kind):
+    return enumerated(library.KLIBNetGetInterfaceInfo, kind)
 
 
 def string_list(texts):

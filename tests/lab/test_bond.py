@@ -8,7 +8,7 @@ import pathlib
 import re
 
 import pytest
-from conftest import SLOWNESS, DhcpServer, addresses, is_up, on_other_side, run, wait_for
+from conftest import DhcpServer, addresses, is_up, on_other_side, run, wait_for, wait_for_partner
 from sdk import STATIC, Bond, card, library, register
 
 SCRIPTS = pathlib.Path("/etc/sysconfig/network-scripts")
@@ -48,21 +48,6 @@ def running_links(keep):
     assert run("ip", "-o", "link", "show", "type", "bond").stdout == ""
 
 
-@pytest.fixture
-def partner():
-    """partner(kind): the other side of links as one bridge or bond "uplink" with the address 192.168.90.1."""
-
-    def make(kind, links=("lan0", "lan1")):
-        on_other_side("ip", "link", "del", "uplink", status=None)
-        more = " miimon 50" if kind.startswith("bond") else ""
-        joined = "".join(f"link set {link} down\nlink set {link} master uplink\nlink set {link} up\n" for link in links)
-        on_other_side("ip", "-batch", "-", input=f"link add uplink type {kind}{more}\n{joined}link set uplink up\n"
-                                                 "addr add 192.168.90.1/24 dev uplink\n")  # fmt: skip
-
-    yield make
-    on_other_side("ip", "-batch", "-", input="link del uplink\n" + "".join(f"link set {link} up\n" for link in LINKS))
-
-
 def bond(mode, members=("lan0", "lan1"), name="bond0"):
     wanted = Bond(szName=name.encode(), mode=mode, cSlaves=len(members))
     for place, member in zip(wanted.aszSlaves, members):
@@ -92,14 +77,6 @@ def member_states():
 
 def keys(link):
     return sorted(path(link).read_text().splitlines())
-
-
-def reaches_partner():
-    return run("ping", "-c", "1", "-W", str(SLOWNESS), "192.168.90.1", status=None).returncode == 0
-
-
-def wait_for_partner():
-    wait_for(reaches_partner, 30, "an answer of the partner")
 
 
 def wait_for_links(**wanted):

@@ -9,32 +9,12 @@ import pathlib
 
 import pytest
 from conftest import on_other_side, run, wait_for
-from sdk import library, register
+from sdk import IfInfo, enumerated, interfaces, library, register
 
 KOVANET = "/usr/bin/kovanet"
 PHYSICAL, LOGICAL, LOGICAL_AND_BELOW = 1, 2, 8
 NO_SOCKET, NOT_OF_THE_KIND = 0x3400, 0xBC00
-MAX = 32
 UP, RUNNING, MASTER, SLAVE = 0x1, 0x40, 0x400, 0x800
-
-
-class IfInfo(ctypes.Structure):
-    _fields_ = [("szIfname", ctypes.c_char * 16), ("abMac", ctypes.c_ubyte * 6), ("szIP", ctypes.c_char * 64),
-                ("nLink", ctypes.c_uint32), ("nFlags", ctypes.c_uint32), ("szMask", ctypes.c_char * 20)]  # fmt: skip
-
-
-def enumerated(call, kind):
-    """The records of an enumeration, by name."""
-    records = (IfInfo * MAX)()
-    count = call(records, MAX, kind)
-    assert count >= 0, register()
-    found = {record.szIfname.decode(): record for record in records[:count]}
-    assert len(found) == count
-    return found
-
-
-def interfaces(kind):
-    return enumerated(library.KLIBNetGetInterfaceInfo, kind)
 
 
 def info(name):

@@ -243,6 +243,16 @@ TEST_F(net_set_mtu_value, KOVANetSetMTUValue_switchBondThatFails_isAnnouncedAllT
                     .locks = {"+0x806", "-0x800", "+0x806", "-0x800"},
                     .sleeps = {5000}});
     EXPECT_EQ((texts{"eth0 down", "eth0 up"}), kernel.changes);
+    rig.fail("KLIBPluginSDKInit");
+    EXPECT_OUTCOME(set("9000", "ovs_bond0"),
+                   {.result = -1,
+                    .code = 0x8100, // of the change, not of the event
+                    .unit = "net_set_mtu_eth",
+                    .log = {kNotice, "ERR net_set_mtu_eth:N Kernel refuses MTU 9000 of eth0: Invalid argument",
+                            "ERR net_set_mtu_eth:N Failed to set MTU 9000 of eth0",
+                            kBegin + "KOVANetSetMTUEth [eth0] failed (0x8100)", "ERR KLIBPluginSDKInit failed"},
+                    .locks = {"+0x806", "-0x800", "+0x806", "-0x800"},
+                    .sleeps = {5000}});
     shell("rm " + ifcfg("ovs_bond0"));
     EXPECT_OUTCOME(set("9000", "ovs_bond0"), {.result = -1,
                                               .code = 0x900,

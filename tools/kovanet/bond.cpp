@@ -16,17 +16,8 @@ namespace kova {
 namespace {
 
 constexpr int kFewestMembers = 2;
-using names = std::vector<std::string>;
 
 // ---- what there is
-
-std::string joined(const names &all) {
-    std::string text;
-    for (const std::string &name : all) {
-        text += (text.empty() ? "" : ", ") + name;
-    }
-    return text;
-}
 
 bool holds(const names &all, const std::string &name) {
     return std::find(all.begin(), all.end(), name) != all.end();

@@ -72,6 +72,27 @@ std::vector<std::string> members_of(const KOVALINKAGGROPT &bond) {
     return {bond.aszSlaves, bond.aszSlaves + bond.cSlaves};
 }
 
+std::string joined(const names &all, const char *between) {
+    std::string text;
+    for (const std::string &name : all) {
+        text += (text.empty() ? "" : between) + name;
+    }
+    return text;
+}
+
+bool is_switch_bond(const std::string &name) {
+    constexpr int kBond = 2;
+    return KLIBNetOVSIfIsMaster(name.c_str()) == kBond;
+}
+
+std::optional<std::string> behind_switch_port(const std::string &name) {
+    constexpr int kPort = 1;
+    char original[IFNAMSIZ] = "";
+    const bool is_port = KLIBNetOVSIfIsMaster(name.c_str()) == kPort &&
+                         KLIBNetOVSGetOriginalIf(name.c_str(), original, sizeof original) == 0;
+    return is_port ? std::optional<std::string>{original} : std::nullopt;
+}
+
 std::vector<std::string> ports_of(const std::string &name) {
     if (KLIBNetBridgeIfIsMaster(name.c_str()) != 1) {
         return {};

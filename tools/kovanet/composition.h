@@ -11,6 +11,11 @@
 
 namespace kova {
 
+using names = std::vector<std::string>;
+
+/** Names with a text between them. */
+std::string joined(const names &all, const char *between = ", ");
+
 /** Keeps other changes of this kind away while it lives; ends the program when it cannot be had. */
 class change_lock {
 public:
@@ -31,6 +36,11 @@ std::optional<VLANINFO> find_vlan_on(const std::string &row_device);
 /** A bond with its members, nothing for what has none; one of the virtual switch may be read in part. */
 std::optional<KOVALINKAGGROPT> find_bond(const std::string &name);
 std::vector<std::string> members_of(const KOVALINKAGGROPT &bond);
+
+/** Whether an interface is a bond of the virtual switch. */
+bool is_switch_bond(const std::string &name);
+/** The interface behind a port of the virtual switch, nothing for what is no such port. */
+std::optional<std::string> behind_switch_port(const std::string &name);
 
 /** The ports of a bridge; none of what is no bridge. */
 std::vector<std::string> ports_of(const std::string &name);

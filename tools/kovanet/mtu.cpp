@@ -72,70 +72,83 @@ std::string checked_mtu(const std::string &text) {
     return std::to_string(mtu);
 }
 
-/** Whether a link counts as too slow for an MTU, which is then kept for a faster one. */
+/** The interfaces that get the MTU of one, in the order they get it. */
+names given_with(const std::string &name) {
+    if (const std::optional<VLANINFO> vlan = find_vlan(name)) {
+        return {vlan->szRowDevice, name};
+    }
+    if (const std::optional<std::string> original = behind_switch_port(name)) {
+        return {*original};
+    }
+    const names members = is_switch_bond(name) ? members_of(find_bond(name).value_or(KOVALINKAGGROPT{})) : names{};
+    return members.empty() ? names{name} : members;
+}
+
+/** Whether a link is too slow for an MTU, which is then kept for a faster one; a bond of the switch never is. */
 bool is_too_slow_for(const std::string &name, const std::string &mtu) {
     constexpr int kGigabit = 1000;
     constexpr int kJumbo = 1500;
     ETHINFO link{};
-    return mtu_of(mtu) >= kJumbo && KOVANetGetEthInfo(&link, name.c_str()) == 0 && link.nSpeed < kGigabit;
+    return mtu_of(mtu) >= kJumbo && !is_switch_bond(name) && KOVANetGetEthInfo(&link, name.c_str()) == 0 &&
+           link.nSpeed < kGigabit;
 }
 
-std::vector<std::string> effects_of(const std::string &name, const std::string &mtu,
-                                    const std::optional<VLANINFO> &vlan) {
-    const std::string changed = vlan ? std::string(vlan->szRowDevice) + " and " + name : name;
+names effects_of(const std::string &name, const std::string &mtu) {
+    const names given = given_with(name);
+    const bool is_one = given.size() == 1;
+    const std::string changed = joined(given, " and ");
     if (is_too_slow_for(name, mtu)) {
         return {"The MTU " + mtu + " of " + changed +
                     " is stored, but not used now: the link is slower than 1000 Mb/s, "
                     "or its speed is not known.",
                 "Addresses stay as they are."};
     }
-    return {changed + " get" + (vlan ? "" : "s") + " the MTU " + mtu + " and go" + (vlan ? "" : "es") +
+    return {changed + " get" + (is_one ? "s" : "") + " the MTU " + mtu + " and go" + (is_one ? "es" : "") +
                 " down for a moment.",
             "IPv4 addresses and the default gateway stay; IPv6 addresses that were added by hand are lost.",
             "Connections over " + changed + " pause."};
 }
 
-/** The stored MTU of an interface, or that there is none, to be put back. */
-class stored_mtu {
+/** The MTU of an interface, stored and in use, to be put back. */
+class kept_mtu {
 public:
-    explicit stored_mtu(const std::string &name) : key_(owner_of(name) + "_mtu") {
+    explicit kept_mtu(const std::string &name)
+        : name_(name), key_(name + "_mtu"), in_use_(is_switch_bond(name) ? 0 : KOVAGetMTU(name.c_str())) {
         clear_error();
-        const int found = KLIBCFileGetKeyValue("/etc/kovainfo.conf", key_.c_str(), value_, sizeof value_, 0);
+        const int found = KLIBCFileGetKeyValue("/etc/kovainfo.conf", key_.c_str(), stored_, sizeof stored_, 0);
         if (found < 0) {
             call_failed("cannot read the configured MTU of " + name);
         }
-        is_there_ = found > 0;
+        is_stored_ = found > 0;
     }
     void put_back() const {
-        if (is_there_) {
-            KLIBCINFOSetKeyValue(key_.c_str(), value_);
+        if (is_stored_) {
+            KLIBCINFOSetKeyValue(key_.c_str(), stored_);
         } else {
             KLIBCINFORemoveKey(key_.c_str());
+        }
+        if (in_use_ > 0 && KOVAGetMTU(name_.c_str()) != in_use_) {
+            KOVANetSetMTUEth(std::to_string(in_use_).c_str(), name_.c_str());
         }
     }
 
 private:
-    /** The interface whose key it is: for a port of the virtual switch the one behind it. */
-    static std::string owner_of(const std::string &name) {
-        constexpr int kSwitchPort = 1;
-        char original[64] = "";
-        const bool is_port = KLIBNetOVSIfIsMaster(name.c_str()) == kSwitchPort &&
-                             KLIBNetOVSGetOriginalIf(name.c_str(), original, sizeof original) == 0;
-        return is_port ? original : name;
-    }
-
+    std::string name_;
     std::string key_;
-    char value_[64] = "";
-    bool is_there_ = false;
+    int in_use_; // 0 for a bond of the switch, which only its members have one for
+    char stored_[64] = "";
+    bool is_stored_ = false;
 };
 
 /** Keeps what is configured and what the kernel drops when an interface goes down; puts back what was lost. */
 class kept_settings {
 public:
-    kept_settings(const std::string &name, const std::optional<VLANINFO> &vlan) {
-        stored_.emplace_back(name);
-        if (vlan) {
-            stored_.emplace_back(vlan->szRowDevice);
+    explicit kept_settings(const std::string &name) {
+        for (const std::string &given : given_with(name)) {
+            mtus_.emplace_back(given);
+        }
+        if (is_switch_bond(name)) {
+            mtus_.emplace_back(name);
         }
         char interface[IFNAMSIZ] = "";
         DefaultGatewayGet(gateway_, sizeof gateway_, interface, sizeof interface);
@@ -150,15 +163,15 @@ public:
             KOVANetDefaultGatewaySet(gateway_);
         }
     }
-    /** A value that the kernel does not take is not kept for the next start. */
-    void restore_configured() const {
-        for (const stored_mtu &mtu : stored_) {
+    /** A value that the kernel does not take is not kept for the next start, nor where it was taken before. */
+    void put_back_mtus() const {
+        for (const kept_mtu &mtu : mtus_) {
             mtu.put_back();
         }
     }
 
 private:
-    std::vector<stored_mtu> stored_;
+    std::vector<kept_mtu> mtus_;
     char gateway_[16] = "";
 };
 
@@ -166,7 +179,7 @@ private:
     try {
         call_failed(what); // before another call changes the error register
     } catch (const failure &) {
-        kept.restore_configured();
+        kept.put_back_mtus();
         throw;
     }
 }
@@ -177,11 +190,10 @@ void set(const mtu_words &words) {
     if ((require_interface(words.name).nFlags & IFF_LOOPBACK) != 0) {
         throw failure{kNo, words.name + " is the loopback, whose MTU is not changed here"};
     }
-    const std::optional<VLANINFO> vlan = find_vlan(words.name);
-    confirm(effects_of(words.name, mtu, vlan), words.is_confirmed);
+    confirm(effects_of(words.name, mtu), words.is_confirmed);
 
     const change_lock lock;
-    const kept_settings kept{words.name, vlan};
+    const kept_settings kept{words.name};
     const step_note note{"setting the MTU of " + words.name + ", this takes five seconds"};
     clear_error();
     if (KOVANetSetMTUValue(mtu.c_str(), words.name.c_str()) < 0) {

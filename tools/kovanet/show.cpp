@@ -15,8 +15,6 @@
 namespace kova {
 namespace {
 
-using names = std::vector<std::string>;
-
 // ---- what there is
 
 /** What an interface is and is made of. */
@@ -41,6 +39,9 @@ composition compose(const IFINFO &info) {
     if (const std::optional<KOVALINKAGGROPT> bond = find_bond(name)) {
         const bool is_known = bond->mode != KOVA_LINK_AGGR_UNKNOWN;
         return {"bond", members_of(*bond), {}, is_known ? json(KOVANetLinkAggrModeToString(bond->mode)) : json()};
+    }
+    if (const std::optional<std::string> original = behind_switch_port(name)) {
+        return {"switch-port", {*original}, {}, {}};
     }
     if (KLIBNetBridgeIfIsMaster(name.c_str()) == 1) {
         return {"bridge", ports_of(name), {}, {}};

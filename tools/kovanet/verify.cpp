@@ -65,7 +65,8 @@ struct owners {
 owners owners_in_kernel() {
     owners all;
     for (const IFINFO &info : all_interfaces()) {
-        if (const std::optional<KOVALINKAGGROPT> bond = find_bond(info.szIfname)) {
+        const std::optional<KOVALINKAGGROPT> bond = find_bond(info.szIfname);
+        if (bond && !is_switch_bond(info.szIfname)) {
             for (const std::string &member : members_of(*bond)) {
                 all.bonds[member] = info.szIfname;
             }
@@ -132,7 +133,8 @@ private:
     void compare_mtu() {
         const std::string wanted = value_of(kKovaInfo, name_ + "_mtu");
         if (!wanted.empty()) {
-            result_.add(kKovaInfo, name_ + "_mtu", wanted, std::to_string(KOVAGetMTU(name_.c_str())));
+            const int mtu = KOVAGetMTUSetting(name_.c_str());
+            result_.add(kKovaInfo, name_ + "_mtu", wanted, mtu > 0 ? std::to_string(mtu) : "");
         }
     }
 

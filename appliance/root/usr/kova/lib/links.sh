@@ -93,8 +93,10 @@ link set dev $1 up
 END
 }
 
+# leave IF: a port of the virtual switch remains one, which only the switch can change
 leave() {
-    [ ! -e "$net/$1/master" ] || ip link set dev "$1" nomaster || fail "$1: cannot leave its bond or bridge"
+    is_bond "$1/master" || is_bridge "$1/master" || return 0
+    ip link set dev "$1" nomaster || fail "$1: cannot leave its bond or bridge"
 }
 
 # set_mtu IF: what is configured; an interface without a setting keeps what it has
