@@ -33,7 +33,7 @@ UNIT_PROGRAMS = {"unit": "tests/kovanet-unit-tests", "platform": "tests/platform
 PROGRAMS = {**UNIT_PROGRAMS, "fault": "tests/kovanet-fault-tests", "crash": "tests/crash/kova-crash-tests"}
 BUILT_ANEW = {"sanitize", "coverage", "arm64"}  # rings that need the libraries once more, in a way of their own
 FAULT_SHARDS = 2  # processes that share the sweep: it mostly waits for its own processes
-SLOWEST = 1800  # seconds for one step, on a machine that has much else to do
+SLOWEST = 5400  # seconds for one step, on a machine that has much else to do
 
 
 MAKE_BOXES = {"test_bench", "test_debian"}  # gates that do
@@ -89,9 +89,10 @@ class Step:
             return self
         begin = time.monotonic()
         try:
-            done = subprocess.run(self.command, cwd=ROOT, env=self.environment, stdin=subprocess.DEVNULL,
-                                  stdout=subprocess.PIPE, stderr=subprocess.STDOUT, text=True, errors="replace",
-                                  timeout=SLOWEST + 60)  # a box ends by itself before
+            # the tests end processes by signals, which are ignored by those that nohup or a shell in the background starts
+            done = subprocess.run(["env", "--default-signal", *self.command], cwd=ROOT, env=self.environment,
+                                  stdin=subprocess.DEVNULL, stdout=subprocess.PIPE, stderr=subprocess.STDOUT, text=True,
+                                  errors="replace", timeout=SLOWEST + 60)  # a box ends by itself before
             self.output, self.status = done.stdout, done.returncode
         except subprocess.TimeoutExpired as late:
             self.output = (late.stdout or b"").decode(errors="replace") + f"\nstill running after {SLOWEST} s\n"
@@ -308,6 +309,7 @@ def main():
     asked = parser.parse_args()
     if asked.refresh:
         record_fault_points()
+    os.umask(0o022)  # what the tests make is looked at by others than root
     out = pathlib.Path(tempfile.mkdtemp(prefix="kova-test-"))
     try:
         steps = chosen_steps(out, asked.names)

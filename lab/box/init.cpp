@@ -17,6 +17,7 @@
 #include <sched.h>
 #include <sys/prctl.h>
 #include <sys/signalfd.h>
+#include <sys/stat.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
@@ -132,7 +133,9 @@ int box_init(const box_options &options, bool mapped, terminal_use use, const un
     try {
         // whatever ends kova-box, the box goes with it; should it be gone already, the channel is at its end
         require(prctl(PR_SET_PDEATHSIG, SIGKILL) == 0, "cannot follow kova-box");
+        const mode_t mask = umask(022); // the command's own; others than root go into the box's directories
         make_box(options, mapped);
+        umask(mask);
         const pid_t command = fork();
         require(command >= 0, "cannot make a process");
         if (command == 0) {

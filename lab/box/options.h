@@ -19,8 +19,8 @@ struct box_options {
     bool network = true;                   // false: loopback only, no other side
     bool guest = false;                    // on a kernel of its own
     std::string kernel = "/usr/bin/linux.uml";
-    unsigned boot_limit = 60; // seconds for the guest to become ready
-    unsigned limit = 0;       // seconds for the command, 0 for any time
+    unsigned boot_limit = 300; // seconds for the guest to become ready
+    unsigned limit = 0;        // seconds for the command, 0 for any time
     std::vector<std::string> command;
 };
 

@@ -64,13 +64,23 @@ build/cmake-c++
 sed -i 's/^dns_mode=.*/dns_mode="static"/' /etc/kovainfo.conf
 dpkg --install "$2"/*.deb >log 2>&1 || { cat log; exit 1; }
 grep dns_mode /etc/kovainfo.conf
+/sbin/start link-watch
+pgrep -f 'kovanet link watc[h]' >log && echo "job runs"
+mkdir -p /etc/dhcpd /etc/sysconfig/pppoe-relay /var/lib/kova
+written="/etc/dhcpd/dhcpd.info /etc/sysconfig/pppoe-relay/pppoe-relay-eth0.conf /etc/sysconfig/network-scripts/ifcfg-eth7
+    /etc/sysconfig/network-scripts/DEV_abcdef /etc/gogoc/.tunnel_passwd /etc/gogoc/gogoc.conf /etc/resolv.conf.static
+    /etc/dhclient/ipv4/dhcpcd-eth0.info /etc/iproute2/config/resolv4.conf /var/lib/kova/dhcp-server.leases"
+touch $written
 dpkg --remove $1 >log 2>&1 || { cat log; exit 1; }
 [ "$client" = "$(sha256sum </sbin/dhclient)" ] && echo "client back"
 grep dns_mode /etc/kovainfo.conf
 /sbin/ldconfig --print-cache | grep libkova || echo "libraries gone"
+pgrep -f 'kovanet link watc[h]' || echo "job ended"
+ls $written >log && echo "settings kept"
 dpkg --purge $1 >log 2>&1 || { cat log; exit 1; }
 dpkg-query --show $1 2>/dev/null || echo "packages gone"
 dpkg-divert --list 'kovanet*'
+printf '%s\n' $written /etc/sysconfig /etc/kova /etc/dhcpd >>new-paths
 while read -r path; do
     if [ -e "$path" ] || [ -L "$path" ]; then echo "left: $path"; fi
 done <new-paths
@@ -152,7 +162,7 @@ def test_scripts_are_where_they_have_to_be(packages, tmp_path):
         there = {file.name for file in (tmp_path / name).iterdir()}
         if name in LIBRARIES:
             assert (tmp_path / name / "triggers").read_text().splitlines()[-1] == "activate-noawait ldconfig"
-        scripts = {"preinst", "postinst", "postrm"} if name == "kovanet-appliance" else set()
+        scripts = {"preinst", "postinst", "prerm", "postrm"} if name == "kovanet-appliance" else set()
         assert there & {"preinst", "postinst", "prerm", "postrm", "config"} == scripts, name
 
 
@@ -185,6 +195,6 @@ def test_life_of_the_packages(packages, tmp_path):
         '{"kind":"address","value":"192.168.1.10","valid":true,"reason":null}',
         "/usr/share/man/man1/kovanet.1.gz", "/usr/share/man/man7/kovanetsdk.7.gz", "/usr/share/man/man5/kovanet-files.5.gz",
         *["1 0 0x1000"] * 4,
-        'dns_mode="static"',
-        "client back", 'dns_mode="static"', "libraries gone", "packages gone"]
+        'dns_mode="static"', "job runs",
+        "client back", 'dns_mode="static"', "libraries gone", "job ended", "settings kept", "packages gone"]
     assert hashlib.sha256(pathlib.Path("/var/lib/dpkg/status").read_bytes()).hexdigest() == host

@@ -1,6 +1,7 @@
 """The frames of a cable as the other side sees them, and frames of its own making."""
 import contextlib
 import ctypes
+import os
 import socket
 import struct
 import threading
@@ -37,6 +38,15 @@ def packet_socket(link):
     packets.setsockopt(SOL_PACKET, PACKET_AUXDATA, 1)
     packets.bind((link, EVERY_PROTOCOL))
     return packets
+
+
+@contextlib.contextmanager
+def in_order():
+    """What is sent from here arrives in this order: the kernel has a queue for each processor, and a loaded one lags."""
+    before = os.sched_getaffinity(0)
+    os.sched_setaffinity(0, {min(before)})
+    yield
+    os.sched_setaffinity(0, before)
 
 
 def send(link, frame):

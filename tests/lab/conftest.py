@@ -8,6 +8,7 @@ import pathlib
 import pty
 import re
 import shutil
+import signal
 import socket
 import subprocess
 import threading
@@ -30,8 +31,9 @@ def pytest_runtest_setup(item):
         pytest.fail("lab tests write to /etc and /sbin: run them inside the box", pytrace=False)
 
 
-def wait_for(condition, limit=10.0, what="the condition"):
-    """The first true value of condition(); fails the test when it takes longer than limit seconds."""
+def wait_for(condition, limit=60.0, what="the condition"):
+    """The first true value of condition(); fails the test when it takes longer than limit seconds, which are many more than
+    it takes on a busy machine."""
     limit *= SLOWNESS
     end = time.monotonic() + limit
     while True:
@@ -45,7 +47,7 @@ def wait_for(condition, limit=10.0, what="the condition"):
 
 def run(*command, status=0, **options):
     """Runs a command to its end, captures what it prints and checks its exit status (None: any)."""
-    options = {"capture_output": True, "text": True, "timeout": 30 * SLOWNESS, **options}
+    options = {"capture_output": True, "text": True, "timeout": 120 * SLOWNESS, **options}
     done = subprocess.run([str(word) for word in command], check=False, **options)
     assert status is None or done.returncode == status, f"{command}: {done.returncode}\n{done.stdout}{done.stderr}"
     return done
@@ -111,7 +113,7 @@ def held_configuration_lock():
         assert other.stdout.readline() == "0\n"
         yield
     finally:
-        other.communicate("\n", timeout=10)
+        other.communicate("\n", timeout=60)
 
 
 def keys_of(path):
@@ -121,7 +123,7 @@ def keys_of(path):
 class Daemon:
     """A process that serves a test: started, waited for until it is ready, ended by its pid."""
 
-    def __init__(self, command, ready, limit=10.0):
+    def __init__(self, command, ready, limit=60.0):
         self.process = subprocess.Popen([str(word) for word in command], stdin=subprocess.DEVNULL)
         try:
             wait_for(lambda: self.is_ready(ready), limit, f"{command[0]}'s start")
@@ -136,7 +138,7 @@ class Daemon:
     def stop(self):
         self.process.terminate()
         try:
-            self.process.wait(5)
+            self.process.wait(20 * SLOWNESS)
         except subprocess.TimeoutExpired:
             self.process.kill()
             self.process.wait()
@@ -169,8 +171,10 @@ class DhcpServer(Daemon):
 class SystemLog:
     """Listens on /dev/log and keeps every message, as "<priority>... text"."""
 
+    MARK = b"all before this has been received"
+
     def __init__(self):
-        self.messages = []
+        self.messages, self.caught_up = [], threading.Event()
         self.socket = socket.socket(socket.AF_UNIX, socket.SOCK_DGRAM)
         self.socket.bind("/dev/log")
         self.thread = threading.Thread(target=self.receive)
@@ -178,14 +182,24 @@ class SystemLog:
 
     def receive(self):
         while message := self.socket.recv(65536):
-            self.messages.append(message.decode(errors="replace"))
+            if message == self.MARK:
+                self.caught_up.set()
+            else:
+                self.messages.append(message.decode(errors="replace"))
+
+    def send(self, message):
+        with socket.socket(socket.AF_UNIX, socket.SOCK_DGRAM) as end:
+            end.sendto(message, "/dev/log")
 
     def holds(self, text):
+        """Whether a text is in one of the messages that have been sent so far, also those on their way."""
+        self.caught_up.clear()
+        self.send(self.MARK)
+        assert self.caught_up.wait(60 * SLOWNESS)
         return any(text in message for message in self.messages)
 
     def close(self):
-        with socket.socket(socket.AF_UNIX, socket.SOCK_DGRAM) as end:
-            end.sendto(b"", "/dev/log")
+        self.send(b"")
         self.thread.join()
         self.socket.close()
         os.unlink("/dev/log")
@@ -249,8 +263,7 @@ def routes(*selection):
 
 
 def wait_for_partner(address="192.168.90.1"):
-    wait_for(lambda: run("ping", "-c", "1", "-W", str(SLOWNESS), address, status=None).returncode == 0, 30,
-             f"an answer of {address}")  # fmt: skip
+    wait_for_answer(address)
 
 
 def is_up(link):
@@ -258,7 +271,8 @@ def is_up(link):
 
 
 def processes(text):
-    """Pids of the living processes whose command line holds a text; zombies have none."""
+    """Pids of the living processes whose command line holds a text; zombies have none, and neither have those that are just
+    about to end, with their files and locks still open."""
     found = []
     for folder in pathlib.Path("/proc").glob("[0-9]*"):
         try:
@@ -267,6 +281,31 @@ def processes(text):
         except (FileNotFoundError, ProcessLookupError):
             continue
     return found
+
+
+def process(text):
+    """Pid of the only process whose command line holds a text. What it starts looks like it until it is another program."""
+    [pid] = wait_for(lambda: found if len(found := processes(text)) == 1 else None, what=f"one process with {text}")
+    return pid
+
+
+def wait_for_answer(address, *where):
+    """Pings until there is an answer: the first ones come too early where the other side is not ready, and are lost."""
+    command = (*where, "ping", "-c", "1", "-W", "1", address)
+    wait_for(lambda: run(*command, status=None).returncode == 0, what=f"an answer of {address}")
+
+
+def kill(pids):
+    """Kills processes and waits until nothing is left of them; somebody else is their parent."""
+    for pid in pids:
+        with contextlib.suppress(ProcessLookupError):
+            os.kill(pid, signal.SIGKILL)
+    wait_for_end(pids)
+
+
+def wait_for_end(pids):
+    """Waits until processes are gone, with all that they had open."""
+    wait_for(lambda: not any(pathlib.Path(f"/proc/{pid}").exists() for pid in pids), what=f"the end of {pids}")
 
 
 @pytest.fixture

@@ -40,10 +40,17 @@ def switch(name, on=True):
 
 
 def bring_up(link, address):
-    """Both ends up, and the appliance's with an address."""
+    """Both ends up and in touch, and the appliance's with an address."""
     run("ip", "addr", "replace", address, "dev", link, *(["nodad"] if ":" in address else []))
     run("ip", "link", "set", link, "up")
     on_other_side("ip", "link", "set", link, "up")
+    # the kernel hands on frames, and gives link-local addresses to ask from, a moment after that
+    wait_for(lambda: all(is_in_touch(side, link) for side in (run, on_other_side)), what=f"the link of {link}")
+
+
+def is_in_touch(side, link):
+    up = "state UP" in side("ip", "link", "show", "dev", link).stdout
+    return up and "fe80" in side("ip", "-6", "addr", "show", "dev", link, "scope", "link", "-tentative").stdout
 
 
 def served_lines():
@@ -92,7 +99,7 @@ def dhclient(link, folder, *statements, request=(), family="-4", flags=()):
     conf.write_text("".join(f"{line};\n" for line in ("initial-interval 1", "timeout 20", *statements)) + asked)
     (folder / "dhclient.leases").unlink(missing_ok=True)
     run(*OTHER_SIDE, CLIENT, family, *flags, "-1", "-d", "-cf", conf, "-lf", folder / "dhclient.leases",
-        "-pf", folder / "dhclient.pid", "-sf", script, "-e", f"TOLD={told}", link, status=None, timeout=60)  # fmt: skip
+        "-pf", folder / "dhclient.pid", "-sf", script, "-e", f"TOLD={told}", link, status=None)  # fmt: skip
     lines = told.read_text().splitlines() if told.exists() else []
     return dict(line.removeprefix("new_").split("=", 1) for line in lines if line.startswith("new_"))
 
@@ -119,7 +126,7 @@ def udhcpc(link, folder, *flags, requests=(), who=None, tries=20):
     more = [word for number in requests for word in ("-O", str(number))]
     identity = ["-C", "-x", f"0x3d:{who:04x}"] if who is not None else []
     run(*OTHER_SIDE, "env", f"TOLD={told}", "busybox", "udhcpc", "-f", "-q", "-n", "-t", tries, "-T", "1", "-i", link,
-        "-s", busybox_script(folder), *identity, *more, *flags, status=None, timeout=60)  # fmt: skip
+        "-s", busybox_script(folder), *identity, *more, *flags, status=None)  # fmt: skip
     return busybox_told(told.with_suffix(".bound")) if told.with_suffix(".bound").exists() else {}
 
 
@@ -130,12 +137,12 @@ class KeptLease(Daemon):
         self.told = folder / f"udhcpc-kept-{link}"
         command = [*OTHER_SIDE, "env", f"TOLD={self.told}", "busybox", "udhcpc", "-f", "-t", "20", "-T", "1",
                    "-i", link, "-s", busybox_script(folder, takes_address=True), *flags]  # fmt: skip
-        super().__init__(command, self.told.with_suffix(".bound").exists, limit=30)
+        super().__init__(command, self.told.with_suffix(".bound").exists)
 
     def renew(self):
         """What the server says to the renewal."""
         answer = self.told.with_suffix(".renew")
         answer.unlink(missing_ok=True)
         self.process.send_signal(signal.SIGUSR1)
-        wait_for(answer.exists, limit=20, what="the renewal")
+        wait_for(answer.exists, what="the renewal")
         return busybox_told(answer)

@@ -58,7 +58,7 @@ class PppoeServer(Daemon):
 
     def stop(self):
         super().stop()
-        wait_for(lambda: not self.sessions(), 20, "the end of the server's sessions")
+        wait_for(lambda: not self.sessions(), what="the end of the server's sessions")
 
 
 def settings(user=USER, password=PASSWORD, link="eth0", mtu="1400", default_route=False):

@@ -80,7 +80,7 @@ def keys(link):
 
 
 def wait_for_links(**wanted):
-    wait_for(lambda: member_states() == wanted, 30, f"the links {wanted}")
+    wait_for(lambda: member_states() == wanted, what=f"the links {wanted}")
 
 
 @pytest.mark.parametrize("mode", KERNEL_MODES)
@@ -123,7 +123,7 @@ def test_an_aggregation_knows_whether_it_has_a_partner(partner):
     assert set_bond(bond(LACP)) == 0, register()
     assert get_bond().blNoPartner == 1
     partner("bond mode 4 lacp_rate fast")
-    wait_for(lambda: get_bond().blNoPartner == 0, 30, "the partner")
+    wait_for(lambda: get_bond().blNoPartner == 0, what="the partner")
     mac = on_other_side("cat", "/sys/class/net/uplink/address").stdout.strip()
     assert of_kernel("ad_partner_mac") == mac
     wait_for_partner()
@@ -144,7 +144,7 @@ def test_a_bond_changes_mode_and_members_and_keeps_its_vlan(partner):
     assert addresses("bond0.20") == ["192.168.90.5/24"]
     wait_for_partner()
     index = run("cat", "/sys/class/net/bond0/ifindex").stdout
-    wait_for(lambda: get_bond().blNoPartner == 0, 30, "the partner")
+    wait_for(lambda: get_bond().blNoPartner == 0, what="the partner")
     assert set_bond(get_bond()) == 0
     assert run("cat", "/sys/class/net/bond0/ifindex").stdout == index, "made anew although nothing changed"
 
@@ -173,12 +173,12 @@ def test_a_bond_takes_over_the_lease_of_its_first_member(partner, tmp_path):
     with DhcpServer("uplink", "192.168.60", folder=tmp_path):
         path("lan0").write_text("DEVICE=lan0\nONBOOT=yes\nBOOTPROTO=dhcp\n")
         run("/etc/rc.network", "start", "lan0")
-        leased = wait_for(lambda: [one for one in addresses("lan0") if one.startswith("192.168.60.")], 60, "a lease")
+        leased = wait_for(lambda: [one for one in addresses("lan0") if one.startswith("192.168.60.")], what="a lease")
         assert set_bond(bond(BACKUP)) == 0, register()
-        assert wait_for(lambda: addresses("bond0"), 60, "the bond's lease") == leased
+        assert wait_for(lambda: addresses("bond0"), what="the bond's lease") == leased
         assert addresses("lan0") == []
         assert set_bond(bond(UNKNOWN)) == 0, register()
-        assert wait_for(lambda: addresses("lan0"), 60, "the member's lease") == leased
+        assert wait_for(lambda: addresses("lan0"), what="the member's lease") == leased
         run("/etc/rc.network", "stop", "lan0")
 
 
@@ -291,11 +291,11 @@ def test_a_bond_of_the_switch_is_what_its_file_says_of_links_that_are_there(swit
     assert library.KOVAGetMTUSetting(switch_bond) == 1500
     mtus["lan0"].write_text("1500")
 
-    wait_for(lambda: library.KOVANetIfIsLink(switch_bond) == 1, 30, "a link")
+    wait_for(lambda: library.KOVANetIfIsLink(switch_bond) == 1, what="a link")
     for link in ("lan0", "lan1"):
         assert library.KOVANetIfIsLink(switch_bond) == 1
         on_other_side("ip", "link", "set", link, "down")
-        wait_for(lambda: library.KOVANetIfIsLink(link.encode()) == 0, 30, f"{link} to lose its link")
+        wait_for(lambda: library.KOVANetIfIsLink(link.encode()) == 0, what=f"{link} to lose its link")
     assert library.KOVANetIfIsLink(switch_bond) == 0
     for link in ("lan0", "lan1"):
         on_other_side("ip", "link", "set", link, "up")

@@ -37,7 +37,7 @@ def test_a_host_that_came_later_is_found():
     on_other_side("ip", "addr", "add", f"{FREE}/24", "dev", "eth0")
     try:
         # the kernel gives up a host that did not answer for some seconds
-        wait_for(lambda: library.KOVAIIpConflict(b"eth0", FREE.encode()) == 1, 20, "the answer of the new host")
+        wait_for(lambda: library.KOVAIIpConflict(b"eth0", FREE.encode()) == 1, what="the answer of the new host")
         assert data("conflict", "address", "eth0", FREE, status=NO)["conflict"] is True
     finally:
         on_other_side("ip", "addr", "del", f"{FREE}/24", "dev", "eth0")

@@ -27,6 +27,8 @@ def no_client_left(keep):
         run("/sbin/stop", "dhcp-client", f"IFACE={link}")
         run("ip", "addr", "flush", "dev", link)
         pathlib.Path(f"/tmp/dhcpv4.leases.{link}").unlink(missing_ok=True)
+    for unfinished in (*SOURCE.parent.glob("resolv4*.*.*"), *info_of("*").parent.glob("*.info.*")):
+        unfinished.unlink()  # what a script that is killed while it writes may leave
 
 
 @pytest.fixture
@@ -90,7 +92,7 @@ def test_lease_sets_address_route_info_and_resolver_source(server):
     wait_for(lambda: routes("default") == ["default via 192.168.50.1 dev lan0"], what="the default route")
     leases = pathlib.Path("/tmp/dhcpv4.leases.lan0")  # which the client writes anew in place
     wait_for(lambda: address in leases.read_text(), what="the lease in its file")
-    wait_for(lambda: RESOLV.read_text() == SOURCE.read_text(), 30, "the resolver file made of the source")
+    wait_for(lambda: RESOLV.read_text() == SOURCE.read_text(), what="the resolver file made of the source")
     run("ping", "-c", "1", "-W", "5", "192.168.50.1")
 
 
@@ -105,12 +107,12 @@ def test_stop_leaves_nothing(server):
 def test_lease_is_asked_for_again_after_a_restart(server):
     start("lan0")
     wait_bound("lan0")
-    leased = addresses("lan0")
+    leased, discovers = addresses("lan0"), server.text().count("DHCPDISCOVER")
     stop("lan0")
     start("lan0")
     wait_bound("lan0")
     assert addresses("lan0") == leased
-    assert server.text().count("DHCPDISCOVER") == 1  # the second time the lease file was there
+    assert server.text().count("DHCPDISCOVER") == discovers  # the second time the lease file was there
 
 
 def test_static_address_stays_until_the_lease_and_goes_with_it(server):
@@ -219,7 +221,7 @@ def test_stop_in_the_middle_of_a_bind(server, hold, program, text, client_dies):
 
     began = time.monotonic()
     stop("lan0")
-    assert time.monotonic() - began < 8 * SLOWNESS  # 1.2 on an idle machine
+    assert time.monotonic() - began < 60 * SLOWNESS  # 1.2 on an idle machine
     assert not processes(text)
     step.release()  # what had survived would go on now
     assert_nothing_left("lan0")
@@ -347,7 +349,7 @@ def test_parallel_scripts_lose_no_name_server(hold):
         wait_for(step.is_waiting, what="the first script's last step")
     wait_for(lambda: processes("flock 9") or scripts[1].poll() is not None, what="the second script's last step")
     step.release()
-    assert [process.wait(10) for process in scripts] == [0, 0]
+    assert [process.wait(120) for process in scripts] == [0, 0]
     assert set(SOURCE.read_text().split()) == {"nameserver", "192.168.60.53", "192.168.61.53"}
 
 

@@ -36,12 +36,13 @@ def file_of(*servers):
     return "".join(f"nameserver\t{server}\n" for server in servers)
 
 
-def wait_for_servers(*servers, limit=30):
-    wait_for(lambda: RESOLV.read_text() == file_of(*servers), limit, f"/etc/resolv.conf with {servers}")
+def wait_for_servers(*servers):
+    wait_for(lambda: RESOLV.read_text() == file_of(*servers), what=f"/etc/resolv.conf with {servers}")
 
 
 def wait_for_updates():
-    wait_for(lambda: not processes(UPDATE), 30, "the end of the updates in the background")
+    """Also for those that are just being started, by resolver-source."""
+    wait_for(lambda: not processes("/usr/kova/lib/resolver-"), what="the end of the updates in the background")
 
 
 class NameServer(Daemon):
@@ -78,7 +79,8 @@ def appliance(keep):
     run("ip", "addr", "flush", "dev", "eth0", "scope", "global")
     run("ip", "link", "set", "eth0", "up")
     run("ip", "addr", "add", "10.9.0.3/24", "dev", "eth0")
-    wait_for(lambda: "state UP" in run("ip", "link", "show", "eth0").stdout, what="carrier")
+    for side in (run, on_other_side):
+        wait_for(lambda side=side: "state UP" in side("ip", "link", "show", "eth0").stdout, what="carrier")
     yield
     for job in ("dhcp-client", "ra-dns", "kovarelayd", "ddns"):
         run("/sbin/stop", job)
@@ -221,17 +223,17 @@ def listening():
         advertise(advertisement(name_servers(600, sign)))
         return SOURCE6.exists()
 
-    wait_for(is_heard, 30, "the listener")
+    wait_for(is_heard, what="the listener")
     advertise(advertisement(name_servers(0, sign)))
-    wait_for(lambda: not SOURCE6.exists(), 30, "the end of the sign")
+    wait_for(lambda: not SOURCE6.exists(), what="the end of the sign")
 
 
 def announced(*servers):
-    wait_for(lambda: SOURCE6.exists() and SOURCE6.read_text() == file_of(*servers), 30, f"the source with {servers}")
+    wait_for(lambda: SOURCE6.exists() and SOURCE6.read_text() == file_of(*servers), what=f"the source with {servers}")
 
 
 def test_servers_live_as_long_as_their_router_says(listening):
-    advertise(advertisement(name_servers(2, "2001:db8::1"), name_servers(0xFFFFFFFF, "2001:db8::2", "2001:db8::3")))
+    advertise(advertisement(name_servers(15, "2001:db8::1"), name_servers(0xFFFFFFFF, "2001:db8::2", "2001:db8::3")))
     announced("2001:db8::1", "2001:db8::2", "2001:db8::3")
     wait_for_servers("2001:db8::1", "2001:db8::2", "2001:db8::3")
     announced("2001:db8::2", "2001:db8::3")
@@ -293,7 +295,7 @@ def configuration_lock():
     with subprocess.Popen(command, stdin=subprocess.PIPE, stdout=subprocess.PIPE, text=True) as other:
         assert other.stdout.readline() == "0\n"
         yield
-        other.communicate("\n", timeout=10)
+        other.communicate("\n", timeout=60)
 
 
 def test_client_that_stops_under_the_lock_does_not_hold_its_stopper(tmp_path):
@@ -302,9 +304,9 @@ def test_client_that_stops_under_the_lock_does_not_hold_its_stopper(tmp_path):
         wait_for_servers(SECOND)
         SOURCE6.write_text(file_of(IPV6))
         with configuration_lock():
-            began = time.monotonic()
             run("/sbin/stop", "dhcp-client", "IFACE=eth0")
-            assert time.monotonic() - began < 4, "it waited for the lock, which is given up after 5 seconds"
+            # it did not wait for the lock: the update still does, twelve times 5 seconds
+            wait_for(lambda: processes(UPDATE), what="the update in the background")
             time.sleep(6)  # longer than one attempt waits
             assert RESOLV.read_text() == file_of(SECOND)
         wait_for_servers(IPV6)
@@ -344,7 +346,7 @@ def test_relay_asks_the_servers_in_use(two_servers):
     kovanet("set", SECOND)
     wait_for(lambda: ANSWERS[SECOND] in relayed(), what="an answer of the second server")
     kovanet("set", "10.9.0.77", FIRST)  # the first of them is silent
-    wait_for(lambda: ANSWERS[FIRST] in relayed(), 30, "an answer of the server that is there")
+    wait_for(lambda: ANSWERS[FIRST] in relayed(), what="an answer of the server that is there")
     run("/sbin/stop", "kovarelayd")
     assert not processes("/usr/kova/sbin/kovarelayd") and not pathlib.Path("/run/kova/kovarelayd.pid").exists()
 

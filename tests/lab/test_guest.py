@@ -14,7 +14,7 @@ ROOT = pathlib.Path(__file__).resolve().parent.parent.parent
 BUILD = pathlib.Path(os.environ.get("KOVA_BUILD", ROOT / "build"))
 BOX = os.environ.get("KOVA_BOX_PROGRAM", str(BUILD / "lab" / "kova-box"))
 AS_USER = ["setpriv", "--reuid", "1000", "--regid", "1000", "--clear-groups"] if os.geteuid() == 0 else []
-PATIENCE = 120  # seconds that nothing here needs
+PATIENCE = 600  # seconds that nothing here needs
 MODULES = ["8021q", "bonding", "bridge", "dummy", "ifb", "macvlan", "openvswitch", "ppp_async", "ppp_generic",
            "ppp_synctty", "pppoe", "sit", "tun", "veth", "vxlan"]  # fmt: skip
 
@@ -192,9 +192,9 @@ def test_several_run_at_once(marked):
 
 def test_a_guest_that_does_not_start_is_ended_and_shows_its_console(program):
     kernel = program("echo Kernel panic - no root; exec sleep 1000")
-    done = guest("echo", "ran", options=["--kernel", kernel, "--boot-limit", 1])
+    done = guest("echo", "ran", options=["--kernel", kernel, "--boot-limit", 5])
     assert (done.returncode, done.stdout) == (125, "")
-    assert done.stderr == f"kova-box: the guest's kernel {kernel} was not ready after 1 s\nKernel panic - no root\n"
+    assert done.stderr == f"kova-box: the guest's kernel {kernel} was not ready after 5 s\nKernel panic - no root\n"
 
 
 def test_a_guest_that_dies_shows_its_console(program):
@@ -221,11 +221,11 @@ def test_a_kernel_that_dies_under_the_command_is_said(marked):
 
 
 def test_a_guest_that_hangs_is_ended_by_its_limit(marked):
-    with subprocess.Popen([BOX, "--guest", "--limit", "8", "--", "sh", "-c", "echo ready; sleep 1000"], text=True,
+    with subprocess.Popen([BOX, "--guest", "--limit", "30", "--", "sh", "-c", "echo ready; sleep 1000"], text=True,
                           env=environment(marked), stdout=subprocess.PIPE, stderr=subprocess.PIPE) as running:  # fmt: skip
         assert running.stdout.readline() == "ready\n"
         os.kill(kernel_of(running.pid), signal.SIGSTOP)
-        assert "the command was still running after 8 s" in running.communicate(timeout=PATIENCE)[1]
+        assert "the command was still running after 30 s" in running.communicate(timeout=PATIENCE)[1]
     assert running.returncode == 124
 
 
@@ -268,9 +268,13 @@ def test_nothing_stays_after_the_end(marked):
 
 def test_a_guest_leaves_no_file():
     folders = [pathlib.Path(name) for name in ("/dev/shm", "/tmp", os.path.expanduser("~"))]
-    before = [set(folder.glob("*vm_file*")) | set(folder.glob(".uml*")) for folder in folders]
+
+    def found():
+        return {path for folder in folders for pattern in ("*vm_file*", ".uml*") for path in folder.glob(pattern)}
+
+    before = found()
     assert guest("true").returncode == 0
-    assert [set(folder.glob("*vm_file*")) | set(folder.glob(".uml*")) for folder in folders] == before
+    wait_until(lambda: found() <= before)  # other guests that start now have one for a moment
 
 
 # ---- the runner

@@ -143,7 +143,7 @@ def test_the_name_is_that_of_this_uts_namespace_only():
         other.stdout.readline()  # it has its namespace
         kovanet("hostname", "set", NEW)
         assert os.uname().nodename == NEW
-        assert other.communicate("\n", timeout=20)[0] == f"{OLD}\n"
+        assert other.communicate("\n", timeout=60)[0] == f"{OLD}\n"
 
 
 def test_the_configuration_is_locked_while_the_plugins_run(plugin, tmp_path):

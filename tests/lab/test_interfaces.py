@@ -69,7 +69,7 @@ EVERY = {"lo", "eth0", "eth0.10", "lan0", "lan1", "bond0", "bond0.20", "lbr0", "
 @pytest.fixture(scope="module", autouse=True)
 def one_of_every_kind():
     run("ip", "-batch", "-", input=MADE)
-    wait_for(lambda: all(has_carrier(link) for link in ip_links().values()), 30, "carrier everywhere")
+    wait_for(lambda: all(has_carrier(link) for link in ip_links().values()), what="carrier everywhere")
     yield
     for name in ("bond0.20", "bond0", "eth0.10", "lbr0", "port0", "dummy0"):
         run("ip", "link", "del", name)
@@ -89,7 +89,7 @@ def link_down():
     yield take
     for name in taken:
         on_other_side("ip", "link", "set", name, "up")
-    wait_for(lambda: all(has_carrier(link) for link in ip_links().values()), 30, "carrier everywhere")
+    wait_for(lambda: all(has_carrier(link) for link in ip_links().values()), what="carrier everywhere")
 
 
 def test_the_kernel_has_one_of_every_kind():
@@ -172,7 +172,7 @@ def test_link_of_what_is_there_and_of_what_is_not():
 
 def test_a_vlan_loses_its_link_with_the_card_below(link_down):
     link_down("eth0")
-    wait_for(lambda: library.KOVANetIfIsLink(b"eth0.10") == 0, 30, "the VLAN without link")
+    wait_for(lambda: library.KOVANetIfIsLink(b"eth0.10") == 0, what="the VLAN without link")
     assert library.KOVANetIfIsLink(b"eth0") == 0
     assert interfaces(LOGICAL)["eth0.10"].nLink == 0 and not has_carrier(ip_links()["eth0.10"])
     assert library.KOVANetIfIsLink(b"bond0.20") == 1
@@ -180,12 +180,12 @@ def test_a_vlan_loses_its_link_with_the_card_below(link_down):
 
 def test_a_bond_keeps_its_link_until_the_last_member_loses_it(link_down):
     link_down("lan0")
-    wait_for(lambda: library.KOVANetIfIsLink(b"lan0") == 0, 30, "the first member without link")
+    wait_for(lambda: library.KOVANetIfIsLink(b"lan0") == 0, what="the first member without link")
     active = pathlib.Path("/sys/class/net/bond0/bonding/active_slave")
-    wait_for(lambda: active.read_text() == "lan1\n", 30, "the other member's turn")
+    wait_for(lambda: active.read_text() == "lan1\n", what="the other member's turn")
     assert library.KOVANetIfIsLink(b"bond0") == 1
     link_down("lan1")
-    wait_for(lambda: library.KOVANetIfIsLink(b"bond0.20") == 0, 30, "the bond's VLAN without link")
+    wait_for(lambda: library.KOVANetIfIsLink(b"bond0.20") == 0, what="the bond's VLAN without link")
     assert library.KOVANetIfIsLink(b"bond0") == 0
     assert not has_carrier(ip_links()["bond0"])
 
@@ -197,7 +197,7 @@ def test_an_interface_goes_down_and_up(name):
     assert name not in enumerated(library.KLIBNetInterfaceEnum, 0)
     assert library.KLIBNetIfUp(name.encode()) == 0
     assert library.KOVANetIsIFUp(name.encode()) == 1 and "UP" in ip_links()[name]["flags"]
-    wait_for(lambda: all(has_carrier(link) for link in ip_links().values()), 30, "carrier everywhere")
+    wait_for(lambda: all(has_carrier(link) for link in ip_links().values()), what="carrier everywhere")
     run("ip", "link", "set", "bond0.20", "up")
 
 

@@ -4,6 +4,7 @@
 import concurrent.futures
 import os
 import pathlib
+import re
 import signal
 import subprocess
 import time
@@ -53,7 +54,7 @@ def session_of(pid):
 
 def is_alive(pid):
     try:
-        return pathlib.Path(f"/proc/{pid}/stat").read_text().rpartition(")")[2].split()[0] != "Z"
+        return pathlib.Path(f"/proc/{pid}/stat").read_text().rpartition(")")[2].split()[0] not in "ZX"
     except (FileNotFoundError, ProcessLookupError):
         return False
 
@@ -75,9 +76,10 @@ def test_unknown_job_is_refused(tool):
     + [["dhcp-client", "PATH=x"]],
 )
 def test_bad_usage_is_refused(tool, arguments):
+    before = set(STATE.glob("*"))
     done = run(tool, *arguments, status=2)
     assert done.stderr.startswith(("usage: ", "start: a key", "stop: a key"))
-    assert not list(STATE.glob("*"))
+    assert set(STATE.glob("*")) == before
 
 
 def test_job_is_detached_from_its_starter(make_job):
@@ -85,7 +87,8 @@ def test_job_is_detached_from_its_starter(make_job):
     low, high = os.open("/etc/passwd", os.O_RDONLY), os.open("/etc/passwd", os.O_RDONLY)
     os.dup2(high, 57)
     environment = {**os.environ, "STRAY": "1"}
-    run("/sbin/start", "lonely", "IFACE=lan0", pass_fds=(low, high, 57), cwd="/tmp", env=environment)
+    command = ("sh", "-c", "trap '' HUP INT TERM; exec /sbin/start lonely IFACE=lan0")
+    run(*command, pass_fds=(low, high, 57), cwd="/tmp", env=environment)
     for descriptor in (low, high, 57):
         os.close(descriptor)
 
@@ -99,13 +102,14 @@ def test_job_is_detached_from_its_starter(make_job):
     names = {entry.partition("=")[0] for entry in environment}
     assert names - {"PWD", "SHLVL"} == {"IFACE", "PATH"}  # two may be the shell's own
     assert "IFACE=lan0" in environment
+    assert re.search(r"^SigIgn:\t0+$", pathlib.Path(f"/proc/{pid}/status").read_text(), re.MULTILINE)
 
 
 def test_start_returns_at_once_and_holds_no_pipe(make_job):
     make_job("endless")
     began = time.monotonic()
-    run("/sbin/start", "endless", timeout=5)  # reads both pipes to their end
-    assert time.monotonic() - began < 2 * SLOWNESS
+    run("/sbin/start", "endless")  # reads both pipes to their end
+    assert time.monotonic() - began < 60 * SLOWNESS  # next to nothing on an idle machine, and the job takes 1000
 
 
 def test_second_start_is_the_same_job(make_job):
@@ -184,7 +188,7 @@ def test_stop_ends_helpers_that_ignore_the_request(make_job, tmp_path):
 
     began = time.monotonic()
     run("/sbin/stop", "stubborn")
-    assert time.monotonic() - began < 8 * SLOWNESS  # 1.2 on an idle machine
+    assert time.monotonic() - began < 60 * SLOWNESS  # 1.2 on an idle machine
     assert not any(is_alive(pid) for pid in [leader, *helpers])
 
 

@@ -151,7 +151,7 @@ def test_card_set_dhcp_and_back(stopped_clients, tmp_path):
             card = data("card", "show", "lan0")
             return card["configured_address"] and card["address"] and card
 
-        card = wait_for(leased, 30, "the lease")
+        card = wait_for(leased, what="the lease")
         assert card["source"] == "dhcp"
         assert re.fullmatch(r"10\.9\.0\.(1[0-9]|20)", card["address"])
         assert (card["configured_address"], card["prefix"]) == (card["address"], 24)
@@ -247,7 +247,7 @@ def test_addr_add_ipv4_replaces_and_del_removes(addressed):
 def test_addr_flush_removes_one_family(addressed):
     run("ip", "addr", "add", "2001:db8:9::7/64", "dev", "lan0", "nodad")
     interface_file("lan0").write_text(interface_file("lan0").read_text() + "IPV6INIT=auto\n")
-    kovanet("addr", "flush", "lan0", "6", timeout=20)
+    kovanet("addr", "flush", "lan0", "6")
     assert "2001:db8:9::7/64" not in kernel_addresses("lan0", "inet6")
     assert kernel_addresses("lan0") == ["10.9.0.7/24"]
     run("ip", "addr", "add", "2001:db8:9::7/64", "dev", "lan0", "nodad")
@@ -264,7 +264,7 @@ def test_changes_wait_for_the_configuration_lock(words):
     with held_configuration_lock():
         begin = time.monotonic()
         text = complaint(*words, status=CALL_FAILED)
-        assert 4 < time.monotonic() - begin < 8 * SLOWNESS
+        assert 4 < time.monotonic() - begin < 60 * SLOWNESS  # 5 on an idle machine
     assert "NET_ERR_LOCK (0x400)" in text and "another program is changing the network; try again" in text
     assert everything() == before
 
@@ -310,9 +310,11 @@ def test_stats_agree_with_the_kernel(addressed):
 
 def test_stats_watch_gives_rates_a_line_each(addressed):
     with subprocess.Popen(["ping", "-i", "0.02", "-q", "10.9.0.1"], stdout=subprocess.DEVNULL) as ping:
+        before = kernel_counters()["lan0"]["rx_packets"]
+        wait_for(lambda: kernel_counters()["lan0"]["rx_packets"] > before + 1, what="traffic")
         begin = time.monotonic()
-        lines = kovanet("stats", "lan0", "--watch", "0.5", "--count", "2", "--json").stdout.splitlines()
-        assert 0.9 < time.monotonic() - begin < 5 * SLOWNESS
+        lines = kovanet("stats", "lan0", "--watch", "1", "--count", "2", "--json").stdout.splitlines()
+        assert 1.9 < time.monotonic() - begin < 60 * SLOWNESS
         ping.terminate()
     first, second = [json.loads(line) for line in lines]
     [old], [new] = first["interfaces"], second["interfaces"]
@@ -320,8 +322,8 @@ def test_stats_watch_gives_rates_a_line_each(addressed):
         grown = new[counter] - old[counter]
         assert grown > 0
         assert new[f"{counter}_per_second"] == pytest.approx(grown / second["seconds"], rel=0.02, abs=1)
-    assert 0.4 < second["seconds"] < 3
-    assert abs(second["time"] - time.time()) < 10
+    assert 0.9 < second["seconds"] < 60
+    assert abs(second["time"] - time.time()) < 600
 
 
 def test_stats_watch_prints_a_table_per_tick():
@@ -336,7 +338,7 @@ def test_stats_watch_ends_when_interrupted(number):
     with subprocess.Popen([KOVANET, "stats", "--watch", "0.1", "--json"], stdout=subprocess.PIPE, text=True) as watching:
         json.loads(watching.stdout.readline())
         watching.send_signal(number)
-        rest, _ = watching.communicate(timeout=5)
+        rest, _ = watching.communicate(timeout=60)
         assert watching.returncode == DONE
     assert all(json.loads(line) for line in rest.splitlines())
 
@@ -559,7 +561,7 @@ def test_route_of_another_address(addressed):
 def test_route_check_clears_the_interface_without_link(one_subnet):
     on_other_side("ip", "link", "set", "lan0", "down")
     try:
-        wait_for(lambda: link_of("lan0")["operstate"] == "DOWN", what="the loss of carrier")
+        wait_for(lambda: link_of("lan0")["operstate"] != "UP", what="the loss of carrier")
         kovanet("route", "check")
         assert route_devices("10.9.0.0/24") == ["eth0"]
     finally:

@@ -7,7 +7,7 @@ import pathlib
 import re
 
 import pytest
-from conftest import asked, on_other_side, run
+from conftest import asked, on_other_side, run, wait_for
 from sdk import core
 from test_kovanet import (CALL_FAILED, DONE, KOVANET, NO, NO_PERMISSION, NOT_FOUND, SCRIPTS, USAGE, complaint, data,
                           default_gateway, documented, everything, interface_file, ip, kernel_addresses, keys, keys_of,
@@ -44,6 +44,7 @@ MADE_LINKS = ("row0", "bond7", "part0", "part1", "br7", "port0", "lbr7")
 @pytest.fixture(scope="module", autouse=True)
 def what_there_is():
     run("ip", "-batch", "-", input=MADE)
+    wait_for_links("row0.10", "bond7", "br7")
     yield
     for name in MADE_LINKS:
         run("ip", "link", "del", name)
@@ -62,10 +63,17 @@ def cards():
     with interface_file("lan0").open("a") as file:
         file.write("IPADDR=10.9.0.7\nNETMASK=255.255.255.0\n")
     interface_file("lbr7").write_text("DEVICE=lbr7\nTYPE=bridge\nPRIMARY=wlan0\nLOCAL_LAN=yes\n")
+    wait_for_links(*CARDS)
     yield
     KOVAINFO.write_bytes(kovainfo)
     for path in SCRIPTS.glob("ifcfg-*"):
         path.unlink()
+
+
+def wait_for_links(*names):
+    """Until the kernel has told of all links, and given them the IPv6 addresses that come with them."""
+    wait_for(lambda: all(link_of(name)["operstate"] == "UP" and kernel_addresses(name, "inet6") for name in names),
+             what=f"the links of {names}")
 
 
 def state_of(name):

@@ -28,9 +28,19 @@ def link_is_up():
     for name in ("eth0", "lan0"):
         run("ip", "link", "set", name, "up")
         on_other_side("ip", "link", "set", name, "up")
-    wait_for(lambda: "LOWER_UP" in run("ip", "link", "show", "lan0").stdout, what="carrier")
+    wait_for(lambda: run("ip", "link").stdout.count("state UP") == 2, what="carrier, and that the kernel told of it")
     yield
     on_other_side("ip", "link", "set", "lan0", "up")
+
+
+def waits_for_changes(pid):
+    """Whether a watcher sleeps, having its netlink socket: it does so first when it knows what there is, and misses nothing
+    from then on."""
+    with contextlib.suppress(FileNotFoundError):  # a file that it just closes
+        files = [os.readlink(fd) for fd in pathlib.Path(f"/proc/{pid}/fd").iterdir()]
+        state = pathlib.Path(f"/proc/{pid}/stat").read_text().rpartition(")")[2].split()[0]
+        return state == "S" and any("socket:" in file for file in files)
+    return False
 
 
 class Watcher:
@@ -46,12 +56,11 @@ class Watcher:
         return self.text.decode().splitlines()
 
     def is_ready(self):
-        """Whether its netlink socket is there: from then on it misses nothing."""
-        return any("socket:" in os.readlink(fd) for fd in pathlib.Path(f"/proc/{self.process.pid}/fd").iterdir())
+        return waits_for_changes(self.process.pid)
 
     def end(self, how=signal.SIGTERM):
         self.process.send_signal(how)
-        status = self.process.wait(timeout=30)
+        status = self.process.wait(timeout=60)
         assert self.process.stderr.read() == b""
         self.process.stdout.close()
         self.process.stderr.close()
@@ -63,7 +72,6 @@ def watching(*words):
     watcher = Watcher(*words)
     try:
         wait_for(watcher.is_ready, what="the watcher")
-        time.sleep(0.1)  # it reads what there is before it waits
         yield watcher
     finally:
         if watcher.process.poll() is None:
@@ -121,10 +129,9 @@ def test_monitor_for_people_has_one_line_a_change():
 
 def test_monitor_needs_no_rights_and_ends_when_told():
     process = subprocess.Popen([KOVANET, "monitor"], stdout=subprocess.PIPE, user=65534)
-    wait_for(lambda: "socket:" in str([os.readlink(fd) for fd in pathlib.Path(f"/proc/{process.pid}/fd").iterdir()]))
-    time.sleep(0.1)
+    wait_for(lambda: waits_for_changes(process.pid), what="the watcher")
     process.send_signal(signal.SIGINT)
-    assert process.communicate(timeout=30)[0] == b"" and process.returncode == DONE
+    assert process.communicate(timeout=60)[0] == b"" and process.returncode == DONE
 
 
 def test_monitor_goes_on_when_the_full_file_makes_room():

@@ -7,7 +7,7 @@ import os
 import pathlib
 
 import pytest
-from conftest import CALL_FAILED, DONE, NO, USAGE, complaint, data, documented, kovanet, run
+from conftest import CALL_FAILED, DONE, NO, USAGE, complaint, data, documented, kovanet, run, wait_for
 from test_kovanet import NETWORK, SCRIPTS, interface_file, ip, link_of
 
 KOVAINFO = pathlib.Path("/etc/kovainfo.conf")
@@ -40,6 +40,12 @@ FILES = {
 }  # fmt: skip
 
 
+def settled(name):
+    """Whether an interface has its link, and the IPv6 address that comes with it."""
+    [link] = ip("addr", "show", "dev", name)
+    return link["operstate"] == "UP" and any(one["scope"] == "link" for one in link["addr_info"])
+
+
 @pytest.fixture(autouse=True)
 def machine():
     kept = {path: path.read_bytes() for path in SCRIPTS.glob("ifcfg-*")}
@@ -50,6 +56,7 @@ def machine():
     run("ip", "-batch", "-", input=MADE)
     for name, text in FILES.items():
         interface_file(name).write_text(f"DEVICE={name}\nONBOOT=yes\n{text}")
+    wait_for(lambda: all(settled(name) for name in ("br7", "bond7", "row0.10", "eth0", "lan0", "lan1")), what="all links")
     yield
     for name in ("br7", "bond7", "part0", "part1", "row0"):
         run("ip", "link", "del", name, status=None)

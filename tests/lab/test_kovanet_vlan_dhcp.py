@@ -49,10 +49,10 @@ def start(text):
 
 def leased(link, network):
     """The address that an interface gets in a network of the other side, with the default route it comes with."""
-    [address] = wait_for(lambda: addresses(link), 60, f"a lease on {link}")
+    [address] = wait_for(lambda: addresses(link), what=f"a lease on {link}")
     assert address.startswith(f"{network}.") and address.endswith("/24")
     route = [f"default via {network}.1 dev {link}"]
-    wait_for(lambda: routes("default") == route, 30, "the default route of the lease")
+    wait_for(lambda: routes("default") == route, what="the default route of the lease")
     return address.removesuffix("/24")
 
 

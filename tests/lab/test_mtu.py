@@ -64,7 +64,7 @@ def test_a_leased_default_route_lasts(tmp_path):
     with DhcpServer("eth0", "192.168.50", "--dhcp-option=option:router,192.168.50.1", folder=tmp_path):
         ETH0.write_text("DEVICE=eth0\nONBOOT=yes\nBOOTPROTO=dhcp\n")
         run("/etc/rc.network", "start", "eth0")
-        wait_for(lambda: routes("default") == ["default via 192.168.50.1 dev eth0"], 30, "the leased route")
+        wait_for(lambda: routes("default") == ["default via 192.168.50.1 dev eth0"], what="the leased route")
         before = state()
         assert library.KOVANetSetMTUValue(b"9000", b"eth0") == 0, register()
         assert MTU.read_text() == "9000\n" and state() == before

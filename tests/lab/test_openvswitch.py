@@ -13,7 +13,7 @@ from conftest import (
 )  # fmt: skip
 from dhcp_lab import FILES, clean_server, serve, served_lines, udhcpc
 from sdk import STATIC, Bond, EthInfo, card, interfaces, library, register, set_card
-from test_kovanet import SCRIPTS, interface_file, ip, link_of
+from test_kovanet import interface_file, ip, link_of
 
 PROGRAMS = pathlib.Path(__file__).resolve().parents[2] / "build" / "openvswitch"
 RUN = pathlib.Path("/run/openvswitch")

@@ -4,6 +4,7 @@
 import contextlib
 import ctypes
 import socket
+import struct
 
 import pytest
 from conftest import NO, USAGE, complaint, data, documented, kovanet, run
@@ -48,7 +49,8 @@ def test_listening_and_connected_tcp_sockets(family):
         assert (is_used(port, port, TCP), listening(port, port, TCP)) == (0, [])  # bound alone is in no table
         server.listen()
         assert (is_used(port, port, TCP), is_used(port, port, UDP), listening(port, port, TCP)) == (1, 0, [port])
-        with socket.create_connection((family[1], port)) as client, server.accept()[0]:
+        with socket.create_connection((family[1], port)) as client, server.accept()[0] as accepted:
+            accepted.setsockopt(socket.SOL_SOCKET, socket.SO_LINGER, struct.pack("ii", 1, 0))  # its end leaves no port in use
             own = client.getsockname()[1]
             assert (is_used(own, own, TCP), listening(own, own, TCP)) == (1, [])
             assert data("ports", "used", "tcp", own)["used"] is True

@@ -6,7 +6,7 @@ import pathlib
 import signal
 
 import pytest
-from conftest import SLOWNESS, on_other_side, processes, routes, run, wait_for
+from conftest import kill, on_other_side, process, processes, routes, run, wait_for, wait_for_answer, wait_for_end
 from pppoe_lab import (CACHE, CONF, KOVAINFO, PASSWORD, SECRETS, SERVER, USER, PppoeServer, clients, interface, is_enabled,
                        net_info, nothing_is_left, ppp_interfaces, store)
 from sdk import library
@@ -35,10 +35,6 @@ def dial():
     return interface()
 
 
-def ping(address=SERVER):
-    run("ping", "-c", "1", "-W", str(5 * SLOWNESS), address)
-
-
 def texts_of_processes():
     """Command lines and environments of everything that runs here, but for this test."""
     found = b""
@@ -64,7 +60,7 @@ def test_a_session_comes_up_and_goes(server, system_log):
     assert pathlib.Path("/sys/class/net/ppp0/mtu").read_text() == "1400\n"
     assert "eth0" in pathlib.Path("/proc/net/pppoe").read_text(), "a session in the kernel"
     assert CACHE.read_text() == "ppp0"
-    ping()
+    wait_for_answer(SERVER)
     assert not routes("default"), "it was not asked for"
 
     assert PASSWORD.encode() not in texts_of_processes()
@@ -137,18 +133,20 @@ def test_a_connection_that_is_lost_comes_back(server):
     first = server.sessions()
     for pid in first:
         os.kill(pid, signal.SIGTERM)
-    wait_for(lambda: set(server.sessions()) - set(first) and net_info(), 60, "another session")
+    wait_for(lambda: set(server.sessions()) - set(first) and net_info(), what="another session")
     assert (library.KOVAPPPoECheckStatus(1), is_enabled()) == (1, "yes")
-    ping()
+    wait_for_answer(SERVER)
 
 
 def test_a_password_that_changed_meanwhile_ends_it(server, system_log):
     store()
     dial()
+    client = clients()
     server.know({USER: "a-new-word"})
     for pid in server.sessions():
         os.kill(pid, signal.SIGTERM)
-    wait_for(lambda: not clients(), 60, "the end of the client")
+    wait_for(lambda: not clients(), what="the end of the client")
+    wait_for_end(client)
     assert system_log.holds("user or password are refused")
     assert (library.KOVAPPPoECheckStatus(1), is_enabled(), interface()) == (0, "no", None)
 
@@ -159,7 +157,7 @@ def test_a_start_takes_the_settings_as_they_are_now(server):
     store(mtu="1300")
     dial()
     assert ppp_interfaces() == ["ppp0"] and pathlib.Path("/sys/class/net/ppp0/mtu").read_text() == "1300\n"
-    assert len(processes("/usr/sbin/pppoe-connect")) == 1
+    assert process("/usr/sbin/pppoe-connect")
 
 
 def test_disable_on_an_interface_ends_a_session_over_it_and_no_other(server):
@@ -176,10 +174,7 @@ def test_disable_on_an_interface_ends_a_session_over_it_and_no_other(server):
 def test_the_switch_follows_a_client_that_died(server):
     store()
     dial()
-    killed = processes("/usr/sbin/pppoe-connect")
-    for pid in killed:
-        os.kill(pid, signal.SIGKILL)
-    wait_for(lambda: not any(pathlib.Path(f"/proc/{pid}").exists() for pid in killed), what="the end of the client")
+    kill(processes("/usr/sbin/pppoe-connect"))
     assert (library.KOVAPPPoECheckStatus(0), is_enabled()) == (0, "yes")
     assert (library.KOVAPPPoECheckStatus(1), is_enabled()) == (0, "no")
 

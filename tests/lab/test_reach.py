@@ -17,7 +17,8 @@ HERE, OTHER, OTHER6 = "10.9.0.10", "10.9.0.1", "fd09::1"
 SILENT, ALSO_SILENT = "10.9.0.11", "10.9.0.66"  # the first is what the resolver puts before OTHER
 PORT, CLOSED = 8070, 8071
 LIMIT = 1
-PROMPT = 10 * SLOWNESS  # seconds that no answer takes, on however busy a machine
+TICK = 0.01  # a limit is kept in whole milliseconds, of which the first has begun already
+PROMPT = 30 * SLOWNESS  # seconds that no answer takes, on however busy a machine
 ECHO = """
 import pathlib, socket, struct, sys
 address, port, heard, cut = sys.argv[1], int(sys.argv[2]), pathlib.Path(sys.argv[3]), sys.argv[4] == "cut"
@@ -127,7 +128,7 @@ def test_closed_port_is_told_without_waiting(no_netbios):
 def test_dropped_packets_are_waited_for_as_long_as_allowed(no_netbios):
     for limit in (1, 3):
         answer, seconds = reach(SILENT, limit=limit)
-        assert answer == 0 and limit <= seconds < limit + PROMPT
+        assert answer == 0 and limit - TICK < seconds < limit + PROMPT
 
 
 def test_address_without_a_route_is_told_without_waiting(no_netbios):
@@ -138,14 +139,14 @@ def test_address_without_a_route_is_told_without_waiting(no_netbios):
 def test_each_address_of_a_name_is_tried(host, names, no_netbios):
     names(f"{SILENT} several\n{HERE} several\n{OTHER} several\n")  # dropped, refused, open
     answer, seconds = reach("several", limit=2)
-    assert answer == 1 and 2 <= seconds < 2 + PROMPT
+    assert answer == 1 and 2 - TICK < seconds < 2 + PROMPT
     wait_for(lambda: host.heard() == ["00 end"], what="the byte")
 
 
 def test_each_address_of_a_name_has_the_whole_limit(names, no_netbios):
     names(f"{SILENT} silent\n{ALSO_SILENT} silent\n")
     answer, seconds = reach("silent", limit=2)
-    assert answer == 0 and 4 <= seconds < 4 + PROMPT
+    assert answer == 0 and 4 - 2 * TICK < seconds < 4 + PROMPT
 
 
 def test_name_server_that_never_answers_is_left(no_netbios):
@@ -180,7 +181,7 @@ def test_kovanet_tells_whether_a_host_answers(host, no_netbios):
         "host": OTHER, "port": PORT, "timeout_seconds": 3, "reachable": True, "seconds": 0,
     }  # fmt: skip
     told = data("reach", SILENT, PORT, "timeout", LIMIT, status=NO)
-    assert told["reachable"] is False and told["timeout_seconds"] == LIMIT and told["seconds"] >= LIMIT
+    assert told["reachable"] is False and told["timeout_seconds"] == LIMIT and told["seconds"] > LIMIT - TICK
 
 
 def test_kovanet_needs_no_rights(host):

@@ -49,7 +49,8 @@ def interfaces(keep):
 
 
 def has_carrier(name):
-    return "LOWER_UP" in ip("link", "show", "dev", name)[0]["flags"]
+    """As the kernel tells it, which is a moment after it came or went."""
+    return ip("link", "show", "dev", name)[0]["operstate"] == "UP"
 
 
 def configure(name, address):
@@ -301,6 +302,7 @@ def test_check_leaves_a_single_interface_alone():
     run("ip", "link", "set", "eth0", "down")
     on_other_side("ip", "link", "set", "lan0", "down")
     wait_for(lambda: not has_carrier("lan0"), what="the loss of carrier")
+    wait_for(lambda: any("linkdown" in route for route in routes()), what="the mark of the route")
     before = routes()
     assert before and sdk.library.NetRoutetableCheck() == 0
     assert routes() == before

@@ -8,7 +8,7 @@ import socket
 import time
 
 import pytest
-from capture import socket_on_other_side
+from capture import in_order, socket_on_other_side
 from conftest import on_other_side, run, wait_for
 
 FIREWALL, SHAPER = "/usr/kova/bin/kovafirewall", "/usr/kova/bin/tctool"
@@ -49,7 +49,7 @@ def ports_reached(*ports, kind=socket.SOCK_DGRAM):
             listening[port] = socket.socket(socket.AF_INET, kind)
             listening[port].bind((OWN, port))
             listening[port].setblocking(False)
-        with socket_on_other_side(socket.AF_INET, kind) as sender:
+        with socket_on_other_side(socket.AF_INET, kind) as sender, in_order():
             for port in ports:
                 sender.sendto(b"x", (OWN, port))
         wait_for(lambda: arrived(listening[ports[-1]]), what="the last datagram")
@@ -85,7 +85,8 @@ def test_the_first_rule_that_fits_decides():
 def test_only_so_many_echo_requests_a_second_are_answered():
     LIMITS.write_text("eth0 ping 5\neth0 syn 100\n")
     load()
-    answers = on_other_side("ping", "-c", "100", "-i", "0.01", "-W", "1", OWN, status=None).stdout
+    # a hundred at once, then as many as are let through; a slow machine that spread the first would have all answered
+    answers = on_other_side("ping", "-c", "110", "-l", "100", "-i", "0.2", "-W", "1", OWN, status=None).stdout
     assert 1 <= int(re.search(r"(\d+) received", answers)[1]) < 100
     assert ports_reached(7001, 7009) == [7001, 7009]
 

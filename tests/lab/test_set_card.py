@@ -33,6 +33,7 @@ def appliance():
     run("ip", "addr", "flush", "dev", "eth0")
     run("ip", "link", "set", "eth0", "up")
     on_other_side("ip", "addr", "replace", "192.168.50.1/24", "dev", "eth0")
+    wait_for(lambda: "state UP" in run("ip", "link", "show", "eth0").stdout, what="carrier")
     yield
     subprocess.run(["/sbin/stop", "dhcp-client", "IFACE=eth0"], check=True)
 
@@ -77,10 +78,10 @@ def test_static_to_dhcp_to_static(tmp_path):
     with DhcpServer("eth0", "192.168.50", folder=tmp_path):
         assert sdk.set_card(sdk.card(sdk.DHCP, "eth0")) == 0, sdk.register()
         assert keys()["BOOTPROTO"] == "dhcp" and "IPADDR" not in keys()
-        wait_for(LEASE.exists, 20)
+        wait_for(LEASE.exists)
         lease = dict(line.split("=", 1) for line in LEASE.read_text().splitlines())
         leased = lease["IPADDR"].strip('"')
-        wait_for(lambda: f"{leased}/24" in addresses("eth0"), 5)
+        wait_for(lambda: f"{leased}/24" in addresses("eth0"))
         found = sdk.get_card(0)
         assert (found.nIPSource, found.szIfname, found.szIP.decode()) == (sdk.DHCP, b"eth0", leased)
         run("ping", "-c", "1", "-W", "5", "192.168.50.1")
@@ -94,7 +95,7 @@ def test_static_to_dhcp_to_static(tmp_path):
 def test_failing_step_leaves_the_old_file_byte_for_byte(tool, broken_tool, tmp_path):
     with DhcpServer("eth0", "192.168.50", folder=tmp_path):
         assert sdk.set_card(sdk.card(sdk.DHCP, "eth0")) == 0, sdk.register()
-        wait_for(lambda: addresses("eth0"), 20)
+        wait_for(lambda: addresses("eth0"))
         before, owner = IFCFG.read_bytes(), IFCFG.stat()
         broken_tool(tool, 3)
         assert make_static() == -1

@@ -129,7 +129,7 @@ def test_the_ipv6_settings_move_to_the_vlan_and_back():
 def test_a_vlan_gets_a_lease_of_its_own_network(tmp_path):
     with DhcpServer("eth0.10", "192.168.70", folder=tmp_path):
         assert create(source=DHCP) == 0, register()
-        leased = wait_for(lambda: addresses("eth0.10"), 30, "a lease")
+        leased = wait_for(lambda: addresses("eth0.10"), what="a lease")
         assert leased[0].startswith("192.168.70.") and addresses("eth0") == []
         assert remove() == 0, register()
     assert "BOOTPROTO=dhcp\n" in ETH0.read_text()

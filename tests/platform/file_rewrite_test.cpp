@@ -216,7 +216,7 @@ TEST_F(file_rewrite, KLIBCFileSetKeyValue_64writersKilledAtRandom_loseNothing) {
     const auto has_time = [&](int seconds) {
         return std::chrono::steady_clock::now() < begin + std::chrono::seconds{seconds};
     };
-    while (fault.empty() && (has_time(4) || (kills <= kKillsMin && has_time(60)))) {
+    while (fault.empty() && (has_time(4) || (kills <= kKillsMin && has_time(600)))) {
         std::array<int, kWriters> stored{};
         for (int i = 0; i < kWriters; i++)
             stored[i] = shared->done[i];

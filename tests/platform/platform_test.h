@@ -35,8 +35,10 @@ pid_t start_child(const std::function<int()> &function);
 int wait_for(pid_t pid);
 
 /** Waits up to some seconds until a condition holds. */
-bool eventually(const std::function<bool()> &condition, int seconds = 5);
+bool eventually(const std::function<bool()> &condition, int seconds = 60);
 double seconds_of(const std::function<void()> &function);
+/** Seconds by which a busy machine may be late. */
+constexpr double kDelay = 20;
 
 /** A directory of its own for every test, gone afterwards; the register marked. */
 class platform_test : public testing::Test {

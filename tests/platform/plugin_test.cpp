@@ -171,7 +171,7 @@ TEST_F(plugin, KLIBPluginAction_hangingPlugin_isEndedWithItsChildren) {
     install("2", "echo ran" + to_output());
     const double time = seconds_of([&] { EXPECT_FAILS(KLIBPluginAction(KLIB_PLUGIN_PRE, handle_), -1, 0x2A00); });
     EXPECT_GT(time, 1.9);
-    EXPECT_LT(time, 3);
+    EXPECT_LT(time, 2 + kDelay);
     EXPECT_EQ(output(), "ran\n");
     const std::string child = std::to_string(std::atoi(read_file(path("child")).c_str()));
     EXPECT_NE(child, "0");
@@ -183,7 +183,7 @@ TEST_F(plugin, KLIBPluginAction_manyHangingPlugins_areBoundedInAll) {
         install(name, "echo $0" + to_output() + "\nexec sleep 1000");
     const double time = seconds_of([&] { EXPECT_FAILS(KLIBPluginAction(KLIB_PLUGIN_PRE, handle_), -1, 0x2A00); });
     EXPECT_GT(time, 3.5);
-    EXPECT_LT(time, 4.7);
+    EXPECT_LT(time, 4 + kDelay); // five times two seconds at least, were each given its own
     EXPECT_EQ(std::ranges::count(output(), '\n'), 2);
 }
 

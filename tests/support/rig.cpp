@@ -284,9 +284,9 @@ texts open_descriptors() {
 }
 
 void lay_out_clean_appliance() {
-    for (const char *path :
-         {"/etc/sysconfig", "/etc.defaults", "/etc/kova", "/etc/kovainfo.conf", "/etc/dhclient", "/etc/ppp",
-          "/run/ddns", "/run/lock/kova", "/usr/kova", "/etc/dhcpd", "/etc/iproute2/config", "/etc/gogoc"}) {
+    for (const char *path : {"/etc/sysconfig", "/etc.defaults", "/etc/kova", "/etc/kovainfo.conf", "/etc/dhclient",
+                             "/etc/ppp", "/etc/resolv.conf.bak", "/run/ddns", "/run/lock/kova", "/usr/kova",
+                             "/etc/dhcpd", "/etc/iproute2/config", "/etc/gogoc"}) {
         fs::remove_all(path);
     }
     for (const char *path : {"/etc/sysconfig/network-scripts", "/etc.defaults", "/etc/kova", "/etc/dhclient/ipv4",

@@ -10,6 +10,7 @@
 #include <cstring>
 #include <fcntl.h>
 #include <iterator>
+#include <poll.h>
 #include <termios.h>
 #include <unistd.h>
 
@@ -20,6 +21,57 @@ constexpr char kFile[] = "--password-file";
 constexpr char kFd[] = "--password-fd";
 constexpr char kKeep[] = "--keep-password";
 
+/** The signal that came while a password was typed. */
+volatile sig_atomic_t caught;
+
+/** Keeps a terminal from showing what is typed; gives it back as it was, also when a signal ends the program. */
+class silent_terminal {
+public:
+    explicit silent_terminal(int fd) : fd_(fd) {
+        caught = 0;
+        sigset_t all;
+        sigemptyset(&all);
+        struct sigaction note {};
+        note.sa_handler = [](int number) { caught = number; };
+        for (const int number : kSignals) {
+            sigaddset(&all, number);
+        }
+        sigprocmask(SIG_BLOCK, &all, &mask_);
+        for (size_t i = 0; i < std::size(kSignals); ++i) {
+            sigaction(kSignals[i], &note, &before_[i]);
+        }
+        tcgetattr(fd_, &shown_);
+        termios silent = shown_;
+        silent.c_lflag &= ~static_cast<tcflag_t>(ECHO);
+        tcsetattr(fd_, TCSAFLUSH, &silent);
+    }
+    silent_terminal(const silent_terminal &) = delete;
+    silent_terminal &operator=(const silent_terminal &) = delete;
+    ~silent_terminal() {
+        tcsetattr(fd_, TCSAFLUSH, &shown_);
+        for (size_t i = 0; i < std::size(kSignals); ++i) {
+            sigaction(kSignals[i], &before_[i], nullptr);
+        }
+        sigprocmask(SIG_SETMASK, &mask_, nullptr);
+        if (caught != 0) {
+            raise(caught);
+        }
+    }
+
+    /** Waits until something can be read. Signals come only here: one just before a read would not end it. */
+    [[nodiscard]] bool is_typed_on() const {
+        pollfd typed{fd_, POLLIN, 0};
+        return ppoll(&typed, 1, nullptr, &mask_) > 0;
+    }
+
+private:
+    static constexpr int kSignals[] = {SIGINT, SIGTERM, SIGQUIT, SIGHUP, SIGTSTP};
+    int fd_;
+    termios shown_{};
+    struct sigaction before_[std::size(kSignals)]{};
+    sigset_t mask_{};
+};
+
 /** What was read, wiped when it goes. */
 class secret_bytes {
 public:
@@ -28,8 +80,8 @@ public:
     secret_bytes &operator=(const secret_bytes &) = delete;
     ~secret_bytes() { explicit_bzero(bytes_, sizeof bytes_); }
 
-    /** @return whether the end was reached, or errno says why not: EFBIG when there is no room for more */
-    bool read_from(int fd, bool up_to_line_end);
+    /** Up to the end, on a terminal of a line. @return false: errno says why not, EFBIG when there is no more room */
+    bool read_from(int fd, const silent_terminal *terminal = nullptr);
     /** The password, whose line end has gone; ends the program when it is none. */
     void copy_to(char *field, size_t size);
 
@@ -40,14 +92,17 @@ private:
     size_t length_ = 0;
 };
 
-bool secret_bytes::read_from(int fd, bool up_to_line_end) {
+bool secret_bytes::read_from(int fd, const silent_terminal *terminal) {
     while (length_ < sizeof bytes_) {
+        if (terminal != nullptr && !terminal->is_typed_on()) {
+            return false;
+        }
         const ssize_t got = read(fd, bytes_ + length_, sizeof bytes_ - length_);
         if (got < 0) {
             return false;
         }
         length_ += static_cast<size_t>(got);
-        if (got == 0 || (up_to_line_end && ends_line())) {
+        if (got == 0 || (terminal != nullptr && ends_line())) {
             return true;
         }
     }
@@ -75,43 +130,6 @@ void secret_bytes::copy_to(char *field, size_t size) {
     throw failure{kNo, "cannot read the password from " + from + ": " + strerror(errno)};
 }
 
-/** The signal that came while a password was typed. */
-volatile sig_atomic_t caught;
-
-/** Keeps a terminal from showing what is typed; gives it back as it was, also when a signal ends the program. */
-class silent_terminal {
-public:
-    explicit silent_terminal(int fd) : fd_(fd) {
-        caught = 0;
-        struct sigaction note {};
-        note.sa_handler = [](int number) { caught = number; }; // without SA_RESTART: the read ends
-        for (size_t i = 0; i < std::size(kSignals); ++i) {
-            sigaction(kSignals[i], &note, &before_[i]);
-        }
-        tcgetattr(fd_, &shown_);
-        termios silent = shown_;
-        silent.c_lflag &= ~static_cast<tcflag_t>(ECHO);
-        tcsetattr(fd_, TCSAFLUSH, &silent);
-    }
-    silent_terminal(const silent_terminal &) = delete;
-    silent_terminal &operator=(const silent_terminal &) = delete;
-    ~silent_terminal() {
-        tcsetattr(fd_, TCSAFLUSH, &shown_);
-        for (size_t i = 0; i < std::size(kSignals); ++i) {
-            sigaction(kSignals[i], &before_[i], nullptr);
-        }
-        if (caught != 0) {
-            raise(caught);
-        }
-    }
-
-private:
-    static constexpr int kSignals[] = {SIGINT, SIGTERM, SIGQUIT, SIGHUP, SIGTSTP};
-    int fd_;
-    termios shown_{};
-    struct sigaction before_[std::size(kSignals)]{};
-};
-
 void ask(secret_bytes &secret) {
     if (isatty(STDIN_FILENO) != 1 || isatty(STDERR_FILENO) != 1) {
         throw failure{kUsage, std::string("there is no terminal to ask for the password on; give it with ") + kFile +
@@ -121,7 +139,7 @@ void ask(secret_bytes &secret) {
     {
         const silent_terminal terminal{STDIN_FILENO}; // before it asks: what was typed till then is dropped
         fputs("Password: ", stderr);
-        is_read = secret.read_from(STDIN_FILENO, true);
+        is_read = secret.read_from(STDIN_FILENO, &terminal);
     }
     fputc('\n', stderr);
     if (!is_read) {
@@ -131,7 +149,7 @@ void ask(secret_bytes &secret) {
 
 void read_file(const std::string &path, secret_bytes &secret) {
     const int fd = open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NOCTTY);
-    const bool is_read = fd >= 0 && secret.read_from(fd, false);
+    const bool is_read = fd >= 0 && secret.read_from(fd);
     const int reason = errno;
     if (fd >= 0) {
         close(fd);
@@ -170,7 +188,7 @@ void read_password(const password_words &words, char *field, size_t size) {
         read_file(*words.file, secret);
     } else if (!words.fd) {
         ask(secret);
-    } else if (!secret.read_from(*words.fd, false)) {
+    } else if (!secret.read_from(*words.fd)) {
         read_failed("descriptor " + std::to_string(*words.fd));
     }
     secret.copy_to(field, size);
