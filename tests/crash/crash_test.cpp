@@ -11,6 +11,7 @@
 
 #include <algorithm>
 #include <cstdio>
+#include <cstring>
 #include <fcntl.h>
 #include <filesystem>
 #include <gtest/gtest.h>
@@ -113,8 +114,9 @@ unsigned mode_of(const std::string &path) {
 
 /** Tools that the library starts: here they succeed at once. */
 void replace_tools() {
-    for (const char *tool : {"/etc/rc.network", "/sbin/ip", "/sbin/ifconfig", "/sbin/start", "/sbin/stop",
-                             "/usr/kova/service/ddns", "/usr/kova/sbin/kovanetdtool"}) {
+    for (const char *tool :
+         {"/etc/rc.network", "/sbin/ip", "/sbin/ifconfig", "/sbin/start", "/sbin/stop", "/usr/kova/bin/kovafirewall",
+          "/usr/kova/bin/tctool", "/usr/kova/service/ddns", "/usr/kova/sbin/kovanetdtool"}) {
         fs::create_directories(fs::path{tool}.parent_path());
         fs::remove(tool);
         fs::create_symlink("/bin/true", tool);
@@ -131,6 +133,7 @@ protected:
           file_(where_.is_link ? fs::path{path_}.parent_path() / "linked" / fs::path{path_}.filename()
                                : fs::path{path_}) {
         fs::create_directories(fs::path{path_}.parent_path());
+        write_file("/etc/kovainfo.conf", "", 0644); // every appliance has one
         fs::remove(path_);
         strangers_ = names_in(fs::path{path_}.parent_path());
         before_ = where_.has_file ? content{first_text()} : std::nullopt;
@@ -167,17 +170,20 @@ protected:
         return shown(content_of(file_));
     }
 
-    content after_first_part() {
+    /** What the file holds after the first of what the operation does to it in several parts. */
+    content after_parts(size_t count) {
         lay_out(before_);
-        EXPECT_EQ(0, in_child([this] { return what_.first_part(path_.c_str()) ? 0 : 1; }));
+        for (size_t part = 0; part < count; ++part) {
+            EXPECT_EQ(0, in_child([this, part] { return what_.parts[part](path_.c_str()) ? 0 : 1; }));
+        }
         return shown(content_of(file_));
     }
 
     /** What may be found at any time. */
     std::vector<content> versions() {
         std::vector<content> all = {before_, after(before_)};
-        if (what_.first_part) {
-            all.push_back(after_first_part());
+        for (size_t count = 1; count <= what_.parts.size(); ++count) {
+            all.push_back(after_parts(count));
         }
         const bool changes = what_.files != works_on::kNoFile && !(what_.puts_back && before_);
         EXPECT_EQ(changes, all[0] != all[1]) << "whether it changes the file";
@@ -202,11 +208,25 @@ protected:
         if (stat(file_.c_str(), &status) < 0) {
             return;
         }
-        EXPECT_EQ(where_.has_file ? kOldMode : what_.mode, status.st_mode & 07777);
-        EXPECT_EQ(where_.has_file ? kOldOwner : geteuid(), status.st_uid);
-        EXPECT_EQ(where_.has_file ? kOldGroup : getegid(), status.st_gid);
+        const bool is_new = !where_.has_file || (what_.makes_anew && status.st_uid == geteuid());
+        EXPECT_EQ(is_new ? what_.mode : kOldMode, status.st_mode & 07777);
+        EXPECT_EQ(is_new ? geteuid() : kOldOwner, status.st_uid);
+        EXPECT_EQ(is_new ? getegid() : kOldGroup, status.st_gid);
         EXPECT_EQ(1U, status.st_nlink);
         EXPECT_EQ(where_.is_link, fs::is_symlink(path_));
+    }
+
+    /** Whether a name is that of a temporary that nobody else takes away. */
+    [[nodiscard]] bool is_unique_temporary(const std::string &name) const {
+        return std::any_of(what_.temporaries.begin(), what_.temporaries.end(), [&name](const std::string &beginning) {
+            return name.starts_with(beginning) && name.size() == beginning.size() + strlen("XXXXXX");
+        });
+    }
+
+    [[nodiscard]] std::vector<std::string> unique_temporaries() const {
+        std::vector<std::string> found = names_in(directory());
+        std::erase_if(found, [this](const std::string &name) { return !is_unique_temporary(name); });
+        return found;
     }
 
     /** Names beside the file that were not there before: of its backups, and of everything else. */
@@ -214,6 +234,9 @@ protected:
         const std::string backup = fs::path{file_}.filename().string() + ".tmp";
         std::vector<std::string> found;
         for (const std::string &name : names_in(directory())) {
+            if (is_unique_temporary(name)) {
+                continue;
+            }
             const bool is_other = std::find(what_.others.begin(), what_.others.end(), name) != what_.others.end();
             const bool is_known = is_other || file_ == directory() + "/" + name ||
                                   (!where_.is_link && std::binary_search(strangers_.begin(), strangers_.end(), name));
@@ -224,8 +247,14 @@ protected:
         return found;
     }
 
-    /** At most one hidden file, and a backup where one is made. */
+    /** At most one hidden file, a backup where one is made, and a temporary of each kind, open to no more than the
+     * file. */
     void expect_few_leftovers() {
+        const std::vector<std::string> temporaries = unique_temporaries();
+        EXPECT_LE(temporaries.size(), what_.temporaries.size()) << testing::PrintToString(temporaries);
+        for (const std::string &name : temporaries) {
+            EXPECT_EQ(0U, mode_of(directory() + "/" + name) & ~what_.mode) << name;
+        }
         const std::vector<std::string> hidden = leftovers(false);
         EXPECT_LE(hidden.size(), 1U) << testing::PrintToString(hidden);
         for (const std::string &name : hidden) {
@@ -237,6 +266,9 @@ protected:
     }
 
     void expect_open_to_readers() {
+        if (!fs::exists(kLocks)) {
+            return; // nothing took a lock yet
+        }
         EXPECT_EQ(0755U, mode_of(kLocks));
         for (const std::string &name : names_in(kLocks)) {
             EXPECT_EQ(0644U, mode_of(std::string{kLocks} + "/" + name)) << name;

@@ -1,8 +1,15 @@
 #include "operations.h"
 
 #include <cstdio>
+#include <ctime>
 #include <kova/core.h>
 #include <kovanetsdk/kovanetsdk.h>
+#include <unistd.h>
+
+/** In place of the C library's: nothing here has to settle, and every operation runs hundreds of times. */
+extern "C" int nanosleep(const timespec *, timespec *) {
+    return 0;
+}
 
 namespace kova_test {
 
@@ -16,6 +23,8 @@ constexpr char kNoProtocol[] = "DEVICE=eth0\nONBOOT=yes\n";
 constexpr char kAddress[] = "192.168.7.10";
 constexpr char kMask[] = "255.255.255.0";
 constexpr char kBrokenMask[] = "255.255.255.999";
+constexpr char kIpv6Address[] = "2001:db8::10";
+constexpr char kIpv6Gateway[] = "2001:db8::1";
 
 bool set_keys(const char *path) {
     KLIBSZHASH *const set = KLIBCSzHashAlloc(8);
@@ -78,6 +87,38 @@ bool make_bond(const char *) {
     return KOVANetLinkAggrSet(&bond) == 0;
 }
 
+bool make_vlan(const char *) {
+    constexpr int kId = 10;
+    const NETINFO wanted = card(1);
+    return KLIBNetVlanCreate("eth0", kId, &wanted) == 0;
+}
+
+/** The address is given to /bin/true: what is looked at is the file. */
+bool set_fixed_ipv6(const char *) {
+    return KOVANetIPv6ConfSet(NET_IPV6_STATIC, "eth0", kIpv6Address, 64, kIpv6Gateway) == 0;
+}
+
+/** One key of several that an operation writes one after the other. */
+std::function<bool(const char *)> writes(const char *key, const char *value) {
+    return [key, value](const char *path) { return KLIBCFileSetKeyValue(path, key, value, kQuoted) == 0; };
+}
+
+bool make_temporary(const char *) {
+    char path[] = "/tmp/crash/.file.XXXXXX";
+    FILE *const file = KLIBCFileTempFileOpen(path);
+    return file != nullptr && fclose(file) == 0 && unlink(path) == 0;
+}
+
+bool set_tunnel_password(const char *) {
+    const TUNNEL_CONF conf = {0, "broker", "user", "secret"};
+    return KOVATunnelConfigSet(&conf) == 0;
+}
+
+bool set_tunnel_server(const char *) {
+    const TUNNEL_CONF conf = {1, "broker", "", ""};
+    return KOVATunnelConfigSet(&conf) == 0;
+}
+
 bool set_secret(const char *) {
     const PPPOE_CONF conf = {"eth0", "user", "secret", "1492", 1};
     return PPPoEConfigSet(&conf) == 0;
@@ -114,6 +155,14 @@ const std::vector<operation> &operations() {
          .path = "/etc/kova/secret.key",
          .mode = 0600,
          .is_random = true},
+        {.name = "KLIBCFileTempFileOpen",
+         .floor = 10,
+         .call = make_temporary,
+         .files = works_on::kNoFile,
+         .path = "/tmp/crash/file",
+         .mode = 0600,
+         .is_built_of_others = true,
+         .temporaries = {".file."}},
         {"KLIBCFileLock", 28, lock_by_name, works_on::kNoFile},
         {"KLIBCFileLockTimeByFile", 22, lock_by_file, works_on::kNoFile},
 
@@ -129,7 +178,7 @@ const std::vector<operation> &operations() {
          .files = works_on::kPresentFile,
          .path = kIfcfg,
          .is_built_of_others = true,
-         .first_part = [](const char *path) { return KLIBCFileSetKeyValue(path, "BLOCK_HA", "yes", kQuoted) == 0; }},
+         .parts = {writes("BLOCK_HA", "yes")}},
         {.name = "BlKOVALnxIsDHCP_repair",
          .floor = 94,
          .call = [](const char *) { return BlKOVALnxIsDHCP("eth0") == 0; },
@@ -149,7 +198,7 @@ const std::vector<operation> &operations() {
          .is_built_of_others = true,
          .puts_back = true,
          .keeps_backup = true,
-         .first_part = set_broken_mask},
+         .parts = {set_broken_mask}},
         {.name = "KOVANetSetCard1_static",
          .floor = 226,
          .call = [](const char *) { return set_card(1); },
@@ -161,6 +210,19 @@ const std::vector<operation> &operations() {
          .call = [](const char *) { return set_card(0); },
          .path = kIfcfg,
          .is_built_of_others = true},
+        {.name = "KOVANetIPv6ConfSet_auto",
+         .floor = 200,
+         .call = [](const char *) { return KOVANetIPv6ConfSet(NET_IPV6_AUTO, "eth0", nullptr, 0, nullptr) == 0; },
+         .path = kIfcfg,
+         .is_built_of_others = true,
+         .parts = {writes("IPV6INIT", "auto")}},
+        {.name = "KOVANetIPv6ConfSet_static",
+         .floor = 450,
+         .call = set_fixed_ipv6,
+         .path = kIfcfg,
+         .is_built_of_others = true,
+         .parts = {writes("IPV6_ACCEPT_RA", "0"), writes("IPV6INIT", "static"), writes("IPV6ADDR", kIpv6Address),
+                   writes("IPV6PREFIXLENG", "64")}},
         {.name = "KOVANetDefaultGatewaySetConf",
          .floor = 44,
          .call = [](const char *) { return KOVANetDefaultGatewaySetConf("192.168.7.1") == 0; },
@@ -171,6 +233,15 @@ const std::vector<operation> &operations() {
          .call = [](const char *) { return DHCPInterfaceSetEnabled("eth0", 0, 1) == 0; },
          .path = "/etc/dhcpd/dhcpd-eth0.info",
          .is_built_of_others = true},
+        {.name = "KLIBNetVlanCreate",
+         .floor = 370,
+         .call = make_vlan,
+         .files = works_on::kPresentFile,
+         .path = kIfcfg,
+         .is_built_of_others = true,
+         .makes_anew = true,
+         .others = {"ifcfg-eth0.10"},
+         .temporaries = {"DEVICE_", "VLAN_"}},
         {.name = "KOVANetLinkAggrSet_make",
          .floor = 350,
          .call = make_bond,
@@ -187,6 +258,20 @@ const std::vector<operation> &operations() {
          .is_built_of_others = true,
          .keeps_backup = true,
          .others = {"pppoe.conf"}},
+        {.name = "KOVATunnelConfigSet_password",
+         .floor = 60,
+         .call = set_tunnel_password,
+         .path = "/etc/gogoc/.tunnel_passwd",
+         .text = "another",
+         .mode = 0600,
+         .is_built_of_others = true,
+         .makes_anew = true,
+         .temporaries = {".tunnel_passwd."}},
+        {.name = "KOVATunnelConfigSet_server",
+         .floor = 56,
+         .call = set_tunnel_server,
+         .path = "/etc/sysconfig/network-scripts/ifcfg-tun",
+         .is_built_of_others = true},
         {.name = "KLIBNETSetTopologyConfigs",
          .floor = 44,
          .call = [](const char *) { return KLIBNETSetTopologyConfigs(&gTopologyInfo[KLIB_TOPOLOGY_BRIDGE]) == 0; },

@@ -28,9 +28,13 @@ struct operation {
     bool puts_back = false;            ///< fails, and a file that was there is as before
     bool keeps_backup = false;         ///< a killed one may leave "<file>.tmp<seconds>", which every reader skips
     bool is_random = false;            ///< two files it makes differ, their sizes do not
+    bool makes_anew = false;           ///< a file that was there is replaced by one that has nothing from it
     std::vector<std::string> others{}; ///< names of files beside it that it works on, too
-    /** Writes what a file may hold in between, when that is more than old and new. */
-    std::function<bool(const char *path)> first_part{};
+    /** Names of its temporaries without the six letters and digits that make them unique: a killed one may leave each.
+     */
+    std::vector<std::string> temporaries{};
+    /** Each writes a bit more of what a file may hold in between, when that is more than old and new. */
+    std::vector<std::function<bool(const char *path)>> parts{};
 
     static constexpr char kKeys[] =
         "# kept as it is\nDEVICE=eth0\nKEY=old\nONBOOT=no\nBOOTPROTO=dhcp\nIPADDR=10.0.0.1\n"
