@@ -262,11 +262,10 @@ void take_v6_keys(const given_keys &keys, subnet &one) {
 void require_needed(const given_keys &keys, const subnet_id &id, presence found) {
     const std::vector<std::string> needed = id.type == kIPv4 ? std::vector<std::string>{"range", "mask", "router"}
                                                              : std::vector<std::string>{"mode", "dns"};
-    for (const std::string &key : needed) {
-        if (!keys.contains(key)) {
-            bad_usage((found == presence::absent ? "a new subnet needs " : "the subnet cannot be read and needs ") +
-                      key);
-        }
+    const auto is_given = [&keys](const std::string &key) { return keys.contains(key); };
+    if (!std::all_of(needed.begin(), needed.end(), is_given)) {
+        bad_usage((found == presence::absent ? "a new subnet needs " : "the subnet cannot be read and needs ") +
+                  CLI::detail::join(needed, ", "));
     }
 }
 
