@@ -4,6 +4,7 @@
 #include "objects.h"
 #include "rules.h"
 
+#include <kova/core.h>
 #include <kovanetsdk/dhcp.h>
 #include <kovanetsdk/iface.h>
 #include <kovanetsdk/routing.h>
