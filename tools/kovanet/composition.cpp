@@ -25,7 +25,8 @@ std::string key_of(const std::string &name, const char *key) {
     return KLIBCFileGetKeyValue(file_of(name).c_str(), key, value, sizeof value, 0) > 0 ? value : "";
 }
 
-/** From now on Ctrl-C ends the programs that are run, but leaves it to the library to put right what they have begun. */
+/** From now on Ctrl-C ends the programs that are run, but leaves it to the library to put right what they have begun.
+ */
 void outlive_interrupts() {
     struct sigaction action {};
     action.sa_handler = [](int) {}; // ignored, it would be for these programs, too

@@ -357,8 +357,7 @@ void switch_off(const subnet_id &id) {
 
 void add_family_word(CLI::App &verb, subnet_words &words) {
     verb.validate_positionals(); // a key may stand in its place
-    verb.add_option("4|6", words.family_word, "IPv4, which is meant without it, or IPv6")
-        ->check(choice({"4", "6"}));
+    verb.add_option("4|6", words.family_word, "IPv4, which is meant without it, or IPv6")->check(choice({"4", "6"}));
 }
 
 } // namespace

@@ -305,7 +305,8 @@ const CLI::App &last_command(const CLI::App &app) {
 std::string suggested_option(const std::string &word, const CLI::App &command) {
     std::vector<std::string> known;
     for (const CLI::App *at = &command; at != nullptr; at = at->get_parent()) {
-        for (const CLI::Option *option : at->get_options([](const CLI::Option *each) { return each->nonpositional(); })) {
+        for (const CLI::Option *option :
+             at->get_options([](const CLI::Option *each) { return each->nonpositional(); })) {
             known.push_back(option->get_name());
         }
     }

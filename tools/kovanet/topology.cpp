@@ -108,9 +108,7 @@ void add_topology(CLI::App &object, const global_options &options) {
     one.callback([&words, &options] { show(words.shown, options.json); });
 
     CLI::App &change = *object.add_subcommand("set", "store another topology; the interfaces stay as they are");
-    change.add_option("TOPOLOGY", words.name, "client, bridge or router")
-        ->required()
-        ->check(choice(topology_names()));
+    change.add_option("TOPOLOGY", words.name, "client, bridge or router")->required()->check(choice(topology_names()));
     change.callback([&words] { set(words.name); });
 }
 
