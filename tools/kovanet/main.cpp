@@ -327,6 +327,12 @@ std::string usage_complaint(const CLI::ParseError &error, const CLI::App &app) {
     if (error.get_name() == "RequiredError" && text.find("subcommand") != std::string::npos) {
         return "the command is not complete";
     }
+    if (const char kLacks[] = " requires "; text.starts_with(kLacks)) { // a keyword, whose name is hidden
+        return text.substr(sizeof kLacks - 1) + " is required";
+    }
+    if (error.get_exit_code() == static_cast<int>(CLI::ExitCodes::ConversionError)) {
+        return "\"" + text.substr(text.rfind(' ') + 1) + "\" is no number";
+    }
     const size_t name_end = text.find(": \""); // of a word, and what is wrong with it
     return name_end == std::string::npos || text.starts_with("--") ? text : text.substr(name_end + 2);
 }
