@@ -18,6 +18,7 @@ import pathlib
 import platform
 import random
 import shutil
+import signal
 import subprocess
 import sys
 import tempfile
@@ -319,6 +320,7 @@ def main():
     try:
         steps = chosen_steps(out, asked.names)
         if asked.list:
+            signal.signal(signal.SIGPIPE, signal.SIG_DFL)  # a reader such as head may have seen enough
             print("\n".join(f"{step.ring}/{step.name}" for step in steps))
             print("dhcp-fuzz")
             print("units:", *units_of("unit"), *units_of("platform"))

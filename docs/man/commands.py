@@ -8,13 +8,14 @@ import sys
 
 def sections(text):
     """A help text's first line, usage line, and the pairs of its sections."""
-    lines = re.sub(r"\n {10,}(?=\S)", "  ", text).splitlines()  # a long name has its meaning on the next line
+    text = re.sub(r"^(  \S+(?: \S+)*)\n {10,}(?=\S)", r"\1  ", text, flags=re.MULTILINE)  # a long name stands alone
+    lines = re.sub(r"\n {7,}(?=\S)", " ", text).splitlines()  # what does not fit on a line goes on indented
     found = {"title": lines[0], "usage": next(line for line in lines if line.startswith("Usage: "))[len("Usage: "):]}
     for line in lines:
         if heading := re.fullmatch(r"(\w+):", line):
             pairs = found[heading[1]] = []
         elif pair := re.fullmatch(r"  (\S.*?)  +(\S.*)", line):
-            pairs.append((re.sub(r" Excludes:.*", "", pair[1]), pair[2]))
+            pairs.append((pair[1], pair[2]))
     return found
 
 
@@ -28,7 +29,7 @@ def sentence(text):
 
 def entry(usage, about):
     words = [f"*{plain(word)}*: {plain(meaning)}" for word, meaning in about.get("Words", [])]
-    options = [f"**{plain(word)}**: {plain(meaning)}" for word, meaning in about.get("Options", []) if word != "--help"]
+    options = [f"**{plain(word)}**: {plain(meaning)}" for word, meaning in about.get("Options", []) if "--help" not in word]
     name, _, arguments = usage.partition(" [OPTIONS]")
     print(f"\n**{plain(name)}**{plain(arguments)}\n: {sentence(plain(about['title']))}", sentence("; ".join(words + options)))
 

@@ -54,6 +54,15 @@ def test_every_command_and_option_has_an_entry():
     assert not missing, "not in kovanet(1): " + ", ".join(missing)
 
 
+def test_help_fits_a_terminal_and_has_an_example_of_each_command():
+    wide, without = [], []
+    for command, _ in commands():
+        text = run(KOVANET, *command.split()[1:], "--help")
+        wide += [f"{command}: {line}" for line in text.splitlines() if len(line) >= 80]
+        without += [] if re.search(rf"^Examples:\n(  .*\n)*  {command}( |\n)", text, re.MULTILINE) else [command]
+    assert not wide and not without, (wide, without)
+
+
 # ---- kovanetsdk(7)
 
 def test_error_table_is_that_of_the_header():

@@ -8,6 +8,7 @@ import os
 import pathlib
 import pty
 import re
+import signal
 import stat
 import subprocess
 
@@ -492,6 +493,15 @@ def test_a_change_says_what_it_will_do_and_shows_that_it_takes_time():
     status, said = asked("eth0", "off", answer=b"y\n")
     assert status == DONE and said.startswith("eth0 loses its IPv6 addresses and has no IPv6.\n")
     assert kernel_switch("disable_ipv6") == "1"
+
+
+def test_an_interrupted_change_is_not_left_half_done(router):
+    set_mode("auto")
+    with subprocess.Popen([KOVANET, "ipv6", "set", "eth0", "static", f"{FIXED}/64", "--yes"]) as change:
+        wait_for(lambda: "fixed" in kinds(global_addresses()), 20, "the address, while others are asked for it")
+        change.send_signal(signal.SIGINT)
+        assert change.wait(60) == DONE
+    assert key_values()["IPV6INIT"] == "static"
 
 
 def test_help_has_examples_and_exit_codes():

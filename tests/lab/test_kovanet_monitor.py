@@ -223,3 +223,20 @@ def test_version_names_that_of_the_json():
                                          (["dhcp-server", "subnet", "lits"], "list")])
 def test_mistyped_words_are_answered_with_what_may_have_been_meant(words, meant):
     assert complaint(*words, status=USAGE).endswith(f"is not known; did you mean {meant}?")
+
+
+@pytest.mark.parametrize("words,told", [
+    (["help"], 'object "help" is not known; see kovanet --help'),
+    (["--verison"], 'option "--verison" is not known; did you mean --version?'),
+    (["card", "list", "--jsno"], 'option "--jsno" is not known; did you mean --json?'),
+    (["card", "list", "eth0"], '"eth0" is one word too many; see kovanet card list --help'),
+    (["card", "set", "eth0", "statc"], '"statc" is none of static, dhcp; did you mean static?'),
+    (["card", "set", "eth0", "static", "192.0.2.1", "255.0.0.0"],
+     '"255.0.0.0" is not expected here: write mask MASK; see kovanet card set --help'),
+    (["reach", "192.0.2.1", "80", "timeout"], "SECONDS is required; see kovanet reach --help"),
+    (["service", "notify", "ip", "action", "x"], '"x" is no number; see kovanet service notify --help'),
+    (["ports", "list", "tcp", "70000"], '"70000" is no number from 0 to 65535; see kovanet ports list --help'),
+    (["stats", "--watch", "1", "--count", "x"], '--count: "x" is no number from 1 to 1000000000; see kovanet stats --help'),
+])
+def test_what_is_not_understood_is_told_in_plain_words(words, told):
+    assert complaint(*words, status=USAGE) == told

@@ -2,6 +2,7 @@
 # needs: vlan bonding dummy
 """The recipes of the documentation, each block run as printed, one after the other in one shell."""
 
+import json
 import pathlib
 import re
 import subprocess
@@ -14,6 +15,7 @@ DOCUMENT = pathlib.Path(__file__).resolve().parents[2] / "docs" / "recipes.md"
 SECTIONS = dict(re.findall(r"^## (.+?)\n(.*?)(?=^## |\Z)", DOCUMENT.read_text(), re.MULTILINE | re.DOTALL))
 BLOCKS = {title: re.findall(r"```sh\n(.*?)```", text, re.DOTALL) for title, text in SECTIONS.items()}
 TRIED = set(re.findall(r"follow\(\s*\"(.+?)\"", pathlib.Path(__file__).read_text()))
+FIXED_ADDRESSES = pathlib.Path("/etc/dhcpd/dhcpd-eth1-static.conf")
 CARDS = ("eth0", "eth1", "eth2")
 
 
@@ -121,12 +123,24 @@ def test_large_packets():
 
 
 def test_a_dhcp_server():
-    def serves(_):
-        lease = on_other_side("busybox", "udhcpc", "-n", "-q", "-f", "-t", "30", "-T", "1", "-i", "eth1", "-s", "/bin/true")
-        assert "lease of 192.168.60." in lease.stdout + lease.stderr
+    def lease():
+        got = on_other_side("busybox", "udhcpc", "-n", "-q", "-f", "-t", "30", "-T", "1", "-i", "eth1", "-s", "/bin/true")
+        return got.stdout + got.stderr
 
-    follow("Serve DHCP on a second port", serves)
-    run("/usr/bin/kovanet", "dhcp-server", "off")
+    def serves(_):
+        assert re.search(r"lease of 192\.168\.60\.(1\d\d|200) ", lease())
+
+    def serves_the_fixed_address(_):
+        on_other_side("ip", "link", "set", "eth1", "address", "52:54:00:12:34:56")
+        assert "lease of 192.168.60.20 " in lease()
+
+    mac = json.loads(on_other_side("ip", "-j", "link", "show", "dev", "eth1").stdout)[0]["address"]
+    try:
+        follow("Serve DHCP on a second port", serves, serves_the_fixed_address)
+    finally:
+        on_other_side("ip", "link", "set", "eth1", "address", mac)
+        FIXED_ADDRESSES.unlink(missing_ok=True)
+        run("/usr/bin/kovanet", "dhcp-server", "off")
 
 
 def test_a_wait_for_a_link():

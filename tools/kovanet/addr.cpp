@@ -4,6 +4,7 @@
 #include "objects.h"
 #include "records.h"
 #include "rules.h"
+#include "words.h"
 
 #include <algorithm>
 #include <charconv>
@@ -194,7 +195,7 @@ void add_addr(CLI::App &object, const global_options &options) {
 
     CLI::App &none = *object.add_subcommand("flush", "remove all addresses of a family");
     none.add_option("IF", words.name, "interface")->required();
-    none.add_option("FAMILY", words.address, "4 or 6")->required()->check(CLI::IsMember({"4", "6"}));
+    none.add_option("FAMILY", words.address, "4 or 6")->required()->check(choice({"4", "6"}));
     none.callback([&words] { flush(words.name, words.address); });
 }
 

@@ -2,6 +2,7 @@
 #include "errors.h"
 #include "interfaces.h"
 #include "objects.h"
+#include "words.h"
 
 #include <algorithm>
 #include <cstdio>
@@ -72,8 +73,8 @@ void add_block(CLI::App &object, const global_options &options) {
     change.add_option("IF", words.name, "interface")->required();
     change.add_option("REASON", words.reason, "ha, aha, virtual or orlena")
         ->required()
-        ->check(CLI::IsMember({"ha", "aha", "virtual", "orlena"}));
-    change.add_option("STATE", words.state, "on or off")->required()->check(CLI::IsMember({"on", "off"}));
+        ->check(choice({"ha", "aha", "virtual", "orlena"}));
+    change.add_option("STATE", words.state, "on or off")->required()->check(choice({"on", "off"}));
     change.callback([&words] { set(words.name, words.reason, words.state == "on"); });
 }
 

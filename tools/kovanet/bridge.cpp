@@ -4,6 +4,7 @@
 #include "errors.h"
 #include "lists.h"
 #include "objects.h"
+#include "words.h"
 
 #include <cstdio>
 #include <kovanetsdk/bridge.h>
@@ -257,7 +258,7 @@ void add_bridge(CLI::App &object, const global_options &options) {
         .add_option("none|master|local-lan|slave", words.role,
                     "no part, a bridge, the bridge of the local LAN, or a port")
         ->required()
-        ->check(CLI::IsMember({"none", "master", "local-lan", "slave"}));
+        ->check(choice({"none", "master", "local-lan", "slave"}));
     change.add_option("PRIMARY|BRIDGE static ADDRESS/LENGTH|dhcp", words.rest,
                       "of a bridge its first port, of a port its bridge; then, if it changes, where the IPv4 address "
                       "comes from");

@@ -3,6 +3,7 @@
 #include "interfaces.h"
 #include "objects.h"
 #include "rules.h"
+#include "words.h"
 
 #include <cstdio>
 #include <kovanetsdk/addr.h>
@@ -208,10 +209,9 @@ void add_card(CLI::App &object, const global_options &options) {
     change.add_option("IF", words.name, "interface")->required();
     change.add_option("static|dhcp", words.source, "a fixed address, or from a DHCP server")
         ->required()
-        ->check(CLI::IsMember({"static", "dhcp"}));
+        ->check(choice({"static", "dhcp"}));
     change.add_option("ADDRESS[/LENGTH]", words.address, "address with its prefix length, or followed by its mask");
-    auto *mask_key = change.add_option("mask", words.keyword, "the word mask")->check(CLI::IsMember({"mask"}));
-    mask_key->needs(change.add_option("MASK", words.mask, "dotted mask"));
+    add_keyword(change, "mask", words.keyword, "MASK", words.mask, "dotted mask, unless there is a LENGTH");
     change.callback([&words] { set(words); });
 }
 

@@ -3,6 +3,7 @@
 #include "objects.h"
 #include "rules.h"
 #include "table.h"
+#include "words.h"
 
 #include <cstdio>
 
@@ -69,8 +70,7 @@ void add_check(CLI::App &object, const global_options &options) {
     auto &words = words_of<check_words>();
     CLI::App &address = *object.add_subcommand("address", "an IPv4 address of a host, alone or with its mask");
     address.add_option("ADDRESS", words.value)->required();
-    auto *mask_key = address.add_option("mask", words.keyword, "the word mask")->check(CLI::IsMember({"mask"}));
-    mask_key->needs(address.add_option("MASK", words.mask, "dotted mask"));
+    add_keyword(address, "mask", words.keyword, "MASK", words.mask, "dotted mask");
     address.callback([&words, &options] { check_address(words, options.json); });
 
     add_plain(object, options, "mask", "an IPv4 mask", "MASK", refuse_mask);

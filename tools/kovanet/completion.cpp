@@ -40,7 +40,7 @@ void add_choices_of(const std::string &word, texts &candidates) {
 
 /** The choices of a word: those of its name ("static|dhcp"), and those it is checked against ("TEXT:{4,6}"). */
 void add_choices(const CLI::Option &option, texts &candidates) {
-    for (const std::string &part : CLI::detail::split(option.get_name(true), ' ')) {
+    for (const std::string &part : CLI::detail::split(option.get_single_name(), ' ')) {
         for (const std::string &word : CLI::detail::split(part, '|')) {
             add_choices_of(word, candidates);
         }

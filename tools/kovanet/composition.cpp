@@ -3,6 +3,7 @@
 #include "errors.h"
 #include "lists.h"
 
+#include <csignal>
 #include <cstdio>
 #include <kova/core.h>
 #include <kovanetsdk/addr.h>
@@ -24,6 +25,15 @@ std::string key_of(const std::string &name, const char *key) {
     return KLIBCFileGetKeyValue(file_of(name).c_str(), key, value, sizeof value, 0) > 0 ? value : "";
 }
 
+/** From now on Ctrl-C ends the programs that are run, but leaves it to the library to put right what they have begun.
+ */
+void outlive_interrupts() {
+    struct sigaction action {};
+    action.sa_handler = [](int) {}; // ignored, it would be for these programs, too
+    action.sa_flags = SA_RESTART;
+    sigaction(SIGINT, &action, nullptr);
+}
+
 } // namespace
 
 change_lock::change_lock() {
@@ -32,6 +42,7 @@ change_lock::change_lock() {
     if (KLIBCFileLockTimeByFile(kFolder, kExclusive, kWaitSeconds, &fd_) < 0) {
         call_failed("cannot lock the interfaces");
     }
+    outlive_interrupts();
 }
 
 change_lock::~change_lock() {

@@ -1,6 +1,7 @@
 // kovanet dhcp-server pxe: what clients are told that boot from the network.
 #include "dhcp_server.h"
 #include "rules.h"
+#include "words.h"
 
 #include <cstdio>
 #include <kovanetsdk/dhcp.h>
@@ -96,7 +97,7 @@ void add_pxe_verbs(CLI::App &object, const global_options &options) {
     CLI::App &change = add_change(all, "set", "answer them: they boot from here, or from another server");
     change.add_option("local|remote", words.mode, "this machine, or another server")
         ->required()
-        ->check(CLI::IsMember({"local", "remote"}));
+        ->check(choice({"local", "remote"}));
     change.add_option("FILE|SERVER", words.file_or_server, "boot file on this machine, or address of the server")
         ->required();
     change.add_option("FILE", words.file, "boot file on the server");

@@ -4,6 +4,7 @@
 #include "dhcp_files.h"
 #include "records.h"
 #include "rules.h"
+#include "words.h"
 
 #include <algorithm>
 #include <cstdio>
@@ -165,8 +166,7 @@ CLI::App &add_switch(CLI::App &object, const char *name, const char *description
     auto &words = words_of<server_words>();
     CLI::App &verb = add_change(object, name, description);
     verb.add_option("IF", words.ifname, "interface")->required();
-    verb.add_option("4|6", words.family_word, "IPv4, which is meant without it, or IPv6")
-        ->check(CLI::IsMember({"4", "6"}));
+    verb.add_option("4|6", words.family_word, "IPv4, which is meant without it, or IPv6")->check(choice({"4", "6"}));
     return verb;
 }
 

@@ -262,11 +262,10 @@ void take_v6_keys(const given_keys &keys, subnet &one) {
 void require_needed(const given_keys &keys, const subnet_id &id, presence found) {
     const std::vector<std::string> needed = id.type == kIPv4 ? std::vector<std::string>{"range", "mask", "router"}
                                                              : std::vector<std::string>{"mode", "dns"};
-    for (const std::string &key : needed) {
-        if (!keys.contains(key)) {
-            bad_usage((found == presence::absent ? "a new subnet needs " : "the subnet cannot be read and needs ") +
-                      key);
-        }
+    const auto is_given = [&keys](const std::string &key) { return keys.contains(key); };
+    if (!std::all_of(needed.begin(), needed.end(), is_given)) {
+        bad_usage((found == presence::absent ? "a new subnet needs " : "the subnet cannot be read and needs ") +
+                  CLI::detail::join(needed, ", "));
     }
 }
 
@@ -358,8 +357,7 @@ void switch_off(const subnet_id &id) {
 
 void add_family_word(CLI::App &verb, subnet_words &words) {
     verb.validate_positionals(); // a key may stand in its place
-    verb.add_option("4|6", words.family_word, "IPv4, which is meant without it, or IPv6")
-        ->check(CLI::IsMember({"4", "6"}));
+    verb.add_option("4|6", words.family_word, "IPv4, which is meant without it, or IPv6")->check(choice({"4", "6"}));
 }
 
 } // namespace

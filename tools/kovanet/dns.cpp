@@ -5,6 +5,7 @@
 #include "objects.h"
 #include "records.h"
 #include "rules.h"
+#include "words.h"
 
 #include <kova/core.h>
 #include <kovanetsdk/dns.h>
@@ -95,7 +96,7 @@ void add_dns(CLI::App &object, const global_options &options) {
     CLI::App &mode = *object.add_subcommand("mode", "use the configured servers, or those the network tells");
     mode.add_option("static|auto", words.mode, "the configured servers, or those learnt by DHCP and from routers")
         ->required()
-        ->check(CLI::IsMember({"static", "auto"}));
+        ->check(choice({"static", "auto"}));
     mode.callback([&words] { set_mode(words.mode); });
 
     object.add_subcommand("update", "make /etc/resolv.conf again from the servers of the mode")->callback(update);

@@ -3,6 +3,7 @@
 #include "confirm.h"
 #include "errors.h"
 #include "objects.h"
+#include "words.h"
 
 #include <arpa/inet.h>
 #include <kova/core.h>
@@ -299,11 +300,9 @@ void add_ipv6(CLI::App &object, const global_options &options) {
                     "from routers, none, from a DHCPv6 server, fixed, or "
                     "from routers with name servers from a DHCPv6 server")
         ->required()
-        ->check(CLI::IsMember({"auto", "off", "dhcp", "static", "auto_dhcp"}));
+        ->check(choice({"auto", "off", "dhcp", "static", "auto_dhcp"}));
     change.add_option("ADDRESS/LENGTH", words.address, "static: address with its prefix length");
-    auto *gateway_key =
-        change.add_option("gateway", words.keyword, "the word gateway")->check(CLI::IsMember({"gateway"}));
-    gateway_key->needs(change.add_option("GATEWAY", words.gateway, "static: default router"));
+    add_keyword(change, "gateway", words.keyword, "GATEWAY", words.gateway, "static: default router");
     add_yes(change, words.is_confirmed);
     change.callback([&words] { set(words); });
 

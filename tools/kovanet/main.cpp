@@ -1,6 +1,7 @@
 // kovanet: the appliance's network for a person at a terminal and for scripts.
 #include "completion.h"
 #include "errors.h"
+#include "help.h"
 #include "objects.h"
 #include "table.h"
 #include "words.h"
@@ -50,7 +51,8 @@ constexpr object kObjects[] = {
      "  kovanet link show\n"
      "  kovanet link down eth1\n"
      "  kovanet link rename eth1 lan0\n"
-     "  kovanet link up lan0"},
+     "  kovanet link up lan0\n"
+     "  kovanet link watch"},
     {"addr", "IPv4 and IPv6 addresses as they are now", add_addr,
      "  kovanet addr list eth0\n"
      "  kovanet addr add eth0 2001:db8::10/64\n"
@@ -86,6 +88,7 @@ constexpr object kObjects[] = {
      "  kovanet bond delete bond0"},
     {"bridge", "bridges and their ports", add_bridge,
      "  kovanet bridge list\n"
+     "  kovanet bridge show eth0\n"
      "  kovanet bridge set br0 master eth0 dhcp\n"
      "  kovanet bridge set eth0 slave br0\n"
      "  kovanet bridge set lbr0 local-lan wlan0 static 192.168.2.1/24\n"
@@ -94,7 +97,8 @@ constexpr object kObjects[] = {
      "  kovanet ipv6 show\n"
      "  kovanet ipv6 set eth0 auto\n"
      "  kovanet ipv6 set eth0 static 2001:db8::10/64 gateway fe80::1\n"
-     "  kovanet ipv6 set eth0 off --yes"},
+     "  kovanet ipv6 set eth0 off --yes\n"
+     "  kovanet ipv6 init"},
     {"mtu", "largest packets of the interfaces", add_mtu,
      "  kovanet mtu show\n"
      "  kovanet mtu set eth0 9000\n"
@@ -103,6 +107,7 @@ constexpr object kObjects[] = {
      "  kovanet pppoe set eth0 user alice@provider default-route on\n"
      "  kovanet pppoe set eth0 user alice@provider --password-file /root/secret\n"
      "  kovanet pppoe set eth0 mtu 1400 --keep-password\n"
+     "  kovanet pppoe show\n"
      "  kovanet pppoe start\n"
      "  kovanet pppoe status\n"
      "  kovanet pppoe stop"},
@@ -120,14 +125,28 @@ constexpr object kObjects[] = {
     {"dhcp-server", "the DHCP and router-advertisement server", add_dhcp_server,
      "  kovanet dhcp-server status\n"
      "  kovanet dhcp-server on\n"
+     "  kovanet dhcp-server off\n"
      "  kovanet dhcp-server enable eth0\n"
+     "  kovanet dhcp-server disable eth0 6\n"
+     "  kovanet dhcp-server restart\n"
      "  kovanet dhcp-server subnet list\n"
-     "  kovanet dhcp-server subnet set eth0 0 range 192.168.1.100 192.168.1.200 mask 255.255.255.0 router 192.168.1.1\n"
-     "  kovanet dhcp-server subnet set eth0 0 domain lan.example dns 192.168.1.1 192.168.1.2 lease 86400\n"
+     "  kovanet dhcp-server subnet show eth0 0\n"
+     "  kovanet dhcp-server subnet set eth0 0 range 192.168.1.100 192.168.1.200 \\\n"
+     "      mask 255.255.255.0 router 192.168.1.1\n"
+     "  kovanet dhcp-server subnet set eth0 0 domain lan.example lease 86400\n"
+     "  kovanet dhcp-server subnet set eth0 0 dns 192.168.1.1 192.168.1.2\n"
      "  kovanet dhcp-server subnet set eth0 0 6 mode ra-stateless dns 2001:db8::53\n"
+     "  kovanet dhcp-server subnet off eth0 0\n"
+     "  kovanet dhcp-server option list eth0 0\n"
      "  kovanet dhcp-server option set eth0 0 ntp-server 192.168.1.1 192.168.1.2\n"
+     "  kovanet dhcp-server option del eth0 0 ntp-server\n"
+     "  kovanet dhcp-server vendor list\n"
+     "  kovanet dhcp-server vendor show MSFT\n"
      "  kovanet dhcp-server vendor set MSFT 2 1i\n"
+     "  kovanet dhcp-server vendor del MSFT 2\n"
+     "  kovanet dhcp-server pxe show\n"
      "  kovanet dhcp-server pxe set remote 192.168.1.5 pxelinux.0\n"
+     "  kovanet dhcp-server pxe off\n"
      "  kovanet dhcp-server conflict eth1 192.168.1.10 192.168.1.20 255.255.255.0\n"
      "  kovanet dhcp-server test-client eth0"},
     {"conflict", "whether an address is somebody else's already", add_conflict,
@@ -158,28 +177,20 @@ constexpr object kObjects[] = {
      "  kovanet reach 2001:db8::1 22 --json"},
     {"tunnel", "the IPv6 tunnel through a tunnel broker", add_tunnel,
      "  kovanet tunnel set broker.example.net login alice\n"
-     "  kovanet tunnel set broker.example.net login alice --password-file /root/password\n"
+     "  kovanet tunnel set broker.example.net login alice \\\n"
+     "      --password-file /root/password\n"
      "  kovanet tunnel set broker.example.net anonymous\n"
      "  kovanet tunnel start\n"
      "  kovanet tunnel show\n"
-     "  kovanet tunnel stop"},
+     "  kovanet tunnel stop\n"
+     "  kovanet tunnel restart"},
     {"check", "whether a value is valid", add_check,
      "  kovanet check address 192.168.1.10 mask 255.255.255.0\n"
+     "  kovanet check mask 255.255.255.0\n"
      "  kovanet check prefix 192.168.1.0/24\n"
      "  kovanet check ipv6 2001:db8::1/64\n"
-     "  kovanet check hostname nas01"},
-};
-
-/** Help without the types of the words, which their descriptions tell better. */
-class help_format : public CLI::Formatter {
-public:
-    help_format() {
-        label("SUBCOMMAND", "COMMAND");
-        label("Positionals", "Words");
-    }
-    std::string make_option_opts(const CLI::Option *option) const override {
-        return option->get_positional() ? "" : Formatter::make_option_opts(option);
-    }
+     "  kovanet check hostname nas01\n"
+     "  kovanet check domain lan.example"},
 };
 
 /** Ends the program unless a word that may have been given is one of the commands below another. */
@@ -191,7 +202,9 @@ void require_known(const char *what, const char *word, const CLI::App &parent) {
     if (word == nullptr || known.empty() || std::find(known.begin(), known.end(), word) != known.end()) {
         return;
     }
-    throw failure{kUsage, std::string(what) + " \"" + word + "\" is not known" + suggestion(word, known)};
+    const std::string meant = suggestion(word, known);
+    throw failure{kUsage, std::string(what) + " \"" + word + "\" is not known" +
+                              (meant.empty() ? "; see " + whole_name(parent) + " --help" : meant)};
 }
 
 /** The first words that are no options: the object, the verb, and what may be a verb below that. */
@@ -244,7 +257,7 @@ void describe(CLI::App &app, global_options &options, const command_words &words
     app.require_subcommand(1);
     app.fallthrough(); // the global options may stand anywhere
     app.formatter(std::make_shared<help_format>());
-    app.set_help_flag("--help", "show this help");
+    app.set_help_flag("-h,--help", "show this help");
     app.set_version_flag("--version", kVersion, "show the version, and that of the JSON output");
     app.add_flag("--json", options.json, "output for programs");
     app.add_flag("--verbose", options.verbose, "show the library's log");
@@ -279,15 +292,55 @@ void complain(const std::string &text) {
     }
 }
 
+/** The command whose words were being read when the command line turned out to be wrong. */
+const CLI::App &last_command(const CLI::App &app) {
+    const CLI::App *command = &app;
+    while (!command->get_subcommands().empty()) {
+        command = command->get_subcommands().front();
+    }
+    return *command;
+}
+
+/** What an unknown option may have been meant to be. */
+std::string suggested_option(const std::string &word, const CLI::App &command) {
+    std::vector<std::string> known;
+    for (const CLI::App *at = &command; at != nullptr; at = at->get_parent()) {
+        for (const CLI::Option *option :
+             at->get_options([](const CLI::Option *each) { return each->nonpositional(); })) {
+            known.push_back(option->get_name());
+        }
+    }
+    return suggestion(word, known);
+}
+
+/** How the command line is wrong, as the library of the command line tells it or better. */
+std::string usage_complaint(const CLI::ParseError &error, const CLI::App &app) {
+    const std::string text = error.what();
+    for (const std::string &word : app.remaining(true)) {
+        if (word.starts_with('-')) {
+            return "option \"" + word + "\" is not known" + suggested_option(word, last_command(app));
+        }
+    }
+    if (error.get_exit_code() == static_cast<int>(CLI::ExitCodes::ExtrasError)) {
+        return "\"" + app.remaining(true).front() + "\" is one word too many";
+    }
+    if (error.get_name() == "RequiredError" && text.find("subcommand") != std::string::npos) {
+        return "the command is not complete";
+    }
+    if (const char kLacks[] = " requires "; text.starts_with(kLacks)) { // a keyword, whose name is hidden
+        return text.substr(sizeof kLacks - 1) + " is required";
+    }
+    if (error.get_exit_code() == static_cast<int>(CLI::ExitCodes::ConversionError)) {
+        return "\"" + text.substr(text.rfind(' ') + 1) + "\" is no number";
+    }
+    const size_t name_end = text.find(": \""); // of a word, and what is wrong with it
+    return name_end == std::string::npos || text.starts_with("--") ? text : text.substr(name_end + 2);
+}
+
 /** The command line is wrong: how, and where to read on. */
 void complain_of_usage(const CLI::ParseError &error, const CLI::App &app) {
-    std::string where = app.get_name();
-    for (const CLI::App *command = &app; !command->get_subcommands().empty();) {
-        command = command->get_subcommands().front();
-        where += " " + command->get_name();
-    }
-    const bool lacks_command = error.get_name() == "RequiredError" && strstr(error.what(), "subcommand") != nullptr;
-    complain((lacks_command ? "the command is not complete" : error.what()) + ("; see " + where) + " --help");
+    const std::string what = usage_complaint(error, app);
+    complain(what.ends_with('?') ? what : what + "; see " + whole_name(last_command(app)) + " --help");
 }
 
 /** kovanet --complete WORD...: for the shells. What cannot be told is no reason to disturb somebody who types. */

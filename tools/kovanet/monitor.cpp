@@ -4,6 +4,7 @@
 #include "link_changes.h"
 #include "objects.h"
 #include "table.h"
+#include "words.h"
 
 #include <cmath>
 #include <cstdio>
@@ -219,7 +220,7 @@ void add_monitor(CLI::App &object, const global_options &options) {
     auto &words = words_of<monitor_words>();
     object.add_option("--count", words.count, "end after N changes")
         ->option_text("N")
-        ->check(CLI::Range(1U, 1000000000U));
+        ->check(number_from(1, 1000000000));
     object.callback([&words, &options] { monitor(words, options.json); });
 }
 

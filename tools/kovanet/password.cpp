@@ -2,9 +2,11 @@
 
 #include "errors.h"
 #include "table.h"
+#include "words.h"
 
 #include <algorithm>
 #include <cerrno>
+#include <climits>
 #include <csignal>
 #include <cstdio>
 #include <cstring>
@@ -163,9 +165,10 @@ void read_file(const std::string &path, secret_bytes &secret) {
 } // namespace
 
 void add_password(CLI::App &command, password_words &words) {
-    auto *file = command.add_option(kFile, words.file, "file whose only line is the password");
+    auto *file = command.add_option(kFile, words.file, "file whose only line is the password")->type_name("FILE");
     auto *fd = command.add_option(kFd, words.fd, "open descriptor to read that line from; 0 is standard input")
-                   ->check(CLI::NonNegativeNumber)
+                   ->type_name("NUMBER")
+                   ->check(number_from(0, INT_MAX))
                    ->excludes(file);
     command.add_flag(kKeep, words.is_kept, "leave the stored password as it is")->excludes(file)->excludes(fd);
     command

@@ -2,6 +2,7 @@
 #include "errors.h"
 #include "objects.h"
 #include "table.h"
+#include "words.h"
 
 #include <algorithm>
 #include <cstdio>
@@ -84,23 +85,23 @@ void tell_whether_used(const ports_words &words, bool as_json) {
 
 void add_range(CLI::App &verb, ports_words &words, bool is_required) {
     CLI::Option &low = *verb.add_option("LOW", words.low, "lowest port, 0 to 65535");
-    low.required(is_required)->check(CLI::Range(0, kHighestPort));
-    verb.add_option("HIGH", words.high, "highest port")->check(CLI::Range(0, kHighestPort));
+    low.required(is_required)->check(number_from(0, kHighestPort));
+    verb.add_option("HIGH", words.high, "highest port")->check(number_from(0, kHighestPort));
 }
 
 } // namespace
 
 void add_ports(CLI::App &object, const global_options &options) {
     auto &words = words_of<ports_words>();
-    const CLI::IsMember protocols({"tcp", "udp"});
+    const CLI::Validator protocols = choice({"tcp", "udp"});
     CLI::App &listed = *object.add_subcommand("list", "the ports at which this machine listens");
-    listed.add_option("tcp|udp", words.protocol, "both if left out")->check(protocols);
+    listed.add_option("tcp|udp", words.protocol, "protocol, both if left out")->check(protocols);
     add_range(listed, words, false);
     listed.callback([&words, &options] { list(words, options.json); });
 
     CLI::App &used =
         *object.add_subcommand("used", "whether a port, or one of a range, is in use, listening or connected");
-    used.add_option("tcp|udp", words.protocol)->required()->check(protocols);
+    used.add_option("tcp|udp", words.protocol, "protocol")->required()->check(protocols);
     add_range(used, words, true);
     used.callback([&words, &options] { tell_whether_used(words, options.json); });
 }

@@ -3,6 +3,7 @@
 #include "errors.h"
 #include "lists.h"
 #include "objects.h"
+#include "words.h"
 
 #include <ctime>
 #include <kova/core.h>
@@ -191,7 +192,7 @@ void add_pppoe_relay(CLI::App &object, const global_options &options) {
     change.add_option("BRIDGE", words.name, "bridge of the local LAN")->required();
     change.add_option("on|off", words.state, "whether its clients are relayed")
         ->required()
-        ->check(CLI::IsMember({"on", "off"}));
+        ->check(choice({"on", "off"}));
     change.add_option("SERVER", words.server, "with on: the interface towards the PPPoE server");
     change.callback([&words] { set(words); });
 

@@ -2,6 +2,7 @@
 #include "errors.h"
 #include "objects.h"
 #include "table.h"
+#include "words.h"
 
 #include <charconv>
 #include <chrono>
@@ -72,8 +73,8 @@ void add_reach(CLI::App &object, const global_options &options) {
     auto &words = words_of<reach_words>();
     object.add_option("HOST", words.host, "name or address")->required();
     object.add_option("PORT", words.port, "TCP port, 1 to 65535")->required();
-    auto *key = object.add_option("timeout", words.keyword, "the word timeout")->check(CLI::IsMember({"timeout"}));
-    key->needs(object.add_option("SECONDS", words.timeout, "how long each address of the host is waited for (5)"));
+    add_keyword(object, "timeout", words.keyword, "SECONDS", words.timeout,
+                "how long each address of the host is waited for (5)");
     object.callback([&words, &options] { tell(words, options.json); });
 }
 

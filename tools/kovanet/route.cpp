@@ -4,6 +4,7 @@
 #include "objects.h"
 #include "rules.h"
 
+#include <kova/core.h>
 #include <kovanetsdk/dhcp.h>
 #include <kovanetsdk/iface.h>
 #include <kovanetsdk/routing.h>
@@ -58,6 +59,10 @@ void edit(int type, const route_words &words) {
         result = NetRoutetableEdit(type, address.c_str(), network_of(*words.address).mask.c_str(), info.szIfname);
     } else {
         result = NetRoutetableHandler(type, info.szIfname);
+    }
+    if (result < 0 && !words.address && KLIBCErrGet() == 0) {
+        throw failure{kNo, words.name + " has no address in its file or lease; say which: kovanet route " +
+                               (type == NET_ROUTE_ADD ? "add " : "del ") + words.name + " ADDRESS/LENGTH"};
     }
     if (result < 0) {
         call_failed((type == NET_ROUTE_ADD ? "cannot add the route of " : "cannot delete the route of ") + words.name);

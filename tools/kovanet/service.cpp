@@ -2,6 +2,7 @@
 #include "errors.h"
 #include "objects.h"
 #include "table.h"
+#include "words.h"
 
 #include <algorithm>
 #include <iterator>
@@ -61,8 +62,8 @@ void add_service(CLI::App &object, const global_options &) {
     tell.add_option("CHANGES", words.changes, "ip, hostname, mtu, or several with commas between them")
         ->required()
         ->check(complaint_about);
-    auto *action_key = tell.add_option("action", words.keyword, "the word action")->check(CLI::IsMember({"action"}));
-    action_key->needs(tell.add_option("NUMBER", words.action, "what they are to do, as their plug-ins understand it"));
+    add_keyword(tell, "action", words.keyword, "NUMBER", words.action,
+                "what they are to do, as their plug-ins understand it");
     tell.callback([&words] { notify(words); });
 }
 

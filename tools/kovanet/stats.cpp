@@ -3,6 +3,7 @@
 #include "interfaces.h"
 #include "interrupt.h"
 #include "objects.h"
+#include "words.h"
 
 #include <algorithm>
 #include <cmath>
@@ -184,7 +185,7 @@ void add_stats(CLI::App &object, const global_options &options) {
                         ->check(refuse_seconds);
     object.add_option("--count", words.count, "end after N times")
         ->option_text("N")
-        ->check(CLI::Range(1U, 1000000000U))
+        ->check(number_from(1, 1000000000))
         ->needs(watched);
     object.callback([&words, watched, &options] { show(words, watched->count() > 0, options.json); });
 }

@@ -2,6 +2,7 @@
 #include "composition.h"
 #include "errors.h"
 #include "objects.h"
+#include "words.h"
 
 #include <cstdio>
 #include <kovanetsdk/bridge.h>
@@ -103,13 +104,11 @@ struct topology_words {
 void add_topology(CLI::App &object, const global_options &options) {
     auto &words = words_of<topology_words>();
     CLI::App &one = *object.add_subcommand("show", "the current topology, or what another one is");
-    one.add_option("TOPOLOGY", words.shown, "client, bridge or router")->check(CLI::IsMember(topology_names()));
+    one.add_option("TOPOLOGY", words.shown, "client, bridge or router")->check(choice(topology_names()));
     one.callback([&words, &options] { show(words.shown, options.json); });
 
     CLI::App &change = *object.add_subcommand("set", "store another topology; the interfaces stay as they are");
-    change.add_option("TOPOLOGY", words.name, "client, bridge or router")
-        ->required()
-        ->check(CLI::IsMember(topology_names()));
+    change.add_option("TOPOLOGY", words.name, "client, bridge or router")->required()->check(choice(topology_names()));
     change.callback([&words] { set(words.name); });
 }
 

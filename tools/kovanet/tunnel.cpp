@@ -5,6 +5,7 @@
 #include "password.h"
 #include "rules.h"
 #include "table.h"
+#include "words.h"
 
 #include <algorithm>
 #include <kova/core.h>
@@ -200,7 +201,7 @@ void add_tunnel(CLI::App &object, const global_options &options) {
     change.add_option("SERVER", words.server, "tunnel broker, HOST or HOST:PORT")->required();
     change.add_option("LOGIN", words.login, "anonymous, or login and the user")
         ->required()
-        ->check(CLI::IsMember({"anonymous", "login"}));
+        ->check(choice({"anonymous", "login"}));
     change.add_option("USER", words.user, "user name at the broker");
     add_password(change, words.password);
     change.callback([&words] { set(words); });

@@ -3,6 +3,7 @@
 #include "confirm.h"
 #include "errors.h"
 #include "objects.h"
+#include "words.h"
 
 #include <cstring>
 #include <kova/core.h>
@@ -233,7 +234,7 @@ void add_vlan(CLI::App &object, const global_options &options) {
     make.add_option("static|dhcp|keep", words.source,
                     "a fixed address, one from a DHCP server, or what the interface has")
         ->required()
-        ->check(CLI::IsMember({"static", "dhcp", "keep"}));
+        ->check(choice({"static", "dhcp", "keep"}));
     make.add_option("ADDRESS/LENGTH", words.address, "the fixed address with its prefix length");
     add_yes(make, words.is_confirmed);
     make.callback([&words] { create(words); });

@@ -1,6 +1,7 @@
 #include "words.h"
 
 #include <algorithm>
+#include <charconv>
 #include <numeric>
 #include <utility>
 
@@ -30,6 +31,34 @@ std::string suggestion(const std::string &word, const std::vector<std::string> &
     });
     const bool is_close = nearest != names.end() && distance(word, *nearest) <= kClose;
     return is_close ? "; did you mean " + *nearest + "?" : "";
+}
+
+CLI::Validator choice(const std::vector<std::string> &names) {
+    const std::string all = CLI::detail::join(names, ", ");
+    const auto complaint = [names, all](const std::string &word) {
+        const bool is_known = std::find(names.begin(), names.end(), word) != names.end();
+        return is_known ? "" : "\"" + word + "\" is none of " + all + suggestion(word, names);
+    };
+    return {complaint, "{" + CLI::detail::join(names, ",") + "}"};
+}
+
+CLI::Validator number_from(int least, int most) {
+    const std::string limits = "from " + std::to_string(least) + " to " + std::to_string(most);
+    const auto complaint = [least, most, limits](const std::string &word) {
+        int number = 0;
+        const char *const end = word.data() + word.size();
+        const auto [stop, error] = std::from_chars(word.data(), end, number);
+        const bool is_valid = error == std::errc{} && stop == end && number >= least && number <= most;
+        return is_valid ? "" : "\"" + word + "\" is no number " + limits;
+    };
+    return {complaint, "NUMBER"};
+}
+
+CLI::Validator keyword_before(const std::string &word, const std::string &value_name) {
+    const auto complaint = [word, value_name](const std::string &given) {
+        return given == word ? "" : "\"" + given + "\" is not expected here: write " + word + " " + value_name;
+    };
+    return {complaint, "{" + word + "}"};
 }
 
 } // namespace kova
