@@ -148,7 +148,7 @@ DEVIATIONS = {
                   "addr add 2001:db8:30::1/64 dev br7 nodad",
                   [("ifcfg-br7", "TYPE", "bridge", "none"), ("ifcfg-br7", "PRIMARY", "bond7", "none"),
                    ("ifcfg-bond7", "BRIDGE", "br7", "none")]),
-    "bond option": ("link set bond7 type bond updelay 300 lacp_rate slow",
+    "bond option": ("link set bond7 down\nlink set bond7 type bond updelay 300 lacp_rate slow\nlink set bond7 up",
                     [("ifcfg-bond7", "BONDING_OPTS", "updelay=100", "updelay=300"),
                      ("ifcfg-bond7", "BONDING_OPTS", "lacp_rate=fast", "lacp_rate=slow")]),
     "VLAN": ("link del row0.10", [("ifcfg-row0.10", "DEVICE", "row0.10", "none")]),
