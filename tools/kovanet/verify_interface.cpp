@@ -235,15 +235,11 @@ private:
 
     static std::string or_none(const std::string &text) { return text.empty() ? "none" : text; }
 
-    /** A client asks as long as there is no lease, and what it got is what the interface has. */
+    /** As long as there is no lease the client asks, and an earlier address may stay. */
     void compare_lease() {
         const std::string lease = "/etc/dhclient/ipv4/dhcpcd-" + name_ + ".info";
         const std::string leased = is_yes(lease, "OFFER") ? "" : value_of(lease, "IPADDR");
-        if (!job_runs("dhcp-client,IFACE=" + name_)) {
-            add("BOOTPROTO", "dhcp", "no client");
-        } else {
-            add("BOOTPROTO", "dhcp", leased.empty() && *info_.szIP != '\0' ? info_.szIP : "dhcp");
-        }
+        add("BOOTPROTO", "dhcp", job_runs("dhcp-client,IFACE=" + name_) ? "dhcp" : "no client");
         if (!leased.empty()) {
             result_.add(lease, "IPADDR", leased, info_.szIP);
             result_.add(lease, "NETMASK", value_of(lease, "NETMASK"), *info_.szIP != '\0' ? info_.szMask : "");
