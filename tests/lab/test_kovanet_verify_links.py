@@ -36,18 +36,13 @@ def machine(keep):
     shutil.rmtree("/etc/dhcpd", ignore_errors=True)
 
 
+# every command of a line behind the one before
 CHANGES = {
-    "VLAN": ["vlan create lan0 10 static 10.10.0.7/24 --yes"],
-    "VLAN with the settings of its interface": ["ipv6 set lan0 static 2001:db8:9::7/64 --yes",
-                                                "vlan create lan0 10 keep --yes"],
-    "no VLAN": ["vlan create lan0 10 keep --yes", "vlan remove lan0.10 --yes"],
+    "VLAN": ["ipv6 set lan0 static 2001:db8:9::7/64 --yes", "vlan create lan0 10 keep --yes", "vlan remove lan0.10 --yes"],
     "VLAN without a lease": ["vlan create lan0 10 dhcp --yes"],
-    "bond": ["bond create bond0 active-backup lan0 lan1 --yes"],
-    "bond with IPv6 and an MTU": ["mtu set lan0 1400 --yes", "ipv6 set lan0 auto --yes",
-                                  "bond create bond0 802.3ad lan0 lan1 --yes"],
-    "another bond": ["bond create bond0 balance-rr lan0 lan1 --yes", "bond change bond0 802.3ad --yes"],
-    "no bond": ["bond create bond0 802.3ad lan0 lan1 --yes", "bond delete bond0 --yes"],
-    "VLAN on a bond": ["bond create bond0 active-backup lan0 lan1 --yes", "vlan create bond0 30 static 10.30.0.7/24 --yes"],
+    "bond": ["mtu set lan0 1400 --yes", "ipv6 set lan0 auto --yes", "bond create bond0 802.3ad lan0 lan1 --yes",
+             "bond change bond0 active-backup --yes", "vlan create bond0 30 static 10.30.0.7/24 --yes",
+             "vlan remove bond0.30 --yes", "bond delete bond0 --yes"],
 }  # fmt: skip
 
 
@@ -55,7 +50,7 @@ CHANGES = {
 def test_verify_agrees_behind_a_change(what):
     for words in CHANGES[what]:
         kovanet(*words.split(), timeout=300)
-    expect_agreement()
+        expect_agreement()
 
 
 def test_verify_agrees_with_a_bond_that_takes_over_a_lease(tmp_path):
@@ -71,49 +66,46 @@ def test_verify_agrees_with_a_bond_that_takes_over_a_lease(tmp_path):
 # ---- PPPoE ----------------------------------------------------------------------------------------------------------
 
 
-@pytest.fixture
-def connection(tmp_path):
-    """Up, with the default route."""
+def kill(program):
+    for pid in processes(program):
+        os.kill(pid, signal.SIGKILL)
+
+
+def test_a_connection(tmp_path):
+    """With the default route, up, then in every way not what is stored."""
     with PppoeServer(tmp_path):
         kovanet("gateway", "set", "192.168.50.1")
         kovanet("pppoe", "set", "eth0", "user", USER, "mtu", "1400", "default-route", "on", "--password-fd", "0",
                 input=f"{PASSWORD}\n")  # fmt: skip
         kovanet("pppoe", "start", timeout=300)
-        yield
+        expect_agreement()
+
+        kovanet("pppoe", "set", "lan1", "--keep-password")
+        assert differences() == [(str(CONF), "ETH", "lan1", "eth0")]
+        kovanet("pppoe", "set", "eth0", "--keep-password")
+        run("ip", "route", "replace", "default", "via", "10.9.0.1", "dev", "lan0")
+        assert differences() == [(str(CONF), "DEFAULTROUTE", "yes", "no")]
+        run("ip", "route", "replace", "default", "dev", "ppp0")
+        expect_agreement()
+        wanted = KOVAINFO.read_text()
+        KOVAINFO.write_text(wanted.replace('pppoe_enable="yes"', 'pppoe_enable="no"'))
+        assert differences() == [(str(KOVAINFO), "pppoe_enable", "no", "yes")]
+        KOVAINFO.write_text(wanted)
+
+        kill("/usr/sbin/pppd plugin pppoe.so")
+        wait_for(lambda: not pathlib.Path("/sys/class/net/ppp0").exists(), what="the loss")
+        assert (str(KOVAINFO), "pppoe_enable", "yes", "dialling") in differences()
+        kill("/usr/sbin/pppoe-connect")
+        assert (str(KOVAINFO), "pppoe_enable", "yes", "no client") in differences()
         kovanet("pppoe", "stop", timeout=60)
         wait_for(nothing_is_left, what="the end of the connection")
+        assert differences() == [(str(NETWORK), "GATEWAY", "192.168.50.1", "none")], "who was killed gave nothing back"
 
-
-def test_a_connection_takes_the_place_of_the_gateway(connection):
-    expect_agreement()
-    run("ip", "route", "replace", "default", "via", "10.9.0.1", "dev", "lan0")
-    assert differences() == [(str(CONF), "DEFAULTROUTE", "yes", "no")]
-    run("ip", "route", "replace", "default", "dev", "ppp0")
-    kovanet("pppoe", "stop", timeout=60)
-    expect_agreement()
-
-
-def test_a_connection_on_another_interface(connection):
-    kovanet("pppoe", "set", "lan1", "--keep-password")
-    assert differences() == [(str(CONF), "ETH", "lan1", "eth0")]
-
-
-def test_a_connection_that_is_not_wanted_or_not_there(connection):
-    switch = KOVAINFO.read_text()
-    KOVAINFO.write_text(switch.replace('pppoe_enable="yes"', 'pppoe_enable="no"'))
-    assert differences() == [(str(KOVAINFO), "pppoe_enable", "no", "yes")]
-    KOVAINFO.write_text(switch)
-    expect_agreement()
-    for pid in processes("/usr/sbin/pppoe-connect"):
-        os.kill(pid, signal.SIGKILL)
-    assert (str(KOVAINFO), "pppoe_enable", "yes", "no client") in differences()
-
-
-def test_a_connection_that_is_lost(connection):
-    for pid in processes("/usr/sbin/pppd plugin pppoe.so"):
-        os.kill(pid, signal.SIGKILL)
-    wait_for(lambda: not pathlib.Path("/sys/class/net/ppp0").exists(), what="the loss")
-    assert (str(KOVAINFO), "pppoe_enable", "yes", "dialling") in differences()
+        kovanet("pppoe", "start", timeout=300)
+        expect_agreement()
+        kovanet("gateway", "set", "192.168.50.1")
+        kovanet("pppoe", "stop", timeout=60)
+        expect_agreement()
 
 
 # ---- its relays -----------------------------------------------------------------------------------------------------

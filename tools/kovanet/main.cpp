@@ -50,7 +50,8 @@ constexpr object kObjects[] = {
      "  kovanet link show\n"
      "  kovanet link down eth1\n"
      "  kovanet link rename eth1 lan0\n"
-     "  kovanet link up lan0"},
+     "  kovanet link up lan0\n"
+     "  kovanet link watch"},
     {"addr", "IPv4 and IPv6 addresses as they are now", add_addr,
      "  kovanet addr list eth0\n"
      "  kovanet addr add eth0 2001:db8::10/64\n"
@@ -88,13 +89,15 @@ constexpr object kObjects[] = {
      "  kovanet bridge list\n"
      "  kovanet bridge set br0 master eth0 dhcp\n"
      "  kovanet bridge set eth0 slave br0\n"
+     "  kovanet bridge show br0\n"
      "  kovanet bridge set lbr0 local-lan wlan0 static 192.168.2.1/24\n"
      "  kovanet bridge set eth0 none dhcp --yes"},
     {"ipv6", "how the interfaces get their IPv6 addresses", add_ipv6,
      "  kovanet ipv6 show\n"
      "  kovanet ipv6 set eth0 auto\n"
      "  kovanet ipv6 set eth0 static 2001:db8::10/64 gateway fe80::1\n"
-     "  kovanet ipv6 set eth0 off --yes"},
+     "  kovanet ipv6 set eth0 off --yes\n"
+     "  kovanet ipv6 init"},
     {"mtu", "largest packets of the interfaces", add_mtu,
      "  kovanet mtu show\n"
      "  kovanet mtu set eth0 9000\n"
@@ -103,6 +106,7 @@ constexpr object kObjects[] = {
      "  kovanet pppoe set eth0 user alice@provider default-route on\n"
      "  kovanet pppoe set eth0 user alice@provider --password-file /root/secret\n"
      "  kovanet pppoe set eth0 mtu 1400 --keep-password\n"
+     "  kovanet pppoe show\n"
      "  kovanet pppoe start\n"
      "  kovanet pppoe status\n"
      "  kovanet pppoe stop"},
@@ -125,11 +129,23 @@ constexpr object kObjects[] = {
      "  kovanet dhcp-server subnet set eth0 0 range 192.168.1.100 192.168.1.200 mask 255.255.255.0 router 192.168.1.1\n"
      "  kovanet dhcp-server subnet set eth0 0 domain lan.example dns 192.168.1.1 192.168.1.2 lease 86400\n"
      "  kovanet dhcp-server subnet set eth0 0 6 mode ra-stateless dns 2001:db8::53\n"
+     "  kovanet dhcp-server subnet show eth0 0 6\n"
+     "  kovanet dhcp-server subnet off eth0 0 6\n"
      "  kovanet dhcp-server option set eth0 0 ntp-server 192.168.1.1 192.168.1.2\n"
+     "  kovanet dhcp-server option list eth0 0\n"
+     "  kovanet dhcp-server option del eth0 0 ntp-server\n"
      "  kovanet dhcp-server vendor set MSFT 2 1i\n"
+     "  kovanet dhcp-server vendor list\n"
+     "  kovanet dhcp-server vendor show MSFT\n"
+     "  kovanet dhcp-server vendor del MSFT 2\n"
      "  kovanet dhcp-server pxe set remote 192.168.1.5 pxelinux.0\n"
+     "  kovanet dhcp-server pxe show\n"
+     "  kovanet dhcp-server pxe off\n"
+     "  kovanet dhcp-server restart\n"
      "  kovanet dhcp-server conflict eth1 192.168.1.10 192.168.1.20 255.255.255.0\n"
-     "  kovanet dhcp-server test-client eth0"},
+     "  kovanet dhcp-server test-client eth0\n"
+     "  kovanet dhcp-server disable eth0\n"
+     "  kovanet dhcp-server off"},
     {"conflict", "whether an address is somebody else's already", add_conflict,
      "  kovanet conflict address eth0 192.168.1.20\n"
      "  kovanet conflict bond bond0"},
@@ -162,12 +178,15 @@ constexpr object kObjects[] = {
      "  kovanet tunnel set broker.example.net anonymous\n"
      "  kovanet tunnel start\n"
      "  kovanet tunnel show\n"
+     "  kovanet tunnel restart\n"
      "  kovanet tunnel stop"},
     {"check", "whether a value is valid", add_check,
      "  kovanet check address 192.168.1.10 mask 255.255.255.0\n"
+     "  kovanet check mask 255.255.255.0\n"
      "  kovanet check prefix 192.168.1.0/24\n"
      "  kovanet check ipv6 2001:db8::1/64\n"
-     "  kovanet check hostname nas01"},
+     "  kovanet check hostname nas01\n"
+     "  kovanet check domain example.com"},
 };
 
 /** Help without the types of the words, which their descriptions tell better. */
