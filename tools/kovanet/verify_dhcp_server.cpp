@@ -1,7 +1,6 @@
 // kovanet verify: what the DHCP and router-advertisement server is to serve, and what the running one serves.
-#include "verify.h"
-
 #include "dhcp_files.h"
+#include "verify.h"
 
 #include <algorithm>
 #include <fstream>
@@ -62,27 +61,42 @@ std::string listening_state(const subnet_id &subnet, const std::string &ranges) 
     return only_advertises || KOVANetIsPortRangeUsed(port, port, kUdp) == 1 ? "yes" : "not listening";
 }
 
+bool is_interface_on(const subnet_id &subnet) {
+    return DHCPInterfaceIsEnabled(subnet.ifname.c_str(), subnet.type) == 1;
+}
+
+bool is_wanted(const subnet_id &subnet) {
+    return is_interface_on(subnet) && is_yes(kFolder + fragment_of(subnet) + ".info", kEnable);
+}
+
+/** The ranges in the file of a subnet. */
+std::string wanted_ranges(const subnet_id &subnet) {
+    range_lines lines = lines_of(subnet);
+    std::erase_if(lines, [](const std::string &line) { return !is_range(line); });
+    return joined(lines);
+}
+
 /** A subnet against the running server, under the switch that decides it. */
 void compare_subnet(comparison &result, const subnet_id &subnet, const fragments &served) {
     const std::string name = fragment_of(subnet);
-    const std::string interface_switch = name.substr(0, name.rfind("-subnet"));
-    const bool is_interface_on = DHCPInterfaceIsEnabled(subnet.ifname.c_str(), subnet.type) == 1;
-    const bool is_wanted = is_interface_on && is_yes(kFolder + name + ".info", kEnable);
+    const std::string decides = is_interface_on(subnet) ? name : name.substr(0, name.rfind("-subnet"));
     const auto found = served.find(name);
     const bool is_served = found != served.end();
-    const std::string ranges = is_served ? joined(found->second) : "";
-    result.add(kFolder + (is_interface_on ? name : interface_switch) + ".info", kEnable, yes_or_no(is_wanted),
-               is_wanted && is_served ? listening_state(subnet, ranges) : yes_or_no(is_served));
-    if (is_wanted && is_served) {
-        range_lines wanted = lines_of(subnet);
-        std::erase_if(wanted, [](const std::string &line) { return !is_range(line); });
-        result.add(kFolder + name + ".conf", "dhcp-range", joined(wanted), ranges);
+    if (!is_wanted(subnet) || !is_served) {
+        result.add(kFolder + decides + ".info", kEnable, yes_or_no(is_wanted(subnet)), yes_or_no(is_served));
+        return;
     }
+    const std::string ranges = joined(found->second);
+    result.add(kFolder + decides + ".info", kEnable, "yes", listening_state(subnet, ranges));
+    result.add(kFolder + name + ".conf", "dhcp-range", wanted_ranges(subnet), ranges);
 }
 
-bool is_to_be_served(const subnet_id &subnet) {
-    return DHCPInterfaceIsEnabled(subnet.ifname.c_str(), subnet.type) == 1 &&
-           is_yes(kFolder + fragment_of(subnet) + ".info", kEnable);
+/** Whether the service is on by its process; one that has nobody to serve needs none. */
+const char *service_state(bool is_on, bool runs, const std::vector<subnet_id> &subnets) {
+    if (runs || !is_on) {
+        return yes_or_no(runs);
+    }
+    return std::any_of(subnets.begin(), subnets.end(), is_wanted) ? "no server" : "yes";
 }
 
 } // namespace
@@ -91,9 +105,7 @@ void compare_dhcp_server(comparison &result) {
     const std::vector<subnet_id> subnets = subnets_there();
     const bool is_on = DHCPIsEnabled() == 1;
     const bool runs = KLIBCIsProcAlive(kServer) == 1;
-    // without a subnet there is nobody to serve
-    const bool is_idle = !runs && std::none_of(subnets.begin(), subnets.end(), is_to_be_served);
-    result.add(kService, kEnable, yes_or_no(is_on), is_on && is_idle ? "yes" : runs ? "yes" : is_on ? "no server" : "no");
+    result.add(kService, kEnable, yes_or_no(is_on), service_state(is_on, runs, subnets));
     if (!is_on || !runs) {
         return;
     }
@@ -101,8 +113,8 @@ void compare_dhcp_server(comparison &result) {
     for (const subnet_id &subnet : subnets) {
         compare_subnet(result, subnet, served);
     }
-    result.add(kFolder + kPxe + ".info", kEnable, yes_or_no(is_yes(kFolder + kPxe + ".info", kEnable)),
-               yes_or_no(served.contains(kPxe)));
+    const std::string pxe = kFolder + kPxe + ".info";
+    result.add(pxe, kEnable, yes_or_no(is_yes(pxe, kEnable)), yes_or_no(served.contains(kPxe)));
 }
 
 } // namespace kova

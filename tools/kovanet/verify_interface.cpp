@@ -1,9 +1,8 @@
 // kovanet verify: the files of the interfaces against the kernel and the clients that run for them.
-#include "verify.h"
-
 #include "composition.h"
 #include "errors.h"
 #include "records.h"
+#include "verify.h"
 
 #include <algorithm>
 #include <arpa/inet.h>
@@ -283,7 +282,8 @@ private:
             return "on";
         }
         if (asks_for_address != (mode == "dhcp") || asks_for_servers != (mode == "auto_dhcp")) {
-            return asks_for_address ? "dhcp" : asks_for_servers ? "auto_dhcp" : "no client";
+            const char *const no_address = asks_for_servers ? "auto_dhcp" : "no client";
+            return asks_for_address ? "dhcp" : no_address;
         }
         if (job_runs("ra-dns,IFACE=" + name_) != is_dynamic) {
             return is_dynamic ? "no listener for name servers" : "a listener for name servers";

@@ -1,7 +1,6 @@
 // kovanet verify: what belongs to the machine as a whole: host name, routes, name servers.
-#include "verify.h"
-
 #include "records.h"
+#include "verify.h"
 
 #include <arpa/inet.h>
 #include <bit>

@@ -1,15 +1,14 @@
 // kovanet verify: the services that a file switches on or off against their processes and interfaces.
+#include "records.h"
 #include "verify.h"
 
-#include "records.h"
-
+#include <algorithm>
 #include <filesystem>
 #include <fstream>
 #include <kova/core.h>
 #include <kova/service.h>
 #include <kovanetsdk/pppoe.h>
 #include <net/if.h>
-#include <sstream>
 #include <strings.h>
 
 namespace kova {
@@ -41,7 +40,8 @@ void compare_pppoe(comparison &result) {
         result.add(kKovaInfo, "pppoe_enable", "no", yes_or_no(has_client));
         return;
     }
-    result.add(kKovaInfo, "pppoe_enable", "yes", is_connected ? "yes" : has_client ? "dialling" : "no client");
+    const char *const unconnected = has_client ? "dialling" : "no client";
+    result.add(kKovaInfo, "pppoe_enable", "yes", is_connected ? "yes" : unconnected);
     if (is_connected) {
         result.add(kPppoe, "ETH", value_of(kPppoe, "ETH"), session_device());
     }
@@ -92,7 +92,7 @@ void compare_relays(comparison &result) {
 /** "yes" and "no", or the state between them. */
 std::string running_tunnel() {
     const std::string state = tunnel_state();
-    return state == "up" ? "yes" : state == "down" ? "no" : state;
+    return state == "connecting" ? state : yes_or_no(state == "up");
 }
 
 void compare_run_keys(comparison &result) {
