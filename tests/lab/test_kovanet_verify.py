@@ -43,6 +43,7 @@ def machine(keep):
         on_other_side("ip", "addr", "replace", f"{network}.1/24", "dev", card)
         write_file(card, network)
     run("/etc/rc.network", "start", "eth0", "lan0")
+    wait_for(lambda: not processes("/usr/kova/lib/resolver-update"), 30, "the end of the updates in the background")
     yield
     shutil.rmtree(DHCPD, ignore_errors=True)
     run("/etc/rc.network", "nat-restart-dhcp")

@@ -6,13 +6,30 @@
 #include "objects.h"
 
 #include <cstdio>
+#include <fstream>
 #include <kova/core.h>
+#include <sstream>
 
 namespace kova {
 namespace {
 
 std::string or_nothing(const std::string &text) {
     return text.empty() ? "none" : text;
+}
+
+/** When a process was started, "" without it: tells it from another one that was given its number later. */
+std::string start_of_process(const std::string &pid) {
+    constexpr int kFieldsBetween = 19;
+    std::ifstream file{"/proc/" + pid + "/stat"};
+    std::string line;
+    std::getline(file, line);
+    const size_t name_end = line.rfind(')'); // the name may hold anything
+    std::istringstream fields{name_end == std::string::npos ? "" : line.substr(name_end + 1)};
+    std::string start;
+    for (int i = 0; i <= kFieldsBetween; ++i) {
+        fields >> start;
+    }
+    return fields ? start : "";
 }
 
 constexpr column kColumns[] = {
@@ -70,6 +87,12 @@ std::string value_of(const std::string &file, const std::string &key) {
 
 bool is_yes(const std::string &file, const std::string &key) {
     return value_of(file, key) == "yes";
+}
+
+bool job_runs(const std::string &job_and_keys) {
+    std::ifstream record{"/run/kova/jobs/" + job_and_keys};
+    std::string pid, start;
+    return record >> pid >> start && KLIBCIsProcAlive(pid.c_str()) == 1 && start_of_process(pid) == start;
 }
 
 void add_verify(CLI::App &object, const global_options &options) {

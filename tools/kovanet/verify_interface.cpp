@@ -5,7 +5,6 @@
 #include "verify.h"
 
 #include <algorithm>
-#include <arpa/inet.h>
 #include <filesystem>
 #include <fstream>
 #include <kova/core.h>
@@ -49,77 +48,7 @@ std::string owner_of(const std::map<std::string, std::string> &all, const std::s
     return found == all.end() ? "" : found->second;
 }
 
-std::string first_word_in(const std::string &path) {
-    std::ifstream file{path};
-    std::string word;
-    file >> word;
-    return word;
-}
-
-/** The routers of an interface's IPv6 default routes. */
-std::vector<std::string> ipv6_routers(const std::string &name) {
-    constexpr char kAnywhere[] = "00000000000000000000000000000000";
-    std::vector<std::string> routers;
-    std::ifstream routes{"/proc/net/ipv6_route"};
-    std::string to, length, from, from_length, via, metric, references, uses, flags, device;
-    while (routes >> to >> length >> from >> from_length >> via >> metric >> references >> uses >> flags >> device) {
-        if (to == kAnywhere && length == "00" && via != kAnywhere && device == name) {
-            std::string text;
-            for (size_t at = 0; at < via.size(); at += 4) {
-                text += (at == 0 ? "" : ":") + via.substr(at, 4);
-            }
-            in6_addr binary{};
-            char shortest[INET6_ADDRSTRLEN] = "";
-            inet_pton(AF_INET6, text.c_str(), &binary);
-            routers.emplace_back(inet_ntop(AF_INET6, &binary, shortest, sizeof shortest));
-        }
-    }
-    return routers;
-}
-
-// ---- clients
-
-/** When a process was started, "" without it: tells it from another one that was given its number later. */
-std::string start_of_process(const std::string &pid) {
-    constexpr int kFieldsBetween = 19;
-    std::ifstream file{"/proc/" + pid + "/stat"};
-    std::string line;
-    std::getline(file, line);
-    const size_t name_end = line.rfind(')'); // the name may hold anything
-    std::istringstream fields{name_end == std::string::npos ? "" : line.substr(name_end + 1)};
-    std::string start;
-    for (int i = 0; i <= kFieldsBetween; ++i) {
-        fields >> start;
-    }
-    return fields ? start : "";
-}
-
-/** Whether a job runs, by the record that its start has left. */
-bool job_runs(const std::string &job_and_keys) {
-    std::ifstream record{"/run/kova/jobs/" + job_and_keys};
-    std::string pid, start;
-    return record >> pid >> start && KLIBCIsProcAlive(pid.c_str()) == 1 && start_of_process(pid) == start;
-}
-
 // ---- one interface
-
-/** The wanted text when it is among others, else those. */
-template<typename IsSame>
-std::string like(const std::string &wanted, const std::vector<std::string> &there, IsSame is_same) {
-    std::string all;
-    for (const std::string &one : there) {
-        if (is_same(one, wanted)) {
-            return wanted;
-        }
-        all += (all.empty() ? "" : " ") + one;
-    }
-    return all;
-}
-
-std::string in_lower_case(std::string text) {
-    std::transform(text.begin(), text.end(), text.begin(), [](unsigned char c) { return std::tolower(c); });
-    return text;
-}
 
 /** The settings of one interface's file against the kernel. */
 class interface_comparison {
@@ -147,7 +76,7 @@ public:
         }
         if (bond.empty() && bridge.empty()) { // a part of another has no addresses of its own
             compare_ipv4();
-            compare_ipv6();
+            compare_ipv6(result_, file_, info_);
         }
     }
 
@@ -212,8 +141,6 @@ private:
         }
     }
 
-    // ---- IPv4
-
     void compare_ipv4() {
         const ipv4_settings settings = settings_of(name_);
         if (settings.source == ipv4_settings::kDhcp) {
@@ -243,83 +170,6 @@ private:
             result_.add(lease, "IPADDR", leased, info_.szIP);
             result_.add(lease, "NETMASK", value_of(lease, "NETMASK"), *info_.szIP != '\0' ? info_.szMask : "");
         }
-    }
-
-    // ---- IPv6
-
-    [[nodiscard]] std::string ipv6_switch(const char *name) const {
-        return first_word_in("/proc/sys/net/ipv6/conf/" + name_ + "/" + name);
-    }
-
-    void compare_ipv6() {
-        const std::string mode = in_lower_case(wanted("IPV6INIT"));
-        const std::string is_off = ipv6_switch("disable_ipv6");
-        if (is_off.empty()) { // a kernel without IPv6
-            return;
-        }
-        if (!mode.empty()) {
-            add("IPV6INIT", mode, is_off == "1" ? "off" : ipv6_mode(mode));
-        }
-        if (mode == "off") {
-            return;
-        }
-        compare_advertisements(mode);
-        if (mode == "static") {
-            const std::string address = wanted("IPV6ADDR") + "/" + wanted("IPV6PREFIXLENG");
-            add("IPV6ADDR", address, like(address, ipv6_addresses(), is_same_prefix));
-            if (const std::string router = wanted("IPV6_DEFAULTGW"); !router.empty()) {
-                add("IPV6_DEFAULTGW", router, like(router, ipv6_routers(name_), is_same_ipv6));
-            }
-        }
-    }
-
-    /** What an interface that has IPv6 runs in, by its clients: the wanted mode when they are those of it. */
-    [[nodiscard]] std::string ipv6_mode(const std::string &mode) const {
-        const bool asks_for_address = job_runs("dhcp-client6,ACTION=client,IFACE=" + name_);
-        const bool asks_for_servers = job_runs("dhcp-client6,ACTION=info,IFACE=" + name_);
-        const bool is_dynamic = mode == "auto" || mode == "dhcp" || mode == "auto_dhcp";
-        if (mode == "off") {
-            return "on";
-        }
-        if (asks_for_address != (mode == "dhcp") || asks_for_servers != (mode == "auto_dhcp")) {
-            const char *const no_address = asks_for_servers ? "auto_dhcp" : "no client";
-            return asks_for_address ? "dhcp" : no_address;
-        }
-        if (job_runs("ra-dns,IFACE=" + name_) != is_dynamic) {
-            return is_dynamic ? "no listener for name servers" : "a listener for name servers";
-        }
-        return mode;
-    }
-
-    /** Without a word about router advertisements, all but fixed addresses come from them. */
-    void compare_advertisements(const std::string &mode) {
-        const std::string said = wanted("IPV6_ACCEPT_RA");
-        if (said.empty() && mode.empty()) {
-            return;
-        }
-        const bool is_wanted = said.empty() ? mode != "static" : said != "0";
-        // a machine that forwards takes them only where it is told so
-        const std::string accepts = ipv6_switch("accept_ra");
-        const bool is_taken = accepts == "2" || (accepts == "1" && ipv6_switch("forwarding") == "0");
-        add("IPV6_ACCEPT_RA", is_wanted ? "1" : "0", is_taken ? "1" : "0");
-    }
-
-    /** Those that reach beyond the link. */
-    [[nodiscard]] std::vector<std::string> ipv6_addresses() const {
-        std::vector<std::string> all;
-        for (const json &row : address_rows(info_)) {
-            if (row["family"] == 6 && row["scope"] != "link") {
-                all.push_back(field(row, "address") + "/" + field(row, "prefix"));
-            }
-        }
-        return all;
-    }
-
-    static bool is_same_prefix(const std::string &one, const std::string &other) {
-        const size_t slash = one.find('/');
-        const size_t other_slash = other.find('/');
-        return one.substr(slash) == other.substr(other_slash) &&
-               is_same_ipv6(one.substr(0, slash), other.substr(0, other_slash));
     }
 
     comparison &result_;
