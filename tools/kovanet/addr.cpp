@@ -81,11 +81,7 @@ void list(const std::optional<std::string> &name, bool as_json) {
         const json found = address_rows(info);
         rows.insert(rows.end(), found.begin(), found.end());
     }
-    if (as_json) {
-        print_json(rows);
-    } else {
-        print_table(rows, kColumns);
-    }
+    show_table(rows, kColumns, as_json);
 }
 
 interface_address checked(const std::string &given) {

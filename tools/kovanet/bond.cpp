@@ -49,7 +49,7 @@ std::string partner_text(const json &row) {
 constexpr column kListColumns[] = {
     {"NAME", [](const json &row) { return field(row, "name"); }},
     {"MODE", [](const json &row) { return field(row, "mode"); }},
-    {"STATE", [](const json &row) -> std::string { return row["up"] == true ? "up" : "down"; }},
+    {"STATE", up_field},
     {"LINK", [](const json &row) { return field(row, "link"); }},
     {"ADDRESS", state_address},
     {"MEMBERS", [](const json &row) { return words_field(row, "members"); }},
@@ -60,7 +60,7 @@ constexpr column kShowColumns[] = {
     {"mode", [](const json &row) { return field(row, "mode"); }},
     {"members", [](const json &row) { return words_field(row, "members"); }},
     {"partner", partner_text},
-    {"state", [](const json &row) -> std::string { return row["up"] == true ? "up" : "down"; }},
+    {"state", up_field},
     {"link", [](const json &row) { return field(row, "link"); }},
     {"address", state_address},
 };
@@ -72,11 +72,7 @@ void list(bool as_json) {
             rows.push_back(describe(*bond));
         }
     }
-    if (as_json) {
-        print_json(rows);
-    } else {
-        print_table(rows, kListColumns);
-    }
+    show_table(rows, kListColumns, as_json);
 }
 
 KOVALINKAGGROPT require_bond(const std::string &name) {
@@ -90,11 +86,7 @@ KOVALINKAGGROPT require_bond(const std::string &name) {
 
 void show(const std::string &name, bool as_json) {
     const json record = describe(require_bond(name));
-    if (as_json) {
-        print_json(record);
-    } else {
-        print_record(record, kShowColumns);
-    }
+    show_record(record, kShowColumns, as_json);
 }
 
 // ---- what is wanted

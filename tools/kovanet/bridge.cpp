@@ -57,7 +57,7 @@ std::string configured_text(const json &row) {
 constexpr column kListColumns[] = {
     {"NAME", [](const json &row) { return field(row, "name"); }},
     {"ROLE", [](const json &row) { return field(row, "role"); }},
-    {"STATE", [](const json &row) -> std::string { return row["up"] == true ? "up" : "down"; }},
+    {"STATE", up_field},
     {"LINK", [](const json &row) { return field(row, "link"); }},
     {"ADDRESS", state_address},
     {"PORTS", [](const json &row) { return words_field(row, "ports"); }},
@@ -68,7 +68,7 @@ constexpr column kShowColumns[] = {
     {"role", [](const json &row) { return field(row, "role"); }},
     {"ports", [](const json &row) { return words_field(row, "ports"); }},
     {"configured", configured_text},
-    {"state", [](const json &row) -> std::string { return row["up"] == true ? "up" : "down"; }},
+    {"state", up_field},
     {"link", [](const json &row) { return field(row, "link"); }},
     {"address", state_address},
 };
@@ -86,11 +86,7 @@ void list(bool as_json) {
     for (const std::string &name : names) {
         rows.push_back(describe(name));
     }
-    if (as_json) {
-        print_json(rows);
-    } else {
-        print_table(rows, kListColumns);
-    }
+    show_table(rows, kListColumns, as_json);
 }
 
 /** Ends the program for what is neither in the kernel nor configured. */
@@ -103,11 +99,7 @@ void require_known(const std::string &name) {
 void show(const std::string &name, bool as_json) {
     require_known(name);
     const json record = describe(name);
-    if (as_json) {
-        print_json(record);
-    } else {
-        print_record(record, kShowColumns);
-    }
+    show_record(record, kShowColumns, as_json);
 }
 
 struct bridge_words {

@@ -77,7 +77,7 @@ constexpr column kListColumns[] = {
 
 constexpr column kShowColumns[] = {
     {"name", [](const json &row) { return field(row, "name"); }},
-    {"state", [](const json &row) -> std::string { return row["up"] == true ? "up" : "down"; }},
+    {"state", up_field},
     {"link", [](const json &row) { return field(row, "link"); }},
     {"speed", [](const json &row) { return row["speed_mbps"].is_null() ? "-" : field(row, "speed_mbps") + " Mb/s"; }},
     {"duplex", [](const json &row) { return field(row, "duplex"); }},
@@ -101,11 +101,7 @@ void list(bool as_json) {
     for (int i = 0; i < count; ++i) {
         rows.push_back(describe(cards[i]));
     }
-    if (as_json) {
-        print_json(rows);
-    } else {
-        print_table(rows, kListColumns);
-    }
+    show_table(rows, kListColumns, as_json);
 }
 
 /** The record of an interface that can be a card, up or not. */
@@ -121,11 +117,7 @@ void show(const std::string &name, bool as_json) {
     const IFINFO info = require_card(name);
     const config_lock lock{config_lock::kShared};
     const json record = describe(info);
-    if (as_json) {
-        print_json(record);
-    } else {
-        print_record(record, kShowColumns);
-    }
+    show_record(record, kShowColumns, as_json);
 }
 
 /** The card's record as it is before a change, nothing when it is not among the cards in use. */

@@ -36,11 +36,7 @@ void show(bool as_json) {
                          {"local_file", known_text(conf.local_bootloader)},
                          {"remote_server", known_text(conf.remote_tftp_server_ip)},
                          {"remote_file", known_text(conf.remote_bootloader)}};
-    if (as_json) {
-        print_json(record);
-    } else {
-        print_record(record, kColumns);
-    }
+    show_record(record, kColumns, as_json);
 }
 
 void store(const DHCP_PXE_CONF &conf) {

@@ -158,11 +158,7 @@ void test_client(const std::string &ifname, bool as_json) {
         call_failed("no DHCP server offers an address on " + ifname);
     }
     const json record = {{"interface", ifname}, {"address", card.szIP}, {"mask", card.szMask}};
-    if (as_json) {
-        print_json(record);
-    } else {
-        print_record(record, kOffer);
-    }
+    show_record(record, kOffer, as_json);
 }
 
 CLI::App &add_switch(CLI::App &object, const char *name, const char *description) {

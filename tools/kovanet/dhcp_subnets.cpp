@@ -101,21 +101,13 @@ void list(bool as_json) {
         subnet one{id, {}, nullptr, {}};
         rows.push_back(read_subnet(one) == presence::read ? record_of(one) : blank_record(id));
     }
-    if (as_json) {
-        print_json(rows);
-    } else {
-        print_table(rows, kList);
-    }
+    show_table(rows, kList, as_json);
 }
 
 void show(const subnet_id &id, bool as_json) {
     const config_lock lock{config_lock::kShared};
     const json record = record_of(require_subnet(id));
-    if (as_json) {
-        print_json(record);
-    } else {
-        print_record(record, kRecord);
-    }
+    show_record(record, kRecord, as_json);
 }
 
 // ---- keys and values --------------------------------------------------------------------------------------------

@@ -34,11 +34,7 @@ constexpr column kColumns[] = {
 void list(const subnet_id &id, bool as_json) {
     const config_lock lock{config_lock::kShared};
     const json rows = rows_of(require_subnet(id));
-    if (as_json) {
-        print_json(rows);
-    } else {
-        print_table(rows, kColumns);
-    }
+    show_table(rows, kColumns, as_json);
 }
 
 /** Where the option of a number hangs, or where one is to be appended. */

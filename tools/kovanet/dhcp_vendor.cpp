@@ -87,11 +87,7 @@ constexpr column kOptions[] = {
 };
 
 void print_rows(const json &rows, std::span<const column> columns, bool as_json) {
-    if (as_json) {
-        print_json(rows);
-    } else {
-        print_table(rows, columns);
-    }
+    show_table(rows, columns, as_json);
 }
 
 void list(bool as_json) {

@@ -32,11 +32,7 @@ constexpr column kColumns[] = {
 void show(bool as_json) {
     const config_lock lock{config_lock::kShared}; // one view of all files
     const json record = dns_record();
-    if (as_json) {
-        print_json(record);
-    } else {
-        print_record(record, kColumns);
-    }
+    show_record(record, kColumns, as_json);
 }
 
 void set(const std::vector<std::string> &servers) {

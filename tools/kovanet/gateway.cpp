@@ -49,11 +49,7 @@ constexpr column kColumns[] = {
 void show(bool as_json) {
     const config_lock lock{config_lock::kShared}; // one view of the kernel and the file
     const json record = gateway_record();
-    if (as_json) {
-        print_json(record);
-    } else {
-        print_record(record, kColumns);
-    }
+    show_record(record, kColumns, as_json);
 }
 
 /** A change of the gateway, announced before and after. Unless it is done, the old default route is put back. */

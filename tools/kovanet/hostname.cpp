@@ -29,11 +29,7 @@ std::optional<std::string> current_name() {
 
 void show(bool as_json) {
     const json record = hostname_record();
-    if (as_json) {
-        print_json(record);
-    } else {
-        print_record(record, kColumns);
-    }
+    show_record(record, kColumns, as_json);
 }
 
 /** Only the reload of the logger fails without a code. */

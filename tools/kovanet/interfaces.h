@@ -32,7 +32,8 @@ IFINFO require_interface(const std::string &name);
 /** All interfaces there are, sorted by name, without those whose names the library refuses. */
 std::vector<IFINFO> all_interfaces();
 
-/** The IPv6 addresses that an interface has now, the widest scope first. Ends the program when they cannot be listed. */
+/** The IPv6 addresses that an interface has now, the widest scope first. Ends the program when they cannot be listed.
+ */
 std::vector<KOVAV6IP> ipv6_addresses(const std::string &name);
 
 /** Counters of all interfaces, sorted by name. */

@@ -96,11 +96,7 @@ void show(const std::optional<std::string> &name, bool as_json) {
             }
         }
     }
-    if (as_json) {
-        print_json(rows);
-    } else {
-        print_table(rows, kColumns);
-    }
+    show_table(rows, kColumns, as_json);
 }
 
 // ---- what is to be set

@@ -29,7 +29,7 @@ json describe(const IFINFO &info) {
 
 constexpr column kColumns[] = {
     {"NAME", [](const json &row) { return field(row, "name"); }},
-    {"STATE", [](const json &row) -> std::string { return row["up"] == true ? "up" : "down"; }},
+    {"STATE", up_field},
     {"LINK", [](const json &row) { return field(row, "link"); }},
     {"SPEED", [](const json &row) { return field(row, "speed_mbps"); }, true},
     {"DUPLEX", [](const json &row) { return field(row, "duplex"); }},
@@ -46,11 +46,7 @@ void show(const std::optional<std::string> &name, bool as_json) {
             rows.push_back(describe(info));
         }
     }
-    if (as_json) {
-        print_json(rows);
-    } else {
-        print_table(rows, kColumns);
-    }
+    show_table(rows, kColumns, as_json);
 }
 
 void set_state(const std::string &name, bool up) {

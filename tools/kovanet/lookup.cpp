@@ -46,11 +46,7 @@ void look_up(const std::string &name, bool as_json) {
     if (rows.empty()) {
         throw failure{kNotFound, "no address of " + name + " is known"};
     }
-    if (as_json) {
-        print_json(rows);
-    } else {
-        print_table(rows, kColumns);
-    }
+    show_table(rows, kColumns, as_json);
 }
 
 } // namespace

@@ -51,11 +51,7 @@ void show(const std::optional<std::string> &name, bool as_json) {
             rows.push_back(describe(info.szIfname));
         }
     }
-    if (as_json) {
-        print_json(rows);
-    } else {
-        print_table(rows, kColumns);
-    }
+    show_table(rows, kColumns, as_json);
 }
 
 struct mtu_words {

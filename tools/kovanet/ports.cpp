@@ -61,11 +61,7 @@ void list(const ports_words &words, bool as_json) {
             rows.push_back({{"protocol", each.name}, {"port", port}});
         }
     }
-    if (as_json) {
-        print_json(rows);
-    } else {
-        print_table(rows, kColumns);
-    }
+    show_table(rows, kColumns, as_json);
 }
 
 void tell_whether_used(const ports_words &words, bool as_json) {

@@ -67,11 +67,7 @@ void show(bool as_json) {
         password == password_state::kUnknown ? json() : json(password == password_state::kStored);
     record["mtu"] = number_or_null(conf->szMTU);
     record["default_route"] = conf->blDefaultRoute != 0;
-    if (as_json) {
-        print_json(record);
-    } else {
-        print_record(record, kSettingsColumns);
-    }
+    show_record(record, kSettingsColumns, as_json);
 }
 
 bool is_switched_on() {
@@ -115,11 +111,7 @@ void status(bool as_json) {
     record["interface"] = known_text(interface);
     record["address"] = known_text(address);
     record["mask"] = known_text(mask);
-    if (as_json) {
-        print_json(record);
-    } else {
-        print_record(record, kStatusColumns);
-    }
+    show_record(record, kStatusColumns, as_json);
 }
 
 // ---- settings ---------------------------------------------------------------------------------------------------

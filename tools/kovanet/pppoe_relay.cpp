@@ -78,11 +78,7 @@ void show(const std::optional<std::string> &name, bool as_json) {
     } else {
         rows = pppoe_relay_records();
     }
-    if (as_json) {
-        print_json(rows);
-    } else {
-        print_table(rows, kColumns);
-    }
+    show_table(rows, kColumns, as_json);
 }
 
 struct relay_words {

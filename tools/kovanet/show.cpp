@@ -191,7 +191,7 @@ std::string addresses_text(const json &row) {
 constexpr column kInterfaces[] = {
     {"INTERFACE", [](const json &row) { return field(row, "branch") + field(row, "name"); }},
     {"ROLE", role_text},
-    {"STATE", [](const json &row) -> std::string { return row["up"] == true ? "up" : "down"; }},
+    {"STATE", up_field},
     {"LINK", [](const json &row) { return field(row, "link"); }},
     {"SPEED", [](const json &row) { return field(row, "speed_mbps"); }, true},
     {"SOURCE", [](const json &row) { return field(row, "source"); }},

@@ -76,6 +76,10 @@ std::string words_field(const json &row, const char *key) {
     return line.empty() ? "-" : line;
 }
 
+std::string up_field(const json &row) {
+    return row["up"] == true ? "up" : "down";
+}
+
 int print_table(const json &rows, std::span<const column> columns) {
     std::vector<std::vector<std::string>> lines(1);
     for (const column &one : columns) {
@@ -118,6 +122,22 @@ void print_record(const json &record, std::span<const column> columns) {
 void print_json(const json &value) {
     fputs(value.dump(-1, ' ', false, json::error_handler_t::replace).c_str(), stdout);
     putchar('\n');
+}
+
+void show_table(const json &rows, std::span<const column> columns, bool as_json) {
+    if (as_json) {
+        print_json(rows);
+    } else {
+        print_table(rows, columns);
+    }
+}
+
+void show_record(const json &record, std::span<const column> columns, bool as_json) {
+    if (as_json) {
+        print_json(record);
+    } else {
+        print_record(record, columns);
+    }
 }
 
 std::string printable(std::string text) {

@@ -25,6 +25,8 @@ std::string field(const json &row, const char *key);
 
 /** The same of a field that is an array of texts, with blanks between them. */
 std::string words_field(const json &row, const char *key);
+/** The field "up" of an interface. */
+std::string up_field(const json &row);
 
 /** Rows as an aligned table with a header line; returns the number of lines. */
 int print_table(const json &rows, std::span<const column> columns);
@@ -32,6 +34,9 @@ int print_table(const json &rows, std::span<const column> columns);
 void print_record(const json &record, std::span<const column> columns);
 /** A value as one line of JSON. */
 void print_json(const json &value);
+/** Rows as JSON or as a table, a record as JSON or as lines: whichever is asked for. */
+void show_table(const json &rows, std::span<const column> columns, bool as_json);
+void show_record(const json &record, std::span<const column> columns, bool as_json);
 
 /** Text for standard output without the control characters that an interface name may hold. */
 std::string printable(std::string text);

@@ -83,11 +83,7 @@ void show(bool as_json) {
     record["login"] = conf->blAnonymous != 0 ? "anonymous" : "user";
     record["user"] = known_text(conf->szUserId);
     record["addresses"] = found;
-    if (as_json) {
-        print_json(record);
-    } else {
-        print_record(record, kColumns);
-    }
+    show_record(record, kColumns, as_json);
 }
 
 /** What a text is that becomes a value in the files of the account. */

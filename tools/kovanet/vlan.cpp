@@ -22,7 +22,7 @@ constexpr column kListColumns[] = {
     {"NAME", [](const json &row) { return field(row, "name"); }},
     {"ON", [](const json &row) { return field(row, "row_device"); }},
     {"ID", [](const json &row) { return field(row, "id"); }, true},
-    {"STATE", [](const json &row) -> std::string { return row["up"] == true ? "up" : "down"; }},
+    {"STATE", up_field},
     {"LINK", [](const json &row) { return field(row, "link"); }},
     {"ADDRESS", state_address},
 };
@@ -31,7 +31,7 @@ constexpr column kShowColumns[] = {
     {"name", [](const json &row) { return field(row, "name"); }},
     {"on", [](const json &row) { return field(row, "row_device"); }},
     {"id", [](const json &row) { return field(row, "id"); }},
-    {"state", [](const json &row) -> std::string { return row["up"] == true ? "up" : "down"; }},
+    {"state", up_field},
     {"link", [](const json &row) { return field(row, "link"); }},
     {"address", state_address},
 };
@@ -44,11 +44,7 @@ void list(bool as_json) {
             rows.push_back(describe(*vlan));
         }
     }
-    if (as_json) {
-        print_json(rows);
-    } else {
-        print_table(rows, kListColumns);
-    }
+    show_table(rows, kListColumns, as_json);
 }
 
 void show(const std::string &name, bool as_json) {
@@ -61,11 +57,7 @@ void show(const std::string &name, bool as_json) {
         throw failure{kNotFound, name + " is no VLAN and has none; see kovanet vlan list"};
     }
     const json record = describe(*vlan);
-    if (as_json) {
-        print_json(record);
-    } else {
-        print_record(record, kShowColumns);
-    }
+    show_record(record, kShowColumns, as_json);
 }
 
 struct vlan_words {
