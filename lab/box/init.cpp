@@ -43,6 +43,7 @@ void make_box(const box_options &options, bool mapped) {
     require(sethostname(options.hostname.c_str(), options.hostname.size()) == 0, "cannot set the host name");
     const unique_fd other_side = enter_network_namespace(options);
     enter_private_root(options, mapped);
+    write_file("/etc/hostname", options.hostname + "\n");
     set_environment();
     wire_network(options, other_side);
     add_kernel_files(options);

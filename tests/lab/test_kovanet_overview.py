@@ -9,12 +9,13 @@ import pathlib
 import pytest
 from conftest import CALL_FAILED, DONE, NO, USAGE, complaint, data, documented, kovanet, run, wait_for
 from test_kovanet import NETWORK, SCRIPTS, interface_file, ip, link_of
+from verify_lab import differences
 
 KOVAINFO = pathlib.Path("/etc/kovainfo.conf")
 MADE = """
 link add part0 type dummy
 link add part1 type dummy
-link add bond7 type bond mode 802.3ad miimon 100
+link add bond7 type bond mode 802.3ad use_carrier 0 miimon 100 updelay 100 lacp_rate fast
 link set part0 master bond7
 link set part1 master bond7
 link add br7 type bridge
@@ -57,6 +58,7 @@ def machine():
     for name, text in FILES.items():
         interface_file(name).write_text(f"DEVICE={name}\nONBOOT=yes\n{text}")
     wait_for(lambda: all(settled(name) for name in ("br7", "bond7", "row0.10", "eth0", "lan0", "lan1")), what="all links")
+    kovanet("ipv6", "init")
     yield
     for name in ("br7", "bond7", "part0", "part1", "row0"):
         run("ip", "link", "del", name, status=None)
@@ -129,11 +131,6 @@ def test_show_takes_no_words():
 # ---- verify ---------------------------------------------------------------------------------------------------------
 
 
-def differences():
-    return [(row["file"].removeprefix(f"{SCRIPTS}/"), row["key"], row["wanted"], row["actual"])
-            for row in data("verify", status=NO)["differences"]]
-
-
 def test_verify_agrees_where_the_kernel_is_as_the_files_say():
     found = data("verify")
     assert list(found) == documented("kovanet verify")
@@ -150,8 +147,17 @@ DEVIATIONS = {
                      "addr del 2001:db8:30::1/64 dev br7\naddr add 2001:db8:30::2/64 dev br7 nodad",
                      [("ifcfg-br7", "IPV6ADDR", "2001:DB8:30:0::1/64", "2001:db8:30::2/64")]),
     "member": ("link set part1 nomaster", [("ifcfg-part1", "MASTER", "bond7", "none"),
+                                           ("ifcfg-part1", "SLAVE", "yes", "none"),
                                            ("ifcfg-part1", "ONBOOT", "up", "down")]),
-    "port": ("link set bond7 nomaster", [("ifcfg-bond7", "BRIDGE", "br7", "none")]),
+    "port": ("link set bond7 nomaster", [("ifcfg-bond7", "BRIDGE", "br7", "none"),
+                                         ("ifcfg-br7", "PRIMARY", "bond7", "none")]),
+    "no bridge": ("link del br7\nlink add br7 type dummy\nlink set br7 up\naddr add 10.30.0.1/24 dev br7\n"
+                  "addr add 2001:db8:30::1/64 dev br7 nodad",
+                  [("ifcfg-br7", "TYPE", "bridge", "none"), ("ifcfg-br7", "PRIMARY", "bond7", "none"),
+                   ("ifcfg-bond7", "BRIDGE", "br7", "none")]),
+    "bond option": ("link set bond7 down\nlink set bond7 type bond updelay 300 lacp_rate slow\nlink set bond7 up",
+                    [("ifcfg-bond7", "BONDING_OPTS", "updelay=100", "updelay=300"),
+                     ("ifcfg-bond7", "BONDING_OPTS", "lacp_rate=fast", "lacp_rate=slow")]),
     "VLAN": ("link del row0.10", [("ifcfg-row0.10", "DEVICE", "row0.10", "none")]),
     "VLAN id": ("link del row0.10\nlink add link row0 name row0.10 type vlan id 11\nlink set row0.10 up\n"
                 "addr add 10.10.0.1/16 dev row0.10", [("ifcfg-row0.10", "VLAN_ID", "10", "11")]),
@@ -180,6 +186,17 @@ def test_verify_finds_files_that_want_something_else():
     assert [line.split()[1:] for line in kovanet("verify", status=NO).stdout.splitlines()] == [
         ["KEY", "WANTED", "ACTUAL"], ["BONDING_OPTS", "active-backup", "802.3ad"], ["row0_mtu", "9000", "1500"],
         ["GATEWAY", "10.30.0.254", "none"]]
+
+
+def test_verify_knows_a_file_that_is_of_another_interface():
+    interface_file("row0").write_text(interface_file("row0").read_text().replace("DEVICE=row0", "DEVICE=row1"))
+    assert differences() == [("ifcfg-row0", "DEVICE", "row1", "row0")]
+
+
+def test_verify_takes_a_file_without_a_protocol_as_static():
+    text = interface_file("row0.10").read_text()
+    interface_file("row0.10").write_text(text.replace("BOOTPROTO=static\n", ""))
+    kovanet("verify", status=DONE)
 
 
 def test_verify_leaves_out_copies_and_what_is_not_brought_up_at_boot():

@@ -161,7 +161,8 @@ ipv4_settings settings_of(const std::string &name) {
         return {ipv4_settings::kDhcp, {}};
     }
     const network fixed{key_of(name, "IPADDR"), key_of(name, "NETMASK")};
-    if (protocol != "static" || fixed.address.empty()) {
+    const bool is_static = protocol == "static" || protocol.empty(); // without the key, as for every other reader
+    if (!is_static || fixed.address.empty()) {
         return {};
     }
     return {ipv4_settings::kStatic, fixed};

@@ -86,9 +86,12 @@ std::vector<served_family> families_there() {
     return {found.begin(), found.end()};
 }
 
+std::string fragment_of(const subnet_id &subnet) {
+    return prefix_of(subnet.type) + subnet.ifname + kSubnet + std::to_string(subnet.number);
+}
+
 std::vector<std::string> lines_of(const subnet_id &subnet) {
-    std::ifstream file{std::string(kFolder) + "/" + prefix_of(subnet.type) + subnet.ifname + kSubnet +
-                       std::to_string(subnet.number) + ".conf"};
+    std::ifstream file{std::string(kFolder) + "/" + fragment_of(subnet) + ".conf"};
     std::vector<std::string> lines;
     for (std::string line; std::getline(file, line);) {
         line.erase(line.find_last_not_of(" \t\r") + 1);

@@ -32,6 +32,8 @@ std::vector<subnet_id> subnets_there();
 /** What has a switch or a subnet, sorted. */
 std::vector<served_family> families_there();
 
+/** The name of a subnet's files, without folder and ending. */
+std::string fragment_of(const subnet_id &subnet);
 /** The lines of a subnet's fragment that say something. */
 std::vector<std::string> lines_of(const subnet_id &subnet);
 /** Everything behind the name of an option in a fragment's lines, "" when it is not there. */

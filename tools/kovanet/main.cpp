@@ -34,7 +34,7 @@ constexpr object kObjects[] = {
     {"show", "what this machine's network is now, on one screen", add_show,
      "  kovanet show\n"
      "  kovanet show --json"},
-    {"verify", "whether the kernel's network is what the files say", add_verify,
+    {"verify", "whether the network and its services are what the files say", add_verify,
      "  kovanet verify\n"
      "  kovanet verify --json"},
     {"monitor", "changes as they happen", add_monitor,

@@ -3,6 +3,7 @@
 #include "errors.h"
 #include "lists.h"
 #include "objects.h"
+#include "records.h"
 #include "words.h"
 
 #include <ctime>
@@ -71,14 +72,12 @@ void require_known(const std::string &name) {
 }
 
 void show(const std::optional<std::string> &name, bool as_json) {
-    json rows = json::array();
+    json rows;
     if (name) {
         require_known(*name);
         rows.push_back(describe(*name));
     } else {
-        for (const std::string &each : configured()) {
-            rows.push_back(describe(each));
-        }
+        rows = pppoe_relay_records();
     }
     show_table(rows, kColumns, as_json);
 }
@@ -181,6 +180,14 @@ void clear() {
 }
 
 } // namespace
+
+json pppoe_relay_records() {
+    json rows = json::array();
+    for (const std::string &each : configured()) {
+        rows.push_back(describe(each));
+    }
+    return rows;
+}
 
 void add_pppoe_relay(CLI::App &object, const global_options &options) {
     auto &words = words_of<relay_words>();

@@ -14,6 +14,10 @@ json gateway_record();
 json dns_record();
 json hostname_record();
 json dhcp_server_record();
+/** What kovanet pppoe-relay show prints of all bridges that have settings. */
+json pppoe_relay_records();
+/** The state in what kovanet tunnel show prints: "up", "connecting" or "down". */
+std::string tunnel_state();
 /** The rows of kovanet addr list for one interface. */
 json address_rows(const IFINFO &info);
 

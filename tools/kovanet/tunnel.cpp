@@ -3,6 +3,7 @@
 #include "interfaces.h"
 #include "objects.h"
 #include "password.h"
+#include "records.h"
 #include "rules.h"
 #include "table.h"
 #include "words.h"
@@ -156,7 +157,7 @@ void execute(int action, const char *what) {
 
 /** The library leaves it to its caller to see whether there is a tunnel. */
 void require_tunnel() {
-    const std::string state = state_of(addresses());
+    const std::string state = tunnel_state();
     if (state == "connecting") {
         throw failure{kCallFailed,
                       "the tunnel is not up yet: the broker does not answer, and the client goes on trying; "
@@ -190,6 +191,10 @@ void stop() {
 }
 
 } // namespace
+
+std::string tunnel_state() {
+    return state_of(addresses());
+}
 
 void add_tunnel(CLI::App &object, const global_options &options) {
     auto &words = words_of<tunnel_words>();
