@@ -260,10 +260,10 @@ void take_v6_keys(const given_keys &keys, subnet &one) {
 
 /** Ends the program when a subnet that cannot keep its values is not told all that it needs. */
 void require_needed(const given_keys &keys, const subnet_id &id, presence found) {
-    const std::vector<std::string> needed = id.type == kIPv4 ? std::vector<std::string>{"range", "mask", "router"}
-                                                             : std::vector<std::string>{"mode", "dns"};
-    const auto is_given = [&keys](const std::string &key) { return keys.contains(key); };
-    if (!std::all_of(needed.begin(), needed.end(), is_given)) {
+    std::vector<std::string> needed = id.type == kIPv4 ? std::vector<std::string>{"range", "mask", "router"}
+                                                       : std::vector<std::string>{"mode", "dns"};
+    std::erase_if(needed, [&keys](const std::string &key) { return keys.contains(key); });
+    if (!needed.empty()) {
         bad_usage((found == presence::absent ? "a new subnet needs " : "the subnet cannot be read and needs ") +
                   CLI::detail::join(needed, ", "));
     }
