@@ -2,6 +2,7 @@
 
 #include "errors.h"
 #include "lists.h"
+#include "stored.h"
 
 #include <cstdio>
 #include <kova/core.h>
@@ -20,8 +21,7 @@ std::string file_of(const std::string &name) {
 }
 
 std::string key_of(const std::string &name, const char *key) {
-    char value[64] = "";
-    return KLIBCFileGetKeyValue(file_of(name).c_str(), key, value, sizeof value, 0) > 0 ? value : "";
+    return stored_value(file_of(name), key);
 }
 
 } // namespace
@@ -129,7 +129,8 @@ ipv4_settings settings_of(const std::string &name) {
         return {ipv4_settings::kDhcp, {}};
     }
     const network fixed{key_of(name, "IPADDR"), key_of(name, "NETMASK")};
-    if (protocol != "static" || fixed.address.empty()) {
+    const bool is_static = protocol == "static" || protocol.empty(); // without the key, as for every other reader
+    if (!is_static || fixed.address.empty()) {
         return {};
     }
     return {ipv4_settings::kStatic, fixed};

@@ -99,6 +99,10 @@ std::vector<std::string> lines_of(const subnet_id &subnet) {
     return lines;
 }
 
+std::string switch_file_of(const served_family &served) {
+    return std::string(kFolder) + "/" + prefix_of(served.type) + served.ifname + ".info";
+}
+
 std::string value_behind(const std::vector<std::string> &lines, const std::string &option) {
     for (const std::string &line : lines) {
         const size_t at = line.find("," + option + ",");

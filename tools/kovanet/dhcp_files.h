@@ -31,6 +31,8 @@ struct served_family {
 std::vector<subnet_id> subnets_there();
 /** What has a switch or a subnet, sorted. */
 std::vector<served_family> families_there();
+/** The file with the switch of an interface. */
+std::string switch_file_of(const served_family &served);
 
 /** The lines of a subnet's fragment that say something. */
 std::vector<std::string> lines_of(const subnet_id &subnet);

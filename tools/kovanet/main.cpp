@@ -8,6 +8,8 @@
 #include <algorithm>
 #include <cstdio>
 #include <cstring>
+#include <exception>
+#include <new>
 #include <string>
 #include <syslog.h>
 #include <vector>
@@ -279,6 +281,15 @@ void complain(const std::string &text) {
     }
 }
 
+/** Whether the command that was given takes a password: a word too many may be one. */
+bool takes_password(const CLI::App &app) {
+    const CLI::App *command = &app;
+    while (!command->get_subcommands().empty()) {
+        command = command->get_subcommands().front();
+    }
+    return command->get_option_no_throw("--password-file") != nullptr;
+}
+
 /** The command line is wrong: how, and where to read on. */
 void complain_of_usage(const CLI::ParseError &error, const CLI::App &app) {
     std::string where = app.get_name();
@@ -287,7 +298,11 @@ void complain_of_usage(const CLI::ParseError &error, const CLI::App &app) {
         where += " " + command->get_name();
     }
     const bool lacks_command = error.get_name() == "RequiredError" && strstr(error.what(), "subcommand") != nullptr;
-    complain((lacks_command ? "the command is not complete" : error.what()) + ("; see " + where) + " --help");
+    const bool may_show_password = error.get_name() == "ExtrasError" && takes_password(app);
+    complain((lacks_command       ? "the command is not complete"
+              : may_show_password ? "there are too many words"
+                                  : error.what()) +
+             ("; see " + where) + " --help");
 }
 
 /** kovanet --complete WORD...: for the shells. What cannot be told is no reason to disturb somebody who types. */
@@ -303,11 +318,8 @@ int complete(CLI::App &app, int argc, char **argv) {
     return kDone;
 }
 
-int run(int argc, char **argv) {
-    CLI::App app{"Shows and changes the network configuration of the appliance.", "kovanet"};
-    if (argc > 1 && strcmp(argv[1], "--complete") == 0) {
-        return complete(app, argc - 1, argv + 1);
-    }
+/** Does what the command line says. @return the exit code of one that is understood */
+exit_code obey(CLI::App &app, int argc, char **argv) {
     global_options options;
     const command_words words = first_words(argc, argv);
     try {
@@ -319,21 +331,41 @@ int run(int argc, char **argv) {
             }
         });
         app.parse(argc, argv);
-        flush_output();
-        return kDone;
     } catch (const CLI::CallForVersion &) {
         puts(kVersion);
-        return kDone;
     } catch (const CLI::CallForHelp &) {
         fputs(app.help().c_str(), stdout);
-        return kDone;
     } catch (const CLI::ParseError &error) {
         complain_of_usage(error, app);
         return kUsage;
+    }
+    flush_output();
+    return kDone;
+}
+
+/** A failure, the more so when its answer is the output, and that is lost. */
+exit_code tell(const failure &failed) {
+    try {
+        flush_output();
+    } catch (const failure &unwritten) {
+        complain(failed.text.empty() ? unwritten.text : failed.text);
+        return failed.text.empty() ? unwritten.code : failed.code;
+    }
+    complain(failed.text);
+    return failed.code;
+}
+
+int run(int argc, char **argv) {
+    try {
+        CLI::App app{"Shows and changes the network configuration of the appliance.", "kovanet"};
+        const bool is_completion = argc > 1 && strcmp(argv[1], "--complete") == 0;
+        return is_completion ? complete(app, argc - 1, argv + 1) : obey(app, argc, argv);
     } catch (const failure &failed) {
-        fflush(stdout);
-        complain(failed.text);
-        return failed.code;
+        return tell(failed);
+    } catch (const std::bad_alloc &) {
+        return tell({kCallFailed, "not enough memory"});
+    } catch (const std::exception &error) {
+        return tell({kCallFailed, std::string("cannot go on: ") + error.what()});
     }
 }
 

@@ -2,9 +2,11 @@
 
 #include "errors.h"
 #include "table.h"
+#include "words.h"
 
 #include <algorithm>
 #include <cerrno>
+#include <climits>
 #include <csignal>
 #include <cstdio>
 #include <cstring>
@@ -41,6 +43,7 @@ private:
 };
 
 bool secret_bytes::read_from(int fd, bool up_to_line_end) {
+    length_ = 0;
     while (length_ < sizeof bytes_) {
         const ssize_t got = read(fd, bytes_ + length_, sizeof bytes_ - length_);
         if (got < 0) {
@@ -118,12 +121,14 @@ void ask(secret_bytes &secret) {
                                   " FILE or " + kFd + " NUMBER"};
     }
     bool is_read = false;
-    {
-        const silent_terminal terminal{STDIN_FILENO}; // before it asks: what was typed till then is dropped
-        fputs("Password: ", stderr);
-        is_read = secret.read_from(STDIN_FILENO, true);
-    }
-    fputc('\n', stderr);
+    do { // anew when it was stopped and goes on
+        {
+            const silent_terminal terminal{STDIN_FILENO}; // before it asks: what was typed till then is dropped
+            fputs("Password: ", stderr);
+            is_read = secret.read_from(STDIN_FILENO, true);
+        }
+        fputc('\n', stderr);
+    } while (!is_read && caught == SIGTSTP);
     if (!is_read) {
         read_failed("the terminal");
     }
@@ -147,7 +152,6 @@ void read_file(const std::string &path, secret_bytes &secret) {
 void add_password(CLI::App &command, password_words &words) {
     auto *file = command.add_option(kFile, words.file, "file whose only line is the password");
     auto *fd = command.add_option(kFd, words.fd, "open descriptor to read that line from; 0 is standard input")
-                   ->check(CLI::NonNegativeNumber)
                    ->excludes(file);
     command.add_flag(kKeep, words.is_kept, "leave the stored password as it is")->excludes(file)->excludes(fd);
     command
@@ -163,6 +167,9 @@ void add_password(CLI::App &command, password_words &words) {
 
 void read_password(const password_words &words, char *field, size_t size) {
     if (words.is_kept) {
+        if (*field == '\0') {
+            throw failure{kNo, "no password is kept; give one"};
+        }
         return;
     }
     secret_bytes secret;
@@ -170,10 +177,13 @@ void read_password(const password_words &words, char *field, size_t size) {
         read_file(*words.file, secret);
     } else if (!words.fd) {
         ask(secret);
-    } else if (!secret.read_from(*words.fd, false)) {
-        read_failed("descriptor " + std::to_string(*words.fd));
+    } else if (!secret.read_from(static_cast<int>(number_within(kFd, *words.fd, 0, INT_MAX)), false)) {
+        read_failed("descriptor " + *words.fd);
     }
     secret.copy_to(field, size);
+    if (*field == '\0') {
+        throw failure{kNo, "there is no password: it is empty"};
+    }
 }
 
 } // namespace kova

@@ -14,6 +14,8 @@ json gateway_record();
 json dns_record();
 json hostname_record();
 json dhcp_server_record();
+/** Whether the PPPoE connection is to be there, now and after a start. */
+bool is_pppoe_switched_on();
 /** The rows of kovanet addr list for one interface. */
 json address_rows(const IFINFO &info);
 

@@ -1,9 +1,12 @@
 /**
  * @file
- * Words of the command line that are not known, and which ones may have been meant.
+ * Words of the command line: those that are not known, numbers, and words that may be repeated.
  */
 #pragma once
 
+#include <CLI/CLI.hpp>
+#include <cstdint>
+#include <optional>
 #include <string>
 #include <vector>
 
@@ -11,5 +14,14 @@ namespace kova {
 
 /** "; did you mean NAME?" when one of the names is close to a word, else nothing. */
 std::string suggestion(const std::string &word, const std::vector<std::string> &names);
+
+/** A decimal number within its limits, nothing for any other text. */
+std::optional<int64_t> decimal_in(const std::string &text, int64_t least, int64_t most);
+/** The same of a kind, such as "port"; ends the program for any other text. */
+int64_t number_within(const char *kind, const std::string &text, int64_t least, int64_t most);
+
+/** Adds a word that may be repeated. Each one is kept as it is typed; CLI11 alone would take "[one,two]" for two. */
+CLI::Option &add_words(CLI::App &command, const char *name, std::vector<std::string> &words,
+                       const std::string &description);
 
 } // namespace kova

@@ -1,0 +1,27 @@
+#include "stored.h"
+
+#include "errors.h"
+
+#include <kova/core.h>
+
+namespace kova {
+
+std::string stored_value(const std::string &file, const std::string &key) {
+    char value[1024] = "";
+    clear_error();
+    if (KLIBCFileExist(file.c_str()) == 1 &&
+        KLIBCFileGetKeyValue(file.c_str(), key.c_str(), value, sizeof value, 0) < 0) {
+        call_failed("cannot read " + key + " of " + file);
+    }
+    return value;
+}
+
+void require_readable(const std::string &file) {
+    char value[8] = "";
+    clear_error();
+    if (KLIBCFileExist(file.c_str()) == 1 && KLIBCFileGetKeyValue(file.c_str(), "-", value, sizeof value, 0) < 0) {
+        call_failed("cannot read " + file);
+    }
+}
+
+} // namespace kova
