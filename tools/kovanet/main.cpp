@@ -298,7 +298,8 @@ void complain_of_usage(const CLI::ParseError &error, const CLI::App &app) {
         where += " " + command->get_name();
     }
     const bool lacks_command = error.get_name() == "RequiredError" && strstr(error.what(), "subcommand") != nullptr;
-    const bool may_show_password = error.get_name() == "ExtrasError" && takes_password(app);
+    const bool is_too_long = error.get_exit_code() == static_cast<int>(CLI::ExitCodes::ExtrasError);
+    const bool may_show_password = is_too_long && takes_password(app);
     complain((lacks_command       ? "the command is not complete"
               : may_show_password ? "there are too many words"
                                   : error.what()) +
