@@ -392,13 +392,16 @@ def test_kovanet_asks_anew_when_it_was_stopped():
             said += os.read(master, 4096)
         return said.count(b"Password: ") == times
 
+    def is_stopped():
+        process.send_signal(signal.SIGTSTP)  # again: it may not wait for what is typed yet
+        return pathlib.Path(f"/proc/{process.pid}/stat").read_text().split()[2] == "T"
+
     # of a group of its own, as a shell's job is: others are not stopped
     process = subprocess.Popen([KOVANET, "tunnel", "set", SERVER, "login", "alice"], stdin=slave, stderr=slave,
                                process_group=0)  # fmt: skip
     try:
         wait_for(lambda: is_asked(1), what="the question")
-        process.send_signal(signal.SIGTSTP)
-        wait_for(lambda: pathlib.Path(f"/proc/{process.pid}/stat").read_text().split()[2] == "T", what="the stop")
+        wait_for(is_stopped, what="the stop")
         assert termios.tcgetattr(slave)[3] & termios.ECHO
         process.send_signal(signal.SIGCONT)
         wait_for(lambda: is_asked(2), what="the question again")
