@@ -335,7 +335,7 @@ int KOVANetIfIsLink(const char *szIfname);
 /**
  * Renames an interface that is known to the traffic counters and down.
  * @param szOld  name, at most 16 characters (the kernel has none above 15)
- * @param szNew  name, at most 16 characters
+ * @param szNew  name, at most 16 characters, without "%" and ":"
  * @return 0; -1 with 0xD00 (a name), 0x200 (memory), 0xBC00 (not there, or up), 0x3400 (no socket, or the kernel cannot
  *         have the name) or 0x3600 (the kernel refuses)
  */

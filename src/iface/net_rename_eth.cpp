@@ -20,6 +20,11 @@ bool is_short(const char *szIfname) {
     return strlen(szIfname) < 17;
 }
 
+/** The kernel would fill in a number for "%d", and the caller would not learn which. */
+bool is_new_name(const char *szIfname) {
+    return strpbrk(szIfname, "%:") == nullptr;
+}
+
 /** Says what goes wrong. */
 int require_known_and_down(const char *szIfname) {
     const owner<statistics_kind> statistics{KLIBNetStatInit(1)};
@@ -40,7 +45,7 @@ int require_known_and_down(const char *szIfname) {
 extern "C" int KOVANetRenameEth(const char *szOld, const char *szNew) {
     if (refuses_ifname(HERE, "szOld", szOld) || refuses_ifname(HERE, "szNew", szNew) ||
         refuses(HERE, is_short(szOld), "strlen(szOld) < 17") || refuses(HERE, is_short(szNew), "strlen(szNew) < 17") ||
-        require_known_and_down(szOld) < 0) {
+        refuses(HERE, is_new_name(szNew), "is_new_name(szNew)") || require_known_and_down(szOld) < 0) {
         return -1;
     }
     const interface_socket socket;

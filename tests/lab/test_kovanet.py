@@ -343,6 +343,19 @@ def test_stats_watch_ends_when_interrupted(number):
     assert all(json.loads(line) for line in rest.splitlines())
 
 
+def test_stats_watch_leaves_out_the_ticks_of_a_pause():
+    with subprocess.Popen([KOVANET, "stats", "--watch", "0.2", "--json"], stdout=subprocess.PIPE, text=True) as watching:
+        json.loads(watching.stdout.readline())
+        watching.send_signal(signal.SIGSTOP)
+        time.sleep(2)
+        watching.send_signal(signal.SIGCONT)
+        ticks = [json.loads(watching.stdout.readline()) for _ in range(6)]
+        watching.terminate()
+    assert max(tick["seconds"] for tick in ticks) > 1.5
+    ticks = ticks[[tick["seconds"] > 1.5 for tick in ticks].index(True):]
+    assert sum(tick["seconds"] < 0.005 for tick in ticks) == 0, ticks
+
+
 def test_stats_watch_outlives_an_interface():
     run("ip", "link", "add", "going", "type", "veth", "peer", "name", "gone")
     with subprocess.Popen([KOVANET, "stats", "--watch", "0.1", "--json"], stdout=subprocess.PIPE, text=True) as watching:
@@ -505,7 +518,8 @@ def test_gateway_file_that_cannot_be_written_leaves_the_old_one(routers, gateway
         told = complaint(*words.split(), status=CALL_FAILED)
     finally:
         run("umount", NETWORK.parent)
-    assert "cannot store the default gateway in /etc/sysconfig/network: " in told
+    what = "remove the configured gateway from" if "clear" in words else "store the default gateway in"
+    assert f"cannot {what} /etc/sysconfig/network: " in told
     assert default_gateway()[0] == before and NETWORK.read_text() == text
     assert [event.split(" ")[3:5] for event in gateway_events()] == [
         ["[10.9.0.1]", "[10.8.0.1]" if "set" in words else "[]"], ["[10.9.0.1]", "[10.9.0.1]"]]
@@ -682,8 +696,7 @@ BAD = {
     "card set lan0 static 10.9.0.9 mask": USAGE, "card set lan0 static 10.9.0.9/24 mask 255.255.255.0": USAGE,
     "card set lan0 static 10.9.0.9 netmask 255.255.255.0": USAGE, "card set lan0 bootp": USAGE,
     "card set lan0 dhcp 10.9.0.9/24": USAGE, "link up": USAGE, "link rename lan0": USAGE, "addr add lan0": USAGE,
-    "addr flush lan0": USAGE, "addr flush lan0 5": USAGE, "stats --count 2": USAGE, "stats --watch 0": USAGE,
-    "stats --watch --count 0": USAGE, "stats --watch --count -1": USAGE, "stats --watch eth0": USAGE,
+    "addr flush lan0": USAGE, "addr flush lan0 5": USAGE, "stats --count 2": USAGE,
     "gateway": USAGE, "gateway set": USAGE, "gateway set 10.9.0.1 lan0": USAGE, "gateway show lan0": USAGE,
     "gateway clear 10.9.0.1": USAGE, "gateway del": USAGE, "route": USAGE, "route add": USAGE, "route del": USAGE,
     "route check lan0": USAGE, "route add lan0 10.9.0.7/24 more": USAGE, "route add lan0 --dev": USAGE,
@@ -706,6 +719,9 @@ BAD = {
     "addr del lan0 10.9.0.9": NO, "addr list a/b": NO, "stats a/b": NO, "block show a/b": NO,
     "hostname set a/b": NO, "hostname set .a": NO, "dns set 1.2.3": NO,
     "dns set 10.9.0.1 1.2.3": NO, "dns set 10.9.0.1 host": NO, "dns set fe80::1%lan0": NO,
+    "stats --watch 0": NO, "stats --watch --count 0": NO, "stats --watch --count -1": NO, "stats --watch eth0": NO,
+    "stats --watch 0x1": NO, "stats --watch --count 0x1": NO, "stats --watch inf": NO, "monitor --count 0x1": NO,
+    "ports list tcp 0x10": NO, "ports used tcp 0x10": NO, "service notify ip action 0x1": NO, "dns set [10.9.0.1]": NO,
     "block set ../lan0 ha on": NO, "gateway set router": NO, "gateway set 10.9.0.256": NO, "gateway set 10.9.0.1/24": NO,
     "gateway set fe80::1": NO, "gateway set 127.0.0.1": NO, "gateway set 172.16.0.1": NO, "gateway set 0.0.0.0": NO,
     "gateway set -- -h": NO, f"gateway set {'x' * 4096}": NO, "route add ../lan0": NO, "route del seventeen-letters": NO,
@@ -832,6 +848,59 @@ def test_output_that_cannot_be_written_is_a_failure():
     with open("/dev/full", "w") as full:
         done = subprocess.run([KOVANET, "card", "list"], stdout=full, stderr=subprocess.PIPE, text=True, check=False)
     assert (done.returncode, done.stderr) == (CALL_FAILED, "kovanet: cannot write the output: No space left on device\n")
+
+
+@pytest.mark.parametrize("words", ["--version", "--help", "card --help", "check address 1.2.3", "ports used tcp 1"])
+def test_an_answer_that_cannot_be_written_is_a_failure(words):
+    with open("/dev/full", "w") as full:
+        done = subprocess.run([KOVANET, *words.split()], stdout=full, stderr=subprocess.PIPE, text=True, check=False)
+    assert (done.returncode, done.stderr) == (CALL_FAILED, "kovanet: cannot write the output: No space left on device\n")
+
+
+def test_numbers_are_decimal():
+    assert data("ports", "used", "tcp", "010", status=None)["low"] == 10
+    assert complaint("ports", "used", "tcp", "65536", status=NO) == (
+        'port "65536" is not valid: it is a number from 0 to 65535')
+
+
+@pytest.mark.parametrize("words", ["dns set [10.9.0.1,10.9.0.2]", "stats [lan0]", "dns set 10.9.0.1 [10.9.0.2]"])
+def test_repeated_words_are_taken_as_they_are_typed(words):
+    before = everything()
+    text = complaint(*words.split(), status=None)
+    assert words.split()[-1] in text and everything() == before
+
+
+def test_several_words_are_several_still():
+    assert [one["name"] for one in data("stats", "lo", "lan0", "eth0")] == ["eth0", "lan0", "lo"]
+    assert "--help" in complaint("dns", "set", "--json", status=USAGE)
+
+
+@pytest.mark.parametrize("name", ["lan%d", "lan:1", "%"])
+def test_a_name_that_the_kernel_would_complete_is_refused(name):
+    run("ip", "link", "set", "lan0", "down")
+    assert '"%"' in complaint("link", "rename", "lan0", name, status=NO)
+    assert '"%"' in complaint("bridge", "set", name, "master", "lan0", "--yes", status=NO)
+    assert link_of("lan0") and not interface_file(name).exists()
+
+
+def test_a_file_that_cannot_be_read_is_no_answer(keep):
+    kovainfo = pathlib.Path("/etc/kovainfo.conf")
+    keep(kovainfo).unlink()
+    kovainfo.mkdir()
+    try:
+        assert complaint("dns", "show", status=CALL_FAILED).startswith("cannot read dns_mode of /etc/kovainfo.conf: NET_ERR")
+    finally:
+        kovainfo.rmdir()
+
+
+@pytest.mark.parametrize("name,shown", [("a\u009b31m", "a?31m"), ("a\udc9b31m", "a?31m"), ("é€", "é€"), ("a\udcc3", "a?")])
+def test_the_name_of_an_interface_is_text_to_the_terminal(name, shown):
+    run("ip", "link", "add", name, "type", "veth", "peer", "name", "peer")
+    try:
+        for words in (("link", "show"), ("stats",)):
+            assert shown in [line.split()[0] for line in kovanet(*words).stdout.splitlines() if line]
+    finally:
+        run("ip", "link", "del", "peer")
 
 
 def test_the_name_of_an_interface_cannot_write_to_the_terminal():

@@ -110,6 +110,14 @@ def test_bond_list_and_show():
     assert list(expected) == documented("kovanet bond list")
 
 
+def test_bridges_are_listed_among_many_interfaces():
+    run("ip", "-batch", "-", input="".join(f"link add many{i} type veth peer name aa{i}\n" for i in range(20)))
+    try:
+        assert {"br7", "lbr7"} <= {row["name"] for row in data("bridge", "list")}
+    finally:
+        run("ip", "-batch", "-", input="".join(f"link del many{i}\n" for i in range(20)))
+
+
 def test_bridge_list_and_show():
     found = data("bridge", "list")
     assert found == [

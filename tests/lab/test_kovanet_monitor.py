@@ -5,6 +5,7 @@ import contextlib
 import json
 import os
 import pathlib
+import shlex
 import shutil
 import signal
 import subprocess
@@ -12,7 +13,7 @@ import time
 
 import pytest
 from conftest import (
-    DONE, KOVANET, NO_PERMISSION, USAGE, complaint, documented, kovanet, on_other_side, processes, run, wait_for,
+    CALL_FAILED, DONE, KOVANET, NO_PERMISSION, USAGE, complaint, documented, kovanet, on_other_side, processes, run, wait_for,
 )  # fmt: skip
 
 EVENTS = pathlib.Path("/run/kova/events")
@@ -117,6 +118,30 @@ def test_monitor_tells_link_changes_of_the_kernel():
     assert change["source"] == "kernel" and change["phase"] is None
 
 
+def test_monitor_tells_what_went_away_while_too_much_happened():
+    with watching("monitor", "--json") as watcher:
+        run("ip", "link", "add", "going", "type", "veth", "peer", "name", "gone")
+        wait_for(lambda: holds(watcher, "interface added", IFNAME="going"), what="the new interface")
+        watcher.process.send_signal(signal.SIGSTOP)
+        run("ip", "-batch", "-", input="".join(f"link set eth0 alias {i}\n" for i in range(2000)))
+        run("ip", "link", "del", "going")
+        watcher.process.send_signal(signal.SIGCONT)
+        wait_for(lambda: holds(watcher, "interface removed", IFNAME="going"), what="the removed interface")
+        wait_for(lambda: holds(watcher, "interface removed", IFNAME="gone"), what="its other end")
+        assert len(holds(watcher, "interface removed")) == 2
+        on_other_side("ip", "link", "set", "lan0", "down")
+        wait_for(lambda: holds(watcher, "link down", IFNAME="lan0"), what="a change after it")
+
+
+def test_monitor_tells_that_the_events_cannot_be_read():
+    EVENTS.unlink(missing_ok=True)
+    EVENTS.mkdir()
+    try:
+        assert complaint("monitor", "--count", "1", status=CALL_FAILED).startswith(f"cannot read the events in {EVENTS}")
+    finally:
+        EVENTS.rmdir()
+
+
 def test_monitor_for_people_has_one_line_a_change():
     with watching("monitor", "--count", "2") as watcher:
         kovanet("service", "notify", "hostname")
@@ -199,10 +224,39 @@ def test_completion_offers_objects_verbs_interfaces_choices_and_options():
     assert offered("nonsense", "") == [] and offered("card", "show", "eth0", "") == [] and offered("hostname", "set", "") == []
 
 
-def test_bash_completes():
-    script = ("source /usr/share/bash-completion/completions/kovanet; COMP_WORDS=(kovanet card show la); COMP_CWORD=3;"
-              "_kovanet; echo \"${COMPREPLY[@]}\"; complete -p kovanet")
-    assert run("bash", "--norc", "-c", script).stdout == "lan0\ncomplete -F _kovanet kovanet\n"
+def test_completion_offers_no_name_that_a_shell_would_run():
+    run("ip", "link", "add", "$(id)", "type", "veth", "peer", "name", "a;b")
+    try:
+        assert offered("card", "show", "") == ["eth0", "lan0", "lo"]
+    finally:
+        run("ip", "link", "del", "a;b")
+
+
+def test_completion_knows_values_of_options_and_the_relays_interface():
+    assert {"eth0", "lan0"} <= set(offered("pppoe-relay", "set", "lbr0", "on", ""))
+    assert offered("tunnel", "set", "--password-file", "/root/x", "broker", "") == ["anonymous", "login"]
+
+
+def bash_offers(line, *words):
+    """What bash offers at the end of a line that it parts into words."""
+    script = (f"source /usr/share/bash-completion/completions/kovanet; COMP_LINE='{line}'; COMP_POINT={len(line)};"
+              f"COMP_WORDS=({' '.join(shlex.quote(word) for word in words)}); COMP_CWORD={len(words) - 1};"
+              "_kovanet; printf '%s\\n' \"${COMPREPLY[@]}\"")
+    return run("bash", "--norc", "-c", script).stdout.splitlines()
+
+
+def test_bash_completes(tmp_path):
+    script = "source /usr/share/bash-completion/completions/kovanet; complete -p kovanet"
+    assert run("bash", "--norc", "-c", script).stdout == "complete -F _kovanet kovanet\n"
+    assert bash_offers("kovanet card show la", "kovanet", "card", "show", "la") == ["lan0"]
+    assert bash_offers("kovanet ca", "kovanet", "ca") == ["card"]
+    split = ("kovanet", "reach", "2001", ":", "db8", "::", "1", "22")
+    assert bash_offers("kovanet reach 2001:db8::1 22 ti", *split, "ti") == ["timeout"]
+    assert bash_offers("kovanet reach 2001:db8::1 22 ", *split, "") == ["timeout"]
+    assert bash_offers("kovanet reach fe80:: ", "kovanet", "reach", "fe80", "::", "") == [""]
+    (tmp_path / "secret").touch()
+    line = f"kovanet tunnel set broker login alice --password-file {tmp_path}/se"
+    assert bash_offers(line, *line.split()) == [f"{tmp_path}/secret"]
 
 
 @pytest.mark.skipif(shutil.which("zsh") is None, reason="needs zsh")

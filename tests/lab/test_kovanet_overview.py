@@ -3,6 +3,7 @@
 """kovanet show and verify on a machine with everything, compared with what iproute2 and the files say."""
 
 import ipaddress
+import json
 import os
 import pathlib
 
@@ -122,6 +123,62 @@ def test_show_tells_what_else_there_is_when_a_part_cannot_be_read():
         NETWORK.write_text("")
     assert "gateway:   cannot be read\n" in done.stdout and "row0.10" in done.stdout
     assert "cannot read the configured gateway" in done.stderr
+
+
+UNREADABLE = {
+    "/etc/kovainfo.conf": ("dns", "services"), "/etc/kova/service/kovatunnel.conf": ("services",),
+    "/etc/dhcpd/dhcpd.info": ("services",), "/etc/dhcpd/dhcpd-pxe-setting": ("services",),
+    "/etc/dhcpd/dhcpd-row0.info": ("services",),
+}  # fmt: skip
+
+
+@pytest.mark.parametrize("path", UNREADABLE)
+def test_show_answers_nothing_for_a_file_that_cannot_be_read(path, keep):
+    path = pathlib.Path(path)
+    path.parent.mkdir(exist_ok=True)
+    keep(path).unlink(missing_ok=True)
+    path.mkdir()
+    try:
+        shown = data("show", status=CALL_FAILED)
+        text = kovanet("show", status=CALL_FAILED).stdout
+        if "dhcpd" in path.name:
+            assert "dhcpd" in complaint("dhcp-server", "status", status=CALL_FAILED)
+    finally:
+        path.rmdir()
+    assert {name for name, value in shown.items() if value is None} == set(UNREADABLE[str(path)])
+    assert "cannot be read" in text
+
+
+def test_show_leaves_open_where_one_address_comes_from_when_its_file_cannot_be_read():
+    interface_file("row0").unlink()
+    interface_file("row0").mkdir()
+    try:
+        rows = {row["name"]: row for row in data("show", status=CALL_FAILED)["interfaces"]}
+    finally:
+        interface_file("row0").rmdir()
+    assert rows["row0"]["source"] is None and rows["br7"]["source"] == "static"
+
+
+def test_show_takes_a_file_that_does_not_say_for_a_static_one():
+    interface_file("row0").write_text("DEVICE=row0\nIPADDR=10.77.0.1\nNETMASK=255.255.255.0\n")
+    assert {row["name"]: row["source"] for row in data("show")["interfaces"]}["row0"] == "static"
+
+
+def test_show_keeps_what_is_on_another_namespaces_interface_apart():
+    apart = ("ip", "netns", "exec", "apart")
+    run("ip", "netns", "add", "apart")
+    try:
+        run("ip", "link", "add", "link", "row0", "name", "moved", "type", "vlan", "id", "20")
+        run("ip", "link", "set", "moved", "netns", "apart", "name", "row0")
+        run(*apart, "ip", "link", "add", "br0", "type", "bridge")
+        run(*apart, "ip", "link", "set", "row0", "master", "br0")
+        rows = {row["name"]: row for row in json.loads(run(*apart, "/usr/bin/kovanet", "show", "--json").stdout)["interfaces"]}
+        lines = run(*apart, "/usr/bin/kovanet", "show").stdout.splitlines()
+    finally:
+        run("ip", "netns", "del", "apart")
+    assert rows["row0"]["kind"] == "vlan" and rows["row0"]["parts"] == [] and rows["br0"]["parts"] == ["row0"]
+    tree = [line.split()[0] for line in lines[6:]]
+    assert tree == ["br0", "`-row0"]
 
 
 def test_show_takes_no_words():

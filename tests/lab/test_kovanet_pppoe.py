@@ -74,6 +74,20 @@ def test_settings_are_stored_and_shown(secret):
                                       "default route": "yes"}  # fmt: skip
 
 
+@pytest.mark.parametrize("user", ["[alice]", "[a,b]", "[]", "[[x]]"])
+def test_a_user_in_brackets_is_stored_as_it_is_typed(secret, user):
+    kovanet("pppoe", "set", "eth0", "user", user, "--password-file", secret)
+    assert data("pppoe", "show")["user"] == user
+
+
+def test_the_switch_is_told_as_the_library_takes_it():
+    for value, is_on in (("YES", True), ("yes", True), ("no", False), ("1", False)):
+        run("sed", "-i", "/^pppoe_enable=/d", KOVAINFO)
+        with KOVAINFO.open("a") as file:
+            file.write(f'pppoe_enable="{value}"\n')
+        assert data("pppoe", "status")["enabled"] is is_on and data("show")["services"]["pppoe"] is is_on
+
+
 def test_the_password_comes_from_a_descriptor_or_a_prompt():
     kovanet("pppoe", "set", "eth0", "user", USER, "--password-fd", "0", input=f"{PASSWORD}\n")
     assert SECRETS.read_text() == f"'{USER}'\t*\t{PASSWORD}\n"
@@ -108,7 +122,8 @@ BAD = {
     "pppoe set eth0 user a": "no terminal to ask for the password on",
     "pppoe set nope user a --keep-password": NOT_FOUND, "pppoe set lo user a --keep-password": "is no Ethernet interface",
     "pppoe set eth0 mtu 1400 --keep-password": "no user is stored yet",
-    "pppoe set eth0 user a --keep-password": "there is no password",
+    "pppoe set eth0 user a --keep-password": "no password is kept",
+    "pppoe set eth0 user a secret": "a word is neither user, mtu nor default-route",
     "pppoe set eth0 user a mtu 127 --keep-password": "128 to 1492",
     "pppoe set eth0 user a mtu 1493 --keep-password": "128 to 1492",
     "pppoe set eth0 user a mtu 14e2 --keep-password": "128 to 1492",
@@ -120,7 +135,7 @@ BAD = {
     "pppoe-relay set eth0 on lan0": "no bridge of the local LAN", "pppoe-relay set a/b on lan0": "holds no",
     "pppoe-relay set nope off": NOT_FOUND, "pppoe-relay show nope": NOT_FOUND, "pppoe-relay apply nope": NOT_FOUND,
 }  # fmt: skip
-BAD_USAGE = ("did you mean", "user lacks", "user is given", "default-route is", "not given on", "no terminal", "on needs",
+BAD_USAGE = ("did you mean", "a word is neither", "user lacks", "user is given", "default-route is", "not given on", "no terminal", "on needs",
              "off takes")  # fmt: skip
 
 

@@ -14,7 +14,7 @@ from sdk import library, register
 KOVANET = "/usr/bin/kovanet"
 PLUGINS = pathlib.Path("/usr/kova/plugins/service")
 RELAY = pathlib.Path("/usr/sbin/pppoe-relay")
-DONE, _, USAGE, _, CALL_FAILED, NO_PERMISSION = range(6)
+DONE, NO, USAGE, _, CALL_FAILED, NO_PERMISSION = range(6)
 IP, HOSTNAME, MTU = 1, 2, 4
 LOCK, EXEC = 0x400, 0x2A00
 
@@ -273,10 +273,17 @@ def test_kovanet_notifies(plug_in, notes, words, bits, action):
 
 
 @pytest.mark.parametrize("words", [[], [""], [","], ["IP"], ["ip,other"], ["ip", "mtu"], ["ip", "action"],
-                                   ["ip", "action", "x"], ["ip", "action", "4294967296"], ["ip", "do", "1"]])  # fmt: skip
+                                   ["ip", "do", "1"]])  # fmt: skip
 def test_kovanet_refuses_what_it_cannot_understand(plug_in, notes, words):
     plug_in("30-test", f"cat >>{notes}")
     assert kovanet("service", "notify", *words, status=USAGE).endswith("see kovanet service notify --help\n")
+    assert notes.read_text() == ""
+
+
+@pytest.mark.parametrize("action", ["x", "4294967296", "0x1", ""])
+def test_kovanet_refuses_an_action_that_is_no_number(plug_in, notes, action):
+    plug_in("30-test", f"cat >>{notes}")
+    assert f'action "{action}" is not valid' in kovanet("service", "notify", "ip", "action", action, status=NO)
     assert notes.read_text() == ""
 
 

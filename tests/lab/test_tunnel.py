@@ -17,7 +17,7 @@ import threading
 import time
 
 import pytest
-from conftest import (CALL_FAILED, DONE, KOVANET, NO, NO_PERMISSION, USAGE, asked, complaint, data, documented, kovanet,
+from conftest import (CALL_FAILED, DONE, KOVANET, NO, NO_PERMISSION, SLOWNESS, USAGE, asked, complaint, data, documented, kovanet,
                       on_other_side, process, processes, run, wait_for)
 from sdk import library
 from tunnel_lab import (ACCOUNT, CLIENT, CONF, GOGOC, NEAR, PASSWORD, RUN_KEY, SECRET, SERVER, LabBroker, TunnelConf, account,
@@ -300,7 +300,7 @@ def test_kovanet_tells_when_there_is_no_tunnel(broker, tmp_path):
 
 def test_kovanet_takes_passwords_from_a_file_a_descriptor_and_a_terminal(tmp_path):
     words = ("tunnel", "set", SERVER, "login", "alice")
-    for given, password in (("p", "p"), ("p\n", "p"), ("p\r\n", "p"), ("", ""), (" p* \n", " p* "), ("x" * 31, "x" * 31),
+    for given, password in (("p", "p"), ("p\n", "p"), ("p\r\n", "p"), (" p* \n", " p* "), ("x" * 31, "x" * 31),
                             ("ü€", "ü€"), ("\"'", "\"'")):  # fmt: skip
         kovanet(*words, "--password-file", secret_file(tmp_path, given))
         assert stored() == (0, SERVER, "alice", password)
@@ -311,6 +311,54 @@ def test_kovanet_takes_passwords_from_a_file_a_descriptor_and_a_terminal(tmp_pat
     assert (status, said) == (DONE, "Password: \n") and stored()[3] == SECRET
     kovanet("tunnel", "set", "other.example", "login", "bob", "--keep-password")
     assert stored() == (0, "other.example", "bob", SECRET)
+
+
+def test_kovanet_keeps_no_password_where_none_is_stored(tmp_path):
+    kovanet("tunnel", "set", SERVER, "login", "alice", "--password-file", secret_file(tmp_path, SECRET))
+    before = PASSWORD.read_bytes()
+    kovanet("tunnel", "set", SERVER, "anonymous")
+    text = complaint("tunnel", "set", SERVER, "login", "alice", "--keep-password", status=NO)
+    assert text == "no password is kept; give one"
+    assert PASSWORD.read_bytes() == before and stored()[0] == 1
+    kovanet("tunnel", "set", SERVER, "login", "alice", "--password-file", secret_file(tmp_path, SECRET))
+    for empty in ("", "\n", "\r\n"):
+        assert "empty" in complaint("tunnel", "set", SERVER, "login", "bob", "--password-file", secret_file(tmp_path, empty),
+                                    status=NO)  # fmt: skip
+    assert stored() == (0, SERVER, "alice", SECRET)
+
+
+def test_kovanet_asks_anew_when_it_was_stopped():
+    master, slave = pty.openpty()
+    os.set_blocking(master, False)
+    said = b""
+
+    def is_asked(times):
+        nonlocal said
+        with contextlib.suppress(BlockingIOError):
+            said += os.read(master, 4096)
+        return said.count(b"Password: ") == times
+
+    def is_stopped():
+        process.send_signal(signal.SIGTSTP)  # again: it may not wait for what is typed yet
+        return pathlib.Path(f"/proc/{process.pid}/stat").read_text().split()[2] == "T"
+
+    # of a group of its own, as a shell's job is: others are not stopped
+    process = subprocess.Popen([KOVANET, "tunnel", "set", SERVER, "login", "alice"], stdin=slave, stderr=slave,
+                               process_group=0)  # fmt: skip
+    try:
+        wait_for(lambda: is_asked(1), what="the question")
+        wait_for(is_stopped, what="the stop")
+        assert termios.tcgetattr(slave)[3] & termios.ECHO
+        process.send_signal(signal.SIGCONT)
+        wait_for(lambda: is_asked(2), what="the question again")
+        os.write(master, b"typed-word\n")
+        assert process.wait(20 * SLOWNESS) == DONE
+        assert stored()[3] == "typed-word"
+    finally:
+        process.kill()
+        process.wait()
+        os.close(master)
+        os.close(slave)
 
 
 def test_kovanet_leaves_the_terminal_as_it_was_when_it_is_interrupted():
@@ -340,6 +388,8 @@ def test_kovanet_refuses_passwords_that_are_none(tmp_path):
         assert "zq" not in complaint(*words, "--password-file", secret_file(tmp_path, "zq" + bad), status=NO)
     assert complaint(*words, "--password-file", tmp_path / "absent", status=NO).startswith("cannot read the password from")
     assert complaint(*words, "--password-file", tmp_path, status=NO).startswith("cannot read the password from")
+    for number in ("x", "0x0", "-1", "4294967296"):
+        assert "is not valid: it is a number" in complaint(*words, "--password-fd", number, status=NO)
     assert complaint(*words, "--password-fd", "99", status=NO).startswith("cannot read the password from descriptor 99")
     assert "no terminal" in complaint(*words, status=USAGE)
     assert stored() == before
@@ -347,6 +397,8 @@ def test_kovanet_refuses_passwords_that_are_none(tmp_path):
 
 def test_kovanet_takes_no_password_from_the_command_line():
     before = stored()
+    done = run(KOVANET, "tunnel", "set", SERVER, "login", "alice", SECRET, status=USAGE)
+    assert SECRET not in done.stdout + done.stderr and "there are too many words" in done.stderr
     for words in (("--password", SECRET), (f"--password={SECRET}",)):
         done = run(KOVANET, "tunnel", "set", SERVER, "login", "alice", *words, status=USAGE)
         assert SECRET not in done.stdout + done.stderr and "command line" in done.stderr

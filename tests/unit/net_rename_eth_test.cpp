@@ -44,6 +44,13 @@ TEST_F(net_rename_eth, KOVANetRenameEth_name_of_seventeen_characters_is_refused)
     }
 }
 
+TEST_F(net_rename_eth, KOVANetRenameEth_new_name_that_the_kernel_would_complete_is_refused) {
+    for (const char *name : {"lan%d", "%", "lan%%d", "lan:1"}) {
+        EXPECT_OUTCOME(rename("eth0", name), refusal("net_rename_eth", "is_new_name(szNew)"));
+    }
+    EXPECT_OUTCOME(rename("lan%d", "lan0"), failure(0xBC00, "No interface lan%d")); // of another program
+}
+
 TEST_F(net_rename_eth, KOVANetRenameEth_name_of_sixteen_characters_is_nothing_the_kernel_has) {
     EXPECT_OUTCOME(rename(long_text(16).c_str(), "lan0"), failure(0xBC00, "No interface " + long_text(16)));
     EXPECT_OUTCOME(rename("eth0", long_text(16).c_str()),

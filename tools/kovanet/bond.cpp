@@ -383,14 +383,14 @@ void add_bond(CLI::App &object, const global_options &options) {
     CLI::App &make = *object.add_subcommand("create", "make a bond, which takes the place of its first member");
     make.add_option("BOND", words.name, "its name")->required();
     make.add_option("MODE", words.mode, modes)->required();
-    make.add_option("IF", words.members, "2 to 32 interfaces; their order is that of their names")->required();
+    add_words(make, "IF", words.members, "2 to 32 interfaces; their order is that of their names").required();
     add_yes(make, words.is_confirmed);
     make.callback([&words] { create(words); });
 
     CLI::App &other = *object.add_subcommand("change", "change the mode and the members of a bond");
     other.add_option("BOND", words.name, "the bond")->required();
     other.add_option("MODE", words.mode, modes)->required();
-    other.add_option("IF", words.members, "all members that it will have; without any it keeps those it has");
+    add_words(other, "IF", words.members, "all members that it will have; without any it keeps those it has");
     add_yes(other, words.is_confirmed);
     other.callback([&words] { change(words); });
 

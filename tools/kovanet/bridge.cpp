@@ -75,17 +75,13 @@ constexpr column kShowColumns[] = {
 };
 
 void list(bool as_json) {
-    const owned_list found = make_list();
-    clear_error();
-    if (KLIBNetEnumBridge(found.get(), KLIB_BRIDGE_MASTER) < 0 ||
-        KLIBNetEnumBridge(found.get(), KLIB_BRIDGE_LOCAL_LAN) < 0) {
-        call_failed("cannot list the bridges");
-    }
-    std::vector<std::string> names = texts_of(found.get());
-    std::sort(names.begin(), names.end());
+    constexpr char kHidden[] = "gbr"; // the system's own
     json rows = json::array();
-    for (const std::string &name : names) {
-        rows.push_back(describe(name));
+    for (const IFINFO &info : all_interfaces()) { // the library's own list is of the first 32 interfaces
+        const std::string name = info.szIfname;
+        if (KLIBNetBridgeIfIsMaster(name.c_str()) == 1 && name.find(kHidden) == std::string::npos) {
+            rows.push_back(describe(name));
+        }
     }
     show_table(rows, kListColumns, as_json);
 }
@@ -162,7 +158,11 @@ void require_port(const std::string &name) {
 
 /** The name of a bridge that is there, or will be: an interface of another kind cannot become one. */
 void require_no_card(const std::string &name) {
-    if (find_interface(name) && KLIBNetBridgeIfIsMaster(name.c_str()) != 1) {
+    const bool is_there = find_interface(name).has_value();
+    if (!is_there) {
+        require("interface name \"" + name + "\"", refuse_new_interface_name(name));
+    }
+    if (is_there && KLIBNetBridgeIfIsMaster(name.c_str()) != 1) {
         throw failure{kNo, name + " is an interface of another kind and cannot become a bridge"};
     }
 }
@@ -259,9 +259,9 @@ void add_bridge(CLI::App &object, const global_options &options) {
                     "no part, a bridge, the bridge of the local LAN, or a port")
         ->required()
         ->check(choice({"none", "master", "local-lan", "slave"}));
-    change.add_option("PRIMARY|BRIDGE static ADDRESS/LENGTH|dhcp", words.rest,
-                      "of a bridge its first port, of a port its bridge; then, if it changes, where the IPv4 address "
-                      "comes from");
+    add_words(change, "PRIMARY|BRIDGE static ADDRESS/LENGTH|dhcp", words.rest,
+              "of a bridge its first port, of a port its bridge; then, if it changes, where the IPv4 address "
+              "comes from");
     add_yes(change, words.is_confirmed);
     change.callback([&words] { set(words); });
 }

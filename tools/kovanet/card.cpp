@@ -1,6 +1,6 @@
 // kovanet card: the cards and their IPv4 configuration.
+#include "composition.h"
 #include "errors.h"
-#include "interfaces.h"
 #include "objects.h"
 #include "rules.h"
 #include "words.h"
@@ -49,10 +49,6 @@ json describe(const IFINFO &info) {
     return row;
 }
 
-std::string address_with_prefix(const json &row) {
-    return row["prefix"].is_null() ? field(row, "address") : field(row, "address") + "/" + field(row, "prefix");
-}
-
 std::string configured_with_mask(const json &row) {
     return row["configured_mask"].is_null()
                ? field(row, "configured_address")
@@ -71,7 +67,7 @@ constexpr column kListColumns[] = {
     {"LINK", [](const json &row) { return field(row, "link"); }},
     {"SPEED", [](const json &row) { return field(row, "speed_mbps"); }, true},
     {"SOURCE", [](const json &row) { return field(row, "source"); }},
-    {"ADDRESS", address_with_prefix},
+    {"ADDRESS", state_address},
     {"MAC", [](const json &row) { return field(row, "mac"); }},
     {"MTU", [](const json &row) { return field(row, "mtu"); }, true},
 };
@@ -84,7 +80,7 @@ constexpr column kShowColumns[] = {
     {"duplex", [](const json &row) { return field(row, "duplex"); }},
     {"best link", best_link},
     {"source", [](const json &row) { return field(row, "source"); }},
-    {"address", address_with_prefix},
+    {"address", state_address},
     {"configured", configured_with_mask},
     {"MAC", [](const json &row) { return field(row, "mac"); }},
     {"MTU", [](const json &row) { return field(row, "mtu"); }},

@@ -15,9 +15,19 @@ bool is_interface_word(const std::string &word) {
     return std::find(kWords.begin(), kWords.end(), word) != kWords.end();
 }
 
+/** Whether a shell takes a name for nothing else: what is offered is put on its command line as it is. */
+bool is_plain(const std::string &name) {
+    const auto is_part = [](unsigned char c) {
+        return isalnum(c) != 0 || c == '-' || c == '_' || c == '.' || c == '@';
+    };
+    return !name.starts_with('-') && std::all_of(name.begin(), name.end(), is_part);
+}
+
 void add_interfaces(texts &candidates) {
     for (const NETSTAT &stat : all_counters()) {
-        candidates.emplace_back(stat.szIfname);
+        if (is_plain(stat.szIfname)) {
+            candidates.emplace_back(stat.szIfname);
+        }
     }
 }
 
@@ -81,6 +91,16 @@ void add_options(const CLI::App &command, texts &candidates) {
     }
 }
 
+/** Whether the word behind an option is its value. */
+bool takes_value(const CLI::App &command, const std::string &option) {
+    for (const CLI::App *at = &command; at != nullptr; at = at->get_parent()) {
+        if (const CLI::Option *const found = at->get_option_no_throw(option)) {
+            return found->get_items_expected_min() > 0;
+        }
+    }
+    return false;
+}
+
 } // namespace
 
 std::vector<std::string> completions(const CLI::App &app, const std::vector<std::string> &words) {
@@ -95,7 +115,9 @@ std::vector<std::string> completions(const CLI::App &app, const std::vector<std:
         if (found != below.end()) {
             command = *found;
             count = 0;
-        } else if (!words[i].starts_with('-')) {
+        } else if (words[i].starts_with('-')) {
+            i += takes_value(*command, words[i]) ? 1 : 0;
+        } else {
             if (!below.empty()) {
                 return {}; // no such command
             }

@@ -2,6 +2,7 @@
 
 #include "errors.h"
 #include "lists.h"
+#include "stored.h"
 
 #include <csignal>
 #include <cstdio>
@@ -21,8 +22,7 @@ std::string file_of(const std::string &name) {
 }
 
 std::string key_of(const std::string &name, const char *key) {
-    char value[64] = "";
-    return KLIBCFileGetKeyValue(file_of(name).c_str(), key, value, sizeof value, 0) > 0 ? value : "";
+    return stored_value(file_of(name), key);
 }
 
 /** From now on Ctrl-C ends the programs that are run, but leaves it to the library to put right what they have begun.

@@ -1,6 +1,6 @@
 // kovanet conflict: whether an address is somebody else's already.
+#include "composition.h"
 #include "errors.h"
-#include "interfaces.h"
 #include "objects.h"
 
 #include <cstdio>
@@ -48,11 +48,7 @@ void check_address(const conflict_words &words, bool as_json) {
 
 /** The members of a bond but for the first, from which it has its address. Ends the program for what is no bond. */
 std::vector<std::string> later_members_of(const std::string &bond) {
-    KOVALINKAGGROPT record{};
-    clear_error();
-    if (KOVANetLinkAggrGet(bond.c_str(), &record) != 0) {
-        call_failed("cannot read bond " + bond);
-    }
+    const KOVALINKAGGROPT record = find_bond(bond).value_or(KOVALINKAGGROPT{});
     if (record.cSlaves == 0) {
         throw failure{kNotFound, bond + " is no bond with members; see kovanet bond list"};
     }

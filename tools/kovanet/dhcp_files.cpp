@@ -1,5 +1,7 @@
 #include "dhcp_files.h"
 
+#include "stored.h"
+
 #include <charconv>
 #include <filesystem>
 #include <fstream>
@@ -14,19 +16,6 @@ constexpr char kSubnet[] = "-subnet";
 
 const char *prefix_of(family type) {
     return type == kIPv4 ? "dhcpd-" : "dhcpd6-";
-}
-
-std::vector<std::string> file_names() {
-    std::vector<std::string> names;
-    std::error_code error;
-    std::filesystem::directory_iterator entry{kFolder, error};
-    for (; !error && entry != std::filesystem::directory_iterator{}; entry.increment(error)) {
-        names.push_back(entry->path().filename());
-    }
-    if (error && error != std::errc::no_such_file_or_directory) {
-        throw failure{kCallFailed, std::string("cannot read ") + kFolder + ": " + error.message()};
-    }
-    return names;
 }
 
 /** What stands between the family's prefix and an ending. */
@@ -65,7 +54,7 @@ std::optional<served_family> switch_of(const std::string &name) {
 
 std::vector<subnet_id> subnets_there() {
     std::set<subnet_id> found;
-    for (const std::string &name : file_names()) {
+    for (const std::string &name : names_in(kFolder)) {
         if (const std::optional<subnet_id> subnet = subnet_of(name, ".conf")) {
             found.insert(*subnet);
         }
@@ -78,7 +67,7 @@ std::vector<served_family> families_there() {
     for (const subnet_id &subnet : subnets_there()) {
         found.insert({subnet.ifname, subnet.type});
     }
-    for (const std::string &name : file_names()) {
+    for (const std::string &name : names_in(kFolder)) {
         if (const std::optional<served_family> served = switch_of(name)) {
             found.insert(*served);
         }
@@ -100,6 +89,10 @@ std::vector<std::string> lines_of(const subnet_id &subnet) {
         }
     }
     return lines;
+}
+
+std::string switch_file_of(const served_family &served) {
+    return std::string(kFolder) + "/" + prefix_of(served.type) + served.ifname + ".info";
 }
 
 std::string value_behind(const std::vector<std::string> &lines, const std::string &option) {

@@ -31,6 +31,8 @@ struct served_family {
 std::vector<subnet_id> subnets_there();
 /** What has a switch or a subnet, sorted. */
 std::vector<served_family> families_there();
+/** The file with the switch of an interface. */
+std::string switch_file_of(const served_family &served);
 
 /** The name of a subnet's files, without folder and ending. */
 std::string fragment_of(const subnet_id &subnet);

@@ -4,6 +4,7 @@
 #include "dhcp_files.h"
 #include "records.h"
 #include "rules.h"
+#include "stored.h"
 #include "words.h"
 
 #include <algorithm>
@@ -37,13 +38,18 @@ constexpr column kSwitches[] = {
     {"pxe", [](const json &row) { return std::string(row.at("pxe") == true ? "on" : "off"); }},
 };
 
+bool is_enabled(const served_family &served) {
+    require_readable(switch_file_of(served));
+    return DHCPInterfaceIsEnabled(served.ifname.c_str(), served.type) == 1;
+}
+
 json served_rows() {
     const std::vector<subnet_id> subnets = subnets_there();
     json rows = json::array();
     for (const served_family &served : families_there()) {
         rows.push_back({{"interface", served.ifname},
                         {"family", number_of(served.type)},
-                        {"enabled", DHCPInterfaceIsEnabled(served.ifname.c_str(), served.type) == 1},
+                        {"enabled", is_enabled(served)},
                         {"subnets", std::count_if(subnets.begin(), subnets.end(), [&served](const subnet_id &subnet) {
                              return subnet.ifname == served.ifname && subnet.type == served.type;
                          })}});
@@ -173,8 +179,13 @@ CLI::App &add_switch(CLI::App &object, const char *name, const char *description
 } // namespace
 
 json dhcp_server_record() {
+    require_readable("/etc/dhcpd/dhcpd.info");
+    require_readable("/etc/dhcpd/dhcpd-pxe-setting");
     DHCP_PXE_CONF pxe{};
-    DHCPPXEConfGetEnable(&pxe);
+    clear_error();
+    if (DHCPPXEConfGetEnable(&pxe) < 0) {
+        call_failed("cannot ask whether network boot is served");
+    }
     return {{"service", DHCPIsEnabled() == 1}, {"pxe", pxe.enabled == 1}, {"interfaces", served_rows()}};
 }
 

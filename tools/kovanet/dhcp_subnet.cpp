@@ -1,9 +1,10 @@
 #include "dhcp_subnet.h"
 
 #include "rules.h"
+#include "words.h"
 
 #include <algorithm>
-#include <charconv>
+#include <climits>
 
 namespace kova {
 namespace {
@@ -96,11 +97,7 @@ void write_subnet(subnet &one) {
 subnet_id subnet_words::id() const {
     require("interface name \"" + ifname + "\"", refuse_interface_name(ifname));
     subnet_id id{ifname, family_word == "6" ? kIPv6 : kIPv4};
-    const char *const end = number.data() + number.size();
-    const auto [stop, error] = std::from_chars(number.data(), end, id.number);
-    if (error != std::errc{} || stop != end) {
-        throw failure{kNo, "\"" + number + "\" is not valid: a subnet has a number from 0 to 4294967295"};
-    }
+    id.number = static_cast<unsigned>(number_within("subnet number", number, 0, UINT_MAX));
     return id;
 }
 

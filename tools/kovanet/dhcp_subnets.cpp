@@ -5,7 +5,7 @@
 
 #include <algorithm>
 #include <arpa/inet.h>
-#include <charconv>
+#include <climits>
 #include <cstring>
 #include <kovanetsdk/addr.h>
 #include <map>
@@ -145,13 +145,7 @@ given_keys sorted_keys(const std::vector<std::string> &words, family type) {
 
 int lease_of(const std::string &text) {
     constexpr int kShortest = 120; // what the server makes of less
-    int seconds = 0;
-    const char *const end = text.data() + text.size();
-    const auto [stop, error] = std::from_chars(text.data(), end, seconds);
-    if (error != std::errc{} || stop != end || seconds < kShortest) {
-        throw failure{kNo, "lease \"" + text + "\" is not valid: it is a number of seconds from 120 to 2147483647"};
-    }
-    return seconds;
+    return static_cast<int>(number_within("lease", text, kShortest, INT_MAX));
 }
 
 /** An address as bytes in order, IPv4 in four of them. */
@@ -378,7 +372,7 @@ void add_subnet_verbs(CLI::App &object, const global_options &options) {
     constexpr char kKeys[] =
         "IPv4: range START END, mask MASK, router ADDRESS, domain NAME, dns ADDRESS..., lease SECONDS; "
         "IPv6: mode ra-only|ra-stateless|stateful, range START END, dns ADDRESS..., lease SECONDS";
-    change.add_option("KEYS", words.keys, kKeys);
+    add_words(change, "KEYS", words.keys, kKeys);
     change.add_flag("--force", words.force, "also when it overlaps a subnet of another interface");
     change.callback([&words] { set(words); });
 

@@ -2,6 +2,7 @@
 #include "dhcp_options.h"
 #include "dhcp_subnet.h"
 #include "lists.h"
+#include "words.h"
 
 #include <cstdlib>
 
@@ -10,8 +11,7 @@ namespace {
 
 struct option_words : subnet_words {
     std::string name;
-    std::string value; // apart from the others: in an option with several words, "[a]" would be a list
-    std::vector<std::string> more;
+    std::vector<std::string> values;
 };
 
 json rows_of(const subnet &one) {
@@ -97,9 +97,7 @@ std::string line_of(const subnet_id &id, const option_kind &kind, const std::vec
 void set(const option_words &words) {
     const subnet_id id = words.id();
     const option_kind &kind = require_option(words.name);
-    std::vector<std::string> values = {words.value};
-    values.insert(values.end(), words.more.begin(), words.more.end());
-    values = require_values(kind, values);
+    const std::vector<std::string> values = require_values(kind, words.values);
     require(std::string("option ") + kind.name, refuse_server_line(line_of(id, kind, values)));
     change_server([&] {
         subnet one = require_subnet(id);
@@ -134,8 +132,9 @@ void add_option_verbs(CLI::App &object, const global_options &options) {
     CLI::App &change = add_change(all, "set", "set an option, in place of the one there was");
     add_subnet_words(change, words);
     change.add_option("NAME", words.name, "name or number of the option")->required();
-    change.add_option("VALUE", words.value, "as the option takes it; a refused one is told what that is")->required();
-    change.add_option("MORE", words.more, "further values of a list");
+    add_words(change, "VALUE", words.values,
+              "as the option takes it, or several of a list; a refused one is told what that is")
+        .required();
     change.callback([&words] { set(words); });
 
     CLI::App &gone = add_change(all, "del", "hand an option out no more");

@@ -5,6 +5,7 @@
 #include "objects.h"
 #include "records.h"
 #include "rules.h"
+#include "stored.h"
 #include "words.h"
 
 #include <kova/core.h>
@@ -75,7 +76,7 @@ struct dns_words {
 } // namespace
 
 json dns_record() {
-    const bool is_static = KLIBCFileCheckKeyValue("/etc/kovainfo.conf", "dns_mode", "static", 0) == 1;
+    const bool is_static = stored_value("/etc/kovainfo.conf", "dns_mode") == "static";
     json record;
     record["mode"] = is_static ? "static" : "auto";
     record["servers"] = servers_of(KOVANetDNSListGet, "servers in use");
@@ -90,7 +91,7 @@ void add_dns(CLI::App &object, const global_options &options) {
     });
 
     CLI::App &change = *object.add_subcommand("set", "configure servers and use them (mode static)");
-    change.add_option("ADDRESS", words.servers, "IPv4 or IPv6 addresses, asked in this order")->required();
+    add_words(change, "ADDRESS", words.servers, "IPv4 or IPv6 addresses, asked in this order").required();
     change.callback([&words] { set(words.servers); });
 
     CLI::App &mode = *object.add_subcommand("mode", "use the configured servers, or those the network tells");

@@ -87,10 +87,12 @@ void change(const std::string &interface, const std::string &gateway) {
     announced_change announced{interface, gateway};
     clear_error();
     if (KOVANetDefaultGatewaySet(gateway.c_str()) < 0) {
-        call_failed("cannot set the default gateway to " + gateway);
+        call_failed(gateway.empty() ? "cannot remove the default gateway"
+                                    : "cannot set the default gateway to " + gateway);
     }
     if (KOVANetDefaultGatewaySetConf(gateway.c_str()) < 0) {
-        call_failed("cannot store the default gateway in /etc/sysconfig/network");
+        call_failed(gateway.empty() ? "cannot remove the configured gateway from /etc/sysconfig/network"
+                                    : "cannot store the default gateway in /etc/sysconfig/network");
     }
     announced.done();
 }

@@ -11,4 +11,7 @@ void stop_on_signals();
 /** Whether one of them has come. */
 bool is_interrupted();
 
+/** Sleeps for some seconds, or until told to stop. @return whether it may go on */
+bool sleep_unless_interrupted(double seconds);
+
 } // namespace kova

@@ -60,7 +60,7 @@ void set_state(const std::string &name, bool up) {
 
 void rename(const std::string &old_name, const std::string &new_name) {
     require_root();
-    require("interface name \"" + new_name + "\"", refuse_interface_name(new_name));
+    require("interface name \"" + new_name + "\"", refuse_new_interface_name(new_name));
     const IFINFO info = require_interface(old_name);
     if (find_interface(new_name)) {
         throw failure{kNo, "there is an interface named " + new_name + " already"};

@@ -8,7 +8,6 @@
 #include <linux/rtnetlink.h>
 #include <net/if.h>
 #include <poll.h>
-#include <set>
 #include <sys/socket.h>
 #include <unistd.h>
 
@@ -40,8 +39,14 @@ link_watcher::~link_watcher() {
     close(fd_);
 }
 
-/** Has the kernel tell all interfaces. */
+/** Has the kernel tell all interfaces; it gives one answer after the other. */
 void link_watcher::ask() {
+    if (is_asked_) {
+        is_asked_again_ = true;
+        return;
+    }
+    is_asked_ = true;
+    told_.clear();
     struct {
         nlmsghdr header;
         ifinfomsg body;
@@ -51,6 +56,22 @@ void link_watcher::ask() {
     request.header.nlmsg_flags = NLM_F_REQUEST | NLM_F_DUMP;
     if (send(fd_, &request, sizeof request, 0) < 0) {
         kernel_failed("ask for");
+    }
+}
+
+/** What is not in the answer is not there any more. */
+void link_watcher::end_answer(std::vector<link_change> &changes) {
+    is_asked_ = false;
+    if (is_asked_again_) { // some of what was told meanwhile is lost
+        is_asked_again_ = false;
+        ask();
+        return;
+    }
+    const std::map<int, state> before = known_;
+    for (const auto &[index, now] : before) {
+        if (!told_.contains(index)) {
+            forget(index, changes);
+        }
     }
 }
 
@@ -69,17 +90,24 @@ bool link_watcher::receive(int flags, std::vector<link_change> &changes) {
         return false;
     }
     auto left = static_cast<size_t>(size);
-    bool has_more = true;
     for (auto *header = reinterpret_cast<nlmsghdr *>(buffer); NLMSG_OK(header, left);
          header = NLMSG_NEXT(header, left)) {
-        has_more = has_more && header->nlmsg_type != NLMSG_DONE;
-        take(header, header->nlmsg_len, changes);
+        is_asked_again_ = is_asked_again_ || (header->nlmsg_flags & NLM_F_DUMP_INTR) != 0;
+        if (header->nlmsg_type == NLMSG_DONE) {
+            end_answer(changes);
+        } else {
+            take(header, header->nlmsg_len, changes);
+        }
     }
-    return has_more;
+    return is_asked_;
 }
 
 void link_watcher::take(const void *message, size_t size, std::vector<link_change> &changes) {
     const auto *const header = static_cast<const nlmsghdr *>(message);
+    if (header->nlmsg_type == NLMSG_ERROR && size >= NLMSG_LENGTH(sizeof(nlmsgerr))) {
+        errno = -static_cast<const nlmsgerr *>(NLMSG_DATA(header))->error;
+        kernel_failed("ask for");
+    }
     if ((header->nlmsg_type != RTM_NEWLINK && header->nlmsg_type != RTM_DELLINK) ||
         size < NLMSG_LENGTH(sizeof(ifinfomsg))) {
         return;
@@ -89,9 +117,11 @@ void link_watcher::take(const void *message, size_t size, std::vector<link_chang
         return;
     }
     if (header->nlmsg_type == RTM_DELLINK) {
+        told_.erase(body->ifi_index);
         forget(body->ifi_index, changes);
         return;
     }
+    told_.insert(body->ifi_index);
     auto left = IFLA_PAYLOAD(header);
     for (const auto *attribute = IFLA_RTA(body); RTA_OK(attribute, left); attribute = RTA_NEXT(attribute, left)) {
         if (attribute->rta_type == IFLA_IFNAME) {

@@ -5,6 +5,7 @@
 #pragma once
 
 #include <map>
+#include <set>
 #include <string>
 #include <vector>
 
@@ -41,6 +42,7 @@ private:
     };
 
     void ask();
+    void end_answer(std::vector<link_change> &changes);
     bool receive(int flags, std::vector<link_change> &changes);
     void take(const void *message, size_t size, std::vector<link_change> &changes);
     void follow(int index, const state &now, std::vector<link_change> &changes);
@@ -48,6 +50,9 @@ private:
 
     int fd_;
     std::map<int, state> known_; // by the kernel's number
+    std::set<int> told_;         // since the kernel was asked
+    bool is_asked_ = false;      // and the end of its answer has not come
+    bool is_asked_again_ = false;
 };
 
 } // namespace kova

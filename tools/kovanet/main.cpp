@@ -9,6 +9,8 @@
 #include <algorithm>
 #include <cstdio>
 #include <cstring>
+#include <exception>
+#include <new>
 #include <string>
 #include <syslog.h>
 #include <vector>
@@ -301,6 +303,11 @@ const CLI::App &last_command(const CLI::App &app) {
     return *command;
 }
 
+/** Whether a word too many may be a password. */
+bool takes_password(const CLI::App &command) {
+    return command.get_option_no_throw("--password-file") != nullptr;
+}
+
 /** What an unknown option may have been meant to be. */
 std::string suggested_option(const std::string &word, const CLI::App &command) {
     std::vector<std::string> known;
@@ -322,7 +329,8 @@ std::string usage_complaint(const CLI::ParseError &error, const CLI::App &app) {
         }
     }
     if (error.get_exit_code() == static_cast<int>(CLI::ExitCodes::ExtrasError)) {
-        return "\"" + app.remaining(true).front() + "\" is one word too many";
+        return takes_password(last_command(app)) ? "there are too many words"
+                                                 : "\"" + app.remaining(true).front() + "\" is one word too many";
     }
     if (error.get_name() == "RequiredError" && text.find("subcommand") != std::string::npos) {
         return "the command is not complete";
@@ -356,11 +364,8 @@ int complete(CLI::App &app, int argc, char **argv) {
     return kDone;
 }
 
-int run(int argc, char **argv) {
-    CLI::App app{"Shows and changes the network configuration of the appliance.", "kovanet"};
-    if (argc > 1 && strcmp(argv[1], "--complete") == 0) {
-        return complete(app, argc - 1, argv + 1);
-    }
+/** Does what the command line says. @return the exit code of one that is understood */
+exit_code obey(CLI::App &app, int argc, char **argv) {
     global_options options;
     const command_words words = first_words(argc, argv);
     try {
@@ -372,21 +377,41 @@ int run(int argc, char **argv) {
             }
         });
         app.parse(argc, argv);
-        flush_output();
-        return kDone;
     } catch (const CLI::CallForVersion &) {
         puts(kVersion);
-        return kDone;
     } catch (const CLI::CallForHelp &) {
         fputs(app.help().c_str(), stdout);
-        return kDone;
     } catch (const CLI::ParseError &error) {
         complain_of_usage(error, app);
         return kUsage;
+    }
+    flush_output();
+    return kDone;
+}
+
+/** A failure, the more so when its answer is the output, and that is lost. */
+exit_code tell(const failure &failed) {
+    try {
+        flush_output();
+    } catch (const failure &unwritten) {
+        complain(failed.text.empty() ? unwritten.text : failed.text);
+        return failed.text.empty() ? unwritten.code : failed.code;
+    }
+    complain(failed.text);
+    return failed.code;
+}
+
+int run(int argc, char **argv) {
+    try {
+        CLI::App app{"Shows and changes the network configuration of the appliance.", "kovanet"};
+        const bool is_completion = argc > 1 && strcmp(argv[1], "--complete") == 0;
+        return is_completion ? complete(app, argc - 1, argv + 1) : obey(app, argc, argv);
     } catch (const failure &failed) {
-        fflush(stdout);
-        complain(failed.text);
-        return failed.code;
+        return tell(failed);
+    } catch (const std::bad_alloc &) {
+        return tell({kCallFailed, "not enough memory"});
+    } catch (const std::exception &error) {
+        return tell({kCallFailed, std::string("cannot go on: ") + error.what()});
     }
 }
 

@@ -6,8 +6,10 @@
 #include "table.h"
 #include "words.h"
 
+#include <cerrno>
 #include <cmath>
 #include <cstdio>
+#include <cstring>
 #include <ctime>
 #include <fcntl.h>
 #include <sys/stat.h>
@@ -54,13 +56,24 @@ private:
         while (fd_ >= 0 && (size = read(fd_, buffer, sizeof buffer)) > 0) {
             text.append(buffer, static_cast<size_t>(size));
         }
+        if (size < 0 && errno != EINTR) {
+            read_failed();
+        }
         return text;
+    }
+
+    /** Without it, all goes on without events that nobody would miss. */
+    [[noreturn]] void read_failed() const {
+        throw failure{kCallFailed, textf("cannot read the events in %s: %s", path_, strerror(errno))};
     }
 
     bool reopen() {
         close_file();
         fd_ = open(path_, O_RDONLY | O_CLOEXEC | O_NONBLOCK);
         struct stat status {};
+        if (fd_ < 0 && errno != ENOENT) { // there is none before the first event
+            read_failed();
+        }
         if (fd_ >= 0 && fstat(fd_, &status) == 0) {
             inode_ = status.st_ino;
         }
@@ -189,15 +202,17 @@ void tell(const json &record, bool as_json) {
 }
 
 struct monitor_words {
-    unsigned count = 0; /**< what is told before the end, 0 without end */
+    std::optional<std::string> count; /**< what is told before the end */
 };
 
 void monitor(const monitor_words &words, bool as_json) {
+    constexpr int64_t kMost = 1000000000;
+    const int64_t count = words.count ? number_within("--count", *words.count, 1, kMost) : 0;
     stop_on_signals();
     link_watcher links;
     growing_file notes{kNotes};
     note_reader reader;
-    for (unsigned told = 0; !is_interrupted();) {
+    for (int64_t told = 0; !is_interrupted();) {
         std::vector<json> records;
         for (const link_change &change : links.wait(kLookEveryMs)) {
             records.push_back(record_of(change));
@@ -207,7 +222,7 @@ void monitor(const monitor_words &words, bool as_json) {
         }
         for (const json &record : records) {
             tell(record, as_json);
-            if (++told == words.count) {
+            if (++told == count) {
                 return;
             }
         }
@@ -218,9 +233,7 @@ void monitor(const monitor_words &words, bool as_json) {
 
 void add_monitor(CLI::App &object, const global_options &options) {
     auto &words = words_of<monitor_words>();
-    object.add_option("--count", words.count, "end after N changes")
-        ->option_text("N")
-        ->check(number_from(1, 1000000000));
+    object.add_option("--count", words.count, "end after N changes")->option_text("N");
     object.callback([&words, &options] { monitor(words, options.json); });
 }
 

@@ -3,6 +3,7 @@
 #include "confirm.h"
 #include "errors.h"
 #include "objects.h"
+#include "words.h"
 
 #include <cstdio>
 #include <kovanetsdk/routing.h>
@@ -13,10 +14,8 @@ namespace {
 
 /** A number, 0 for what is none or no MTU. */
 int mtu_of(const std::string &text) {
-    constexpr size_t kMostDigits = 5;
-    const bool is_number =
-        !text.empty() && text.size() <= kMostDigits && text.find_first_not_of("0123456789") == std::string::npos;
-    return is_number ? std::stoi(text) : 0;
+    constexpr int64_t kMost = 99999;
+    return static_cast<int>(decimal_in(text, 0, kMost).value_or(0));
 }
 
 std::string configured_mtu(const std::string &name) {

@@ -95,6 +95,7 @@ private:
 };
 
 bool secret_bytes::read_from(int fd, const silent_terminal *terminal) {
+    length_ = 0;
     while (length_ < sizeof bytes_) {
         if (terminal != nullptr && !terminal->is_typed_on()) {
             return false;
@@ -138,12 +139,14 @@ void ask(secret_bytes &secret) {
                                   " FILE or " + kFd + " NUMBER"};
     }
     bool is_read = false;
-    {
-        const silent_terminal terminal{STDIN_FILENO}; // before it asks: what was typed till then is dropped
-        fputs("Password: ", stderr);
-        is_read = secret.read_from(STDIN_FILENO, &terminal);
-    }
-    fputc('\n', stderr);
+    do { // anew when it was stopped and goes on
+        {
+            const silent_terminal terminal{STDIN_FILENO}; // before it asks: what was typed till then is dropped
+            fputs("Password: ", stderr);
+            is_read = secret.read_from(STDIN_FILENO, &terminal);
+        }
+        fputc('\n', stderr);
+    } while (!is_read && caught == SIGTSTP);
     if (!is_read) {
         read_failed("the terminal");
     }
@@ -168,7 +171,6 @@ void add_password(CLI::App &command, password_words &words) {
     auto *file = command.add_option(kFile, words.file, "file whose only line is the password")->type_name("FILE");
     auto *fd = command.add_option(kFd, words.fd, "open descriptor to read that line from; 0 is standard input")
                    ->type_name("NUMBER")
-                   ->check(number_from(0, INT_MAX))
                    ->excludes(file);
     command.add_flag(kKeep, words.is_kept, "leave the stored password as it is")->excludes(file)->excludes(fd);
     command
@@ -184,6 +186,9 @@ void add_password(CLI::App &command, password_words &words) {
 
 void read_password(const password_words &words, char *field, size_t size) {
     if (words.is_kept) {
+        if (*field == '\0') {
+            throw failure{kNo, "no password is kept; give one"};
+        }
         return;
     }
     secret_bytes secret;
@@ -191,10 +196,13 @@ void read_password(const password_words &words, char *field, size_t size) {
         read_file(*words.file, secret);
     } else if (!words.fd) {
         ask(secret);
-    } else if (!secret.read_from(*words.fd)) {
-        read_failed("descriptor " + std::to_string(*words.fd));
+    } else if (!secret.read_from(static_cast<int>(number_within(kFd, *words.fd, 0, INT_MAX)))) {
+        read_failed("descriptor " + *words.fd);
     }
     secret.copy_to(field, size);
+    if (*field == '\0') {
+        throw failure{kNo, "there is no password: it is empty"};
+    }
 }
 
 } // namespace kova

@@ -15,7 +15,7 @@ namespace kova {
 /** Where the command line says that the password is; a terminal is asked when it says nothing. */
 struct password_words {
     std::optional<std::string> file;
-    std::optional<int> fd;
+    std::optional<std::string> fd;
     bool is_kept = false;
 };
 
@@ -23,9 +23,9 @@ struct password_words {
 void add_password(CLI::App &command, password_words &words);
 
 /**
- * Fills a field of a record with the password, one line without its end. Unless the stored one is kept, ends the
- * program when there is none to be had, when it does not fit, or when it holds a control character or is no single
- * line.
+ * Fills a field of a record with the password, one line without its end, or keeps the stored one. Ends the program when
+ * there is none to be had or to be kept, when it is empty or does not fit, or when it holds a control character or is
+ * no single line.
  * @param field  holds the stored password, NUL-terminated; size is its size
  */
 void read_password(const password_words &words, char *field, size_t size);

@@ -22,9 +22,13 @@ constexpr protocol kProtocols[] = {{"tcp", 1}, {"udp", 2}};
 
 struct ports_words {
     std::optional<std::string> protocol;
-    int low = 0;
-    std::optional<int> high;
+    std::optional<std::string> low;
+    std::optional<std::string> high;
 };
+
+int port_of(const std::optional<std::string> &word, int otherwise) {
+    return word ? static_cast<int>(number_within("port", *word, 0, kHighestPort)) : otherwise;
+}
 
 constexpr column kColumns[] = {
     {"PROTOCOL", [](const json &row) { return field(row, "protocol"); }},
@@ -51,14 +55,15 @@ std::vector<int> listening_ports(const protocol &asked, int low, int high) {
 }
 
 void list(const ports_words &words, bool as_json) {
-    const int high = words.high.value_or(kHighestPort);
-    require_order(words.low, high);
+    const int low = port_of(words.low, 0);
+    const int high = port_of(words.high, kHighestPort);
+    require_order(low, high);
     json rows = json::array();
     for (const protocol &each : kProtocols) {
         if (words.protocol && *words.protocol != each.name) {
             continue;
         }
-        for (const int port : listening_ports(each, words.low, high)) {
+        for (const int port : listening_ports(each, low, high)) {
             rows.push_back({{"protocol", each.name}, {"port", port}});
         }
     }
@@ -66,17 +71,18 @@ void list(const ports_words &words, bool as_json) {
 }
 
 void tell_whether_used(const ports_words &words, bool as_json) {
-    const int high = words.high.value_or(words.low);
-    require_order(words.low, high);
+    const int low = port_of(words.low, 0);
+    const int high = port_of(words.high, low);
+    require_order(low, high);
     const auto &asked = *std::find_if(std::begin(kProtocols), std::end(kProtocols),
                                       [&](const protocol &each) { return *words.protocol == each.name; });
-    const bool is_used = KOVANetIsPortRangeUsed(words.low, high, asked.number) == 1;
+    const bool is_used = KOVANetIsPortRangeUsed(low, high, asked.number) == 1;
     if (as_json) {
-        print_json({{"protocol", asked.name}, {"low", words.low}, {"high", high}, {"used", is_used}});
-    } else if (words.low == high) {
+        print_json({{"protocol", asked.name}, {"low", low}, {"high", high}, {"used", is_used}});
+    } else if (low == high) {
         printf("%s port %d is %s\n", asked.name, high, is_used ? "used" : "free");
     } else {
-        printf("%s %s port from %d to %d is used\n", is_used ? "a" : "no", asked.name, words.low, high);
+        printf("%s %s port from %d to %d is used\n", is_used ? "a" : "no", asked.name, low, high);
     }
     if (!is_used) {
         throw failure{kNo, ""}; // the answer is the output
@@ -84,9 +90,8 @@ void tell_whether_used(const ports_words &words, bool as_json) {
 }
 
 void add_range(CLI::App &verb, ports_words &words, bool is_required) {
-    CLI::Option &low = *verb.add_option("LOW", words.low, "lowest port, 0 to 65535");
-    low.required(is_required)->check(number_from(0, kHighestPort));
-    verb.add_option("HIGH", words.high, "highest port")->check(number_from(0, kHighestPort));
+    verb.add_option("LOW", words.low, "lowest port, 0 to 65535")->required(is_required);
+    verb.add_option("HIGH", words.high, "highest port");
 }
 
 } // namespace

@@ -3,6 +3,8 @@
 #include "errors.h"
 #include "objects.h"
 #include "password.h"
+#include "records.h"
+#include "stored.h"
 #include "words.h"
 
 #include <algorithm>
@@ -40,10 +42,9 @@ password_state read_settings(settings &conf) {
 }
 
 json number_or_null(const std::string &text) {
-    constexpr size_t kMostDigits = 5;
-    const bool is_number =
-        !text.empty() && text.size() <= kMostDigits && text.find_first_not_of("0123456789") == std::string::npos;
-    return is_number ? json(std::stoi(text)) : json();
+    constexpr int64_t kMost = 99999;
+    const std::optional<int64_t> number = decimal_in(text, 0, kMost);
+    return number ? json(*number) : json();
 }
 
 constexpr column kSettingsColumns[] = {
@@ -68,12 +69,6 @@ void show(bool as_json) {
     record["mtu"] = number_or_null(conf->szMTU);
     record["default_route"] = conf->blDefaultRoute != 0;
     show_record(record, kSettingsColumns, as_json);
-}
-
-bool is_switched_on() {
-    char value[64] = "";
-    return KLIBCFileGetKeyValue("/etc/kovainfo.conf", "pppoe_enable", value, sizeof value, 0) > 0 &&
-           strcasecmp(value, "yes") == 0;
 }
 
 std::string state_word(const json &row) {
@@ -106,7 +101,7 @@ void status(bool as_json) {
         (void)KOVAPPPoeNetInfoGet(address, sizeof address, mask, sizeof mask); // none while it dials again
     }
     json record;
-    record["enabled"] = is_switched_on();
+    record["enabled"] = is_pppoe_switched_on();
     record["running"] = running == 1;
     record["interface"] = known_text(interface);
     record["address"] = known_text(address);
@@ -132,7 +127,10 @@ std::map<std::string, std::string> sorted_keys(const std::vector<std::string> &w
     std::map<std::string, std::string> values;
     for (auto word = words.begin(); word != words.end(); word += 2) {
         if (std::find(known.begin(), known.end(), *word) == known.end()) {
-            misunderstood("\"" + *word + "\" is neither user, mtu nor default-route" + suggestion(*word, known));
+            const std::string meant = suggestion(*word, known);
+            // what means nothing here may be a password that is better not shown
+            misunderstood((meant.empty() ? "a word" : "\"" + *word + "\"") + " is neither user, mtu nor default-route" +
+                          meant);
         }
         if (word + 1 == words.end()) {
             misunderstood(*word + " lacks a value");
@@ -173,9 +171,6 @@ void require_mtu(const std::string &text) {
 void require_password(const char *password) {
     const std::string text{password};
     const bool is_kept_whole = text.find_first_not_of(" \t") == 0 && text.find_last_not_of(" \t") == text.size() - 1;
-    if (text.empty()) {
-        throw failure{kNo, "there is no password: it is empty, or none is stored"};
-    }
     if (!is_kept_whole) {
         throw failure{kNo, "the password is not valid: it begins or ends with a blank"};
     }
@@ -282,14 +277,18 @@ void stop() {
 
 } // namespace
 
+bool is_pppoe_switched_on() {
+    return strcasecmp(stored_value("/etc/kovainfo.conf", "pppoe_enable").c_str(), "yes") == 0; // as the library does
+}
+
 void add_pppoe(CLI::App &object, const global_options &options) {
     auto &words = words_of<pppoe_words>();
     object.add_subcommand("show", "the settings")->callback([&options] { show(options.json); });
 
     CLI::App &change = *object.add_subcommand("set", "change the settings for the next start");
     change.add_option("IF", words.name, "Ethernet interface to dial on")->required();
-    change.add_option("KEY VALUE", words.keys,
-                      "user NAME, mtu 128 to 1492 (1492 unless set), default-route on|off; what is left out stays");
+    add_words(change, "KEY VALUE", words.keys,
+              "user NAME, mtu 128 to 1492 (1492 unless set), default-route on|off; what is left out stays");
     add_password(change, words.password);
     change.callback([&words] { set(words); });
 

@@ -200,7 +200,7 @@ void add_pppoe_relay(CLI::App &object, const global_options &options) {
     change.add_option("on|off", words.state, "whether its clients are relayed")
         ->required()
         ->check(choice({"on", "off"}));
-    change.add_option("SERVER", words.server, "with on: the interface towards the PPPoE server");
+    change.add_option("IF", words.server, "with on: the interface towards the PPPoE server");
     change.callback([&words] { set(words); });
 
     CLI::App &use = *object.add_subcommand("apply", "start, restart and stop relays as the settings say");

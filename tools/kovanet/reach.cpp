@@ -4,7 +4,6 @@
 #include "table.h"
 #include "words.h"
 
-#include <charconv>
 #include <chrono>
 #include <cstdio>
 #include <kovanetsdk/stats.h>
@@ -19,18 +18,6 @@ struct reach_words {
     std::string timeout = "5";
 };
 
-/** A number of a kind within its limits; ends the program for anything else. */
-int number_within(const char *kind, const std::string &text, int least, int most) {
-    int number = 0;
-    const char *const end = text.data() + text.size();
-    const auto [stop, error] = std::from_chars(text.data(), end, number);
-    if (error != std::errc{} || stop != end || number < least || number > most) {
-        throw failure{kNo,
-                      textf("%s \"%s\" is not valid: it is a number from %d to %d", kind, text.c_str(), least, most)};
-    }
-    return number;
-}
-
 /** Seconds that a call of the library takes, to the millisecond. */
 double seconds_since(std::chrono::steady_clock::time_point start) {
     using std::chrono::milliseconds;
@@ -42,8 +29,8 @@ double seconds_since(std::chrono::steady_clock::time_point start) {
 void tell(const reach_words &words, bool as_json) {
     constexpr int kHighestPort = 65535;
     constexpr int kLongest = 3600;
-    const int port = number_within("port", words.port, 1, kHighestPort);
-    const int timeout = number_within("timeout", words.timeout, 1, kLongest);
+    const auto port = static_cast<int>(number_within("port", words.port, 1, kHighestPort));
+    const auto timeout = static_cast<int>(number_within("timeout", words.timeout, 1, kLongest));
     if (words.host.empty()) {
         throw failure{kNo, "host \"\" is not valid: it is a name or an address"};
     }

@@ -18,6 +18,8 @@ json dhcp_server_record();
 json pppoe_relay_records();
 /** The state in what kovanet tunnel show prints: "up", "connecting" or "down". */
 std::string tunnel_state();
+/** Whether the PPPoE connection is to be there, now and after a start. */
+bool is_pppoe_switched_on();
 /** The rows of kovanet addr list for one interface. */
 json address_rows(const IFINFO &info);
 

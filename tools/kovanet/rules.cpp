@@ -170,6 +170,13 @@ refusal refuse_interface_name(const std::string &name) {
     return std::nullopt;
 }
 
+refusal refuse_new_interface_name(const std::string &name) {
+    if (name.find_first_of("%:") != std::string::npos) {
+        return "an interface is given no name with \"%\" or \":\"";
+    }
+    return refuse_interface_name(name);
+}
+
 refusal refuse_server_text(const std::string &text) {
     if (text.empty()) {
         return "it is empty";

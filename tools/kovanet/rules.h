@@ -27,6 +27,8 @@ refusal refuse_domain(const std::string &name);
 /** A name server: an address of either family. */
 refusal refuse_server(const std::string &address);
 refusal refuse_interface_name(const std::string &name);
+/** What an interface may be called that has another name yet: the kernel would fill in a number for "%d". */
+refusal refuse_new_interface_name(const std::string &name);
 /** A text that becomes a field of a line in the DHCP server's files. */
 refusal refuse_server_text(const std::string &text);
 /** A whole line of those files. */

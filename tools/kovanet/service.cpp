@@ -5,6 +5,7 @@
 #include "words.h"
 
 #include <algorithm>
+#include <climits>
 #include <iterator>
 #include <kova/core.h>
 #include <kovanetsdk/events.h>
@@ -21,7 +22,7 @@ constexpr struct {
 struct service_words {
     std::string changes;
     std::string keyword;
-    int action = 0;
+    std::string action = "0";
 };
 
 /** The bits of names with commas between them; nothing when one is not known. */
@@ -44,9 +45,10 @@ std::string complaint_about(const std::string &changes) {
 
 void notify(const service_words &words) {
     require_root();
+    const auto action = static_cast<int>(number_within("action", words.action, INT_MIN, INT_MAX));
     const step_note note{"telling the services"};
     clear_error();
-    if (KLIBServicePlugin(words.action, flags_of(words.changes).value_or(0)) < 0) {
+    if (KLIBServicePlugin(action, flags_of(words.changes).value_or(0)) < 0) {
         call_failed("cannot tell the services");
     }
     if (KLIBCErrGet() != 0) { // the call goes on after a plug-in that fails, and so does this one

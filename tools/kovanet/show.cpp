@@ -3,8 +3,11 @@
 #include "errors.h"
 #include "objects.h"
 #include "records.h"
+#include "stored.h"
 
+#include <algorithm>
 #include <cstdio>
+#include <fstream>
 #include <functional>
 #include <kova/core.h>
 #include <kovanetsdk/bridge.h>
@@ -25,6 +28,14 @@ struct composition {
     json bond_mode;
 };
 
+/** What a VLAN is on: nothing when that is in another namespace, where the name of one here may be its name. */
+names lower_of(const VLANINFO &vlan) {
+    unsigned lower = 0;
+    std::ifstream{std::string("/sys/class/net/") + vlan.szIfname + "/iflink"} >> lower;
+    const bool is_here = std::string(vlan.szIfname) != vlan.szRowDevice && lower == if_nametoindex(vlan.szRowDevice);
+    return is_here ? names{vlan.szRowDevice} : names{};
+}
+
 composition compose(const IFINFO &info) {
     const std::string name = info.szIfname;
     if ((info.nFlags & IFF_LOOPBACK) != 0) {
@@ -34,7 +45,7 @@ composition compose(const IFINFO &info) {
         return {"point-to-point", {}, {}, {}};
     }
     if (const std::optional<VLANINFO> vlan = find_vlan(name)) {
-        return {"vlan", {vlan->szRowDevice}, vlan->vlanId, {}};
+        return {"vlan", lower_of(*vlan), vlan->vlanId, {}};
     }
     if (const std::optional<KOVALINKAGGROPT> bond = find_bond(name)) {
         const bool is_known = bond->mode != KOVA_LINK_AGGR_UNKNOWN;
@@ -60,7 +71,8 @@ const char *source_word(const std::string &name) {
     }
 }
 
-json describe(const IFINFO &info) {
+/** A row; what the file of the interface cannot tell is null, and its failure is noted. */
+json describe(const IFINFO &info, std::vector<failure> &failures) {
     const composition made = compose(info);
     ETHINFO link{};
     const bool has_settings = KOVANetGetEthInfo(&link, info.szIfname) == 0;
@@ -75,7 +87,12 @@ json describe(const IFINFO &info) {
     row["speed_mbps"] = known_number(has_settings ? link.nSpeed : -1, 1);
     row["mtu"] = known_number(KOVAGetMTU(info.szIfname), 1);
     row["mac"] = mac_text(info.abMac);
-    row["source"] = source_word(info.szIfname);
+    try {
+        row["source"] = source_word(info.szIfname);
+    } catch (const failure &failed) {
+        row["source"] = nullptr;
+        failures.push_back(failed);
+    }
     row["addresses"] = json::array();
     for (const json &address : address_rows(info)) {
         row["addresses"].push_back(
@@ -84,16 +101,12 @@ json describe(const IFINFO &info) {
     return row;
 }
 
-json interface_records() {
+json interface_records(std::vector<failure> &failures) {
     json rows = json::array();
     for (const IFINFO &info : all_interfaces()) {
-        rows.push_back(describe(info));
+        rows.push_back(describe(info, failures));
     }
     return rows;
-}
-
-bool is_switched_on(const char *file, const char *key) {
-    return KLIBCFileCheckKeyValue(file, key, "yes", 0) == 1;
 }
 
 json service_records() {
@@ -106,8 +119,8 @@ json service_records() {
     }
     return {{"dhcp_server", server["service"]},
             {"dhcp_server_interfaces", served},
-            {"pppoe", is_switched_on("/etc/kovainfo.conf", "pppoe_enable")},
-            {"tunnel", is_switched_on("/etc/kova/service/kovatunnel.conf", "run")}};
+            {"pppoe", is_pppoe_switched_on()},
+            {"tunnel", stored_value("/etc/kova/service/kovatunnel.conf", "run") == "yes"}};
 }
 
 /** What can be told; a part that cannot be read is null, and its failure is told at the end. */
@@ -131,7 +144,7 @@ overview look() {
     all.add("gateway", gateway_record);
     all.add("dns", dns_record);
     all.add("services", service_records);
-    all.add("interfaces", interface_records);
+    all.add("interfaces", [&all] { return interface_records(all.failures); });
     return all;
 }
 
@@ -213,14 +226,23 @@ public:
                 add(row, "", "");
             }
         }
+        for (const json &row : interfaces) { // whatever is said of their parts, none is left out
+            if (row["kind"] != "loopback" && !added_.contains(row["name"])) {
+                add(row, "", "");
+            }
+        }
     }
     [[nodiscard]] const json &rows() const { return rows_; }
 
 private:
     void add(json row, const std::string &branch, const std::string &below) {
+        const std::string name = row["name"];
+        added_.insert(name);
+        path_.push_back(name);
         names parts;
         for (const std::string part : row["parts"]) {
-            if (by_name_.contains(part)) { // not in another namespace
+            const bool is_above = std::find(path_.begin(), path_.end(), part) != path_.end();
+            if (by_name_.contains(part) && !is_above) { // neither in another namespace nor without an end
                 parts.push_back(part);
             }
         }
@@ -230,9 +252,12 @@ private:
             const bool is_last = i + 1 == parts.size();
             add(by_name_[parts[i]], below + (is_last ? "`-" : "|-"), below + (is_last ? "  " : "| "));
         }
+        path_.pop_back();
     }
 
     std::map<std::string, json> by_name_;
+    std::set<std::string> added_;
+    names path_; // from the root to what is added
     json rows_ = json::array();
 };
 

@@ -6,6 +6,7 @@
 #include "words.h"
 
 #include <algorithm>
+#include <charconv>
 #include <cmath>
 #include <cstdio>
 #include <ctime>
@@ -19,16 +20,6 @@ double now(clockid_t clock) {
     timespec time{};
     clock_gettime(clock, &time);
     return static_cast<double>(time.tv_sec) + static_cast<double>(time.tv_nsec) / 1e9;
-}
-
-/** Sleeps to the end, or to a signal that asks to stop. */
-void wait_until(double monotonic) {
-    timespec end{};
-    double whole = 0;
-    end.tv_nsec = static_cast<long>(modf(monotonic, &whole) * 1e9);
-    end.tv_sec = static_cast<time_t>(whole);
-    while (!is_interrupted() && clock_nanosleep(CLOCK_MONOTONIC, TIMER_ABSTIME, &end, nullptr) == EINTR) {
-    }
 }
 
 const NETSTAT *find(const std::vector<NETSTAT> &stats, const std::string &name) {
@@ -127,27 +118,47 @@ int show_tick(const json &rows, double seconds, int lines_before, bool as_json) 
     return lines;
 }
 
-std::string refuse_seconds(const std::string &text) {
-    double seconds = 0;
-    const bool is_number = CLI::detail::lexical_cast(text, seconds);
-    return is_number && seconds >= 0.1 && seconds <= 86400 ? "" : text + " is no number of seconds from 0.1 to 86400";
-}
-
 struct stats_words {
     std::vector<std::string> names;
-    double seconds = 1;
-    unsigned count = 0; /**< ticks, 0 without end */
+    std::string seconds;              /**< between two ticks, "" for one */
+    std::optional<std::string> count; /**< ticks */
 };
 
+double seconds_of(const std::string &text) {
+    constexpr double kLeast = 0.1;
+    constexpr double kMost = 86400;
+    if (text.empty()) {
+        return 1;
+    }
+    double seconds = 0;
+    const char *const end = text.data() + text.size();
+    const auto [stop, error] = std::from_chars(text.data(), end, seconds, std::chars_format::fixed);
+    if (error != std::errc{} || stop != end || !(seconds >= kLeast && seconds <= kMost)) {
+        throw failure{kNo, "--watch \"" + text + "\" is not valid: it is a number of seconds from 0.1 to 86400"};
+    }
+    return seconds;
+}
+
+int64_t count_of(const std::optional<std::string> &text) {
+    constexpr int64_t kMost = 1000000000;
+    return text ? number_within("--count", *text, 1, kMost) : 0;
+}
+
+/** When the tick after one is due: those that were missed meanwhile are left out. */
+double tick_after(double due, double time, double interval) {
+    return due + interval * (1 + std::max(0.0, std::floor((time - due) / interval)));
+}
+
 void watch(const stats_words &words, bool as_json) {
+    const double interval = seconds_of(words.seconds);
+    const int64_t count = count_of(words.count);
     stop_on_signals();
     std::vector<NETSTAT> before = counters_of(words.names);
     double last = now(CLOCK_MONOTONIC);
-    double next = last + words.seconds;
+    double next = last + interval;
     int lines = 0;
-    for (unsigned tick = 0; words.count == 0 || tick < words.count; ++tick, next += words.seconds) {
-        wait_until(next);
-        if (is_interrupted()) {
+    for (int64_t tick = 0; count == 0 || tick < count; ++tick, next = tick_after(next, last, interval)) {
+        if (!sleep_unless_interrupted(next - now(CLOCK_MONOTONIC))) {
             break;
         }
         std::vector<NETSTAT> after = counters_of(words.names);
@@ -178,15 +189,11 @@ void show(const stats_words &words, bool watched, bool as_json) {
 
 void add_stats(CLI::App &object, const global_options &options) {
     auto &words = words_of<stats_words>();
-    object.add_option("IF", words.names, "interfaces; all when none is named");
+    add_words(object, "IF", words.names, "interfaces; all when none is named");
     auto *watched = object.add_option("--watch", words.seconds, "show rates, anew every SECONDS (1)")
                         ->option_text("[SECONDS]")
-                        ->expected(0, 1)
-                        ->check(refuse_seconds);
-    object.add_option("--count", words.count, "end after N times")
-        ->option_text("N")
-        ->check(number_from(1, 1000000000))
-        ->needs(watched);
+                        ->expected(0, 1);
+    object.add_option("--count", words.count, "end after N times")->option_text("N")->needs(watched);
     object.callback([&words, watched, &options] { show(words, watched->count() > 0, options.json); });
 }
 

@@ -58,6 +58,27 @@ void put_line(const std::vector<std::string> &cells, const std::vector<size_t> &
     putchar('\n');
 }
 
+/** Bytes of the UTF-8 character at a place, 1 as well for a byte that begins none. */
+size_t character_length(const std::string &text, size_t at) {
+    const auto first = static_cast<unsigned char>(text[at]);
+    const size_t length = first >= 0xf0 ? 4 : first >= 0xe0 ? 3 : first >= 0xc2 ? 2 : 1;
+    for (size_t i = at + 1; i < at + length; ++i) {
+        if (i >= text.size() || (static_cast<unsigned char>(text[i]) & 0xc0) != 0x80) {
+            return 1;
+        }
+    }
+    return length;
+}
+
+/** Whether a terminal may take a character for a command: also those that a byte above 127 alone may be. */
+bool is_control(const std::string &text, size_t at, size_t length) {
+    const auto first = static_cast<unsigned char>(text[at]);
+    if (length == 1) {
+        return first < 0x20 || first > 0x7e;
+    }
+    return first == 0xc2 && static_cast<unsigned char>(text[at + 1]) < 0xa0;
+}
+
 } // namespace
 
 std::string field(const json &row, const char *key) {
@@ -141,8 +162,14 @@ void show_record(const json &record, std::span<const column> columns, bool as_js
 }
 
 std::string printable(std::string text) {
-    std::replace_if(
-        text.begin(), text.end(), [](unsigned char character) { return character < 32 || character == 127; }, '?');
+    for (size_t at = 0; at < text.size(); ++at) {
+        const size_t length = character_length(text, at);
+        if (is_control(text, at, length)) {
+            text.replace(at, length, "?");
+        } else {
+            at += length - 1;
+        }
+    }
     return text;
 }
 

@@ -31,8 +31,8 @@ std::optional<TOPOLOGYINFO> find_topology(int number) {
     constexpr int kUntouched = -1;
     TOPOLOGYINFO info{};
     info.nTopology = number == KLIB_TOPOLOGY_UNKNOWN ? kUntouched : number;
-    const bool is_described = KLIBNetTopologyGet(&info) == info.nTopology;
-    return is_described ? std::optional{info} : std::nullopt;
+    const int found = KLIBNetTopologyGet(&info);
+    return found == info.nTopology ? std::optional{info} : std::nullopt;
 }
 
 /** The interfaces and the part that each has. */

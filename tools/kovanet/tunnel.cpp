@@ -44,12 +44,10 @@ bool read_account(TUNNEL_CONF &conf) {
 /** The interface's addresses that reach beyond the link. */
 json addresses() {
     constexpr unsigned kLinkLocal = 0x20;
-    KOVAV6IP all[16];
-    const int number = KOVALnxV6IPGet(kInterface, all, std::size(all));
     json found = json::array();
-    for (int i = 0; i < std::min<int>(number, std::size(all)); ++i) {
-        if (all[i].nScope != kLinkLocal) {
-            found.push_back(all[i].szIP + ("/" + std::to_string(all[i].nPrefixLength)));
+    for (const KOVAV6IP &address : ipv6_addresses(kInterface)) {
+        if (address.nScope != kLinkLocal) {
+            found.push_back(address.szIP + ("/" + std::to_string(address.nPrefixLength)));
         }
     }
     return found;

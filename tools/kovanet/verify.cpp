@@ -75,18 +75,8 @@ void comparison::add(const std::string &file, const std::string &key, const std:
     }
 }
 
-std::string value_of(const std::string &file, const std::string &key) {
-    char value[1024] = "";
-    clear_error();
-    if (KLIBCFileExist(file.c_str()) == 1 &&
-        KLIBCFileGetKeyValue(file.c_str(), key.c_str(), value, sizeof value, 0) < 0) {
-        call_failed("cannot read " + key + " of " + file);
-    }
-    return value;
-}
-
 bool is_yes(const std::string &file, const std::string &key) {
-    return value_of(file, key) == "yes";
+    return stored_value(file, key) == "yes";
 }
 
 bool job_runs(const std::string &job_and_keys) {

@@ -5,6 +5,7 @@
 #pragma once
 
 #include "interfaces.h"
+#include "stored.h"
 
 #include <string>
 #include <vector>
@@ -24,8 +25,6 @@ private:
     json differences_ = json::array();
 };
 
-/** The value of a key, "" without it or without the file. Ends the program when it cannot be read. */
-std::string value_of(const std::string &file, const std::string &key);
 bool is_yes(const std::string &file, const std::string &key);
 /** How a switch is compared, however its file spells it. */
 inline const char *yes_or_no(bool is_on) {

@@ -82,7 +82,7 @@ public:
     }
 
 private:
-    [[nodiscard]] std::string wanted(const std::string &key) const { return value_of(file_, key); }
+    [[nodiscard]] std::string wanted(const std::string &key) const { return stored_value(file_, key); }
     void add(const std::string &key, const std::string &is_wanted, const std::string &actual) {
         result_.add(file_, key, is_wanted, actual);
     }
@@ -137,7 +137,7 @@ private:
 
     void compare_mtu() {
         const std::string key = name_ + "_mtu";
-        if (const std::string mtu = value_of(kKovaInfo, key); !mtu.empty()) {
+        if (const std::string mtu = stored_value(kKovaInfo, key); !mtu.empty()) {
             const int present = KOVAGetMTUSetting(name_.c_str());
             result_.add(kKovaInfo, key, mtu, present > 0 ? std::to_string(present) : "");
         }
@@ -166,11 +166,11 @@ private:
     /** As long as there is no lease the client asks, and an earlier address may stay. */
     void compare_lease() {
         const std::string lease = "/etc/dhclient/ipv4/dhcpcd-" + name_ + ".info";
-        const std::string leased = is_yes(lease, "OFFER") ? "" : value_of(lease, "IPADDR");
+        const std::string leased = is_yes(lease, "OFFER") ? "" : stored_value(lease, "IPADDR");
         add("BOOTPROTO", "dhcp", job_runs("dhcp-client,IFACE=" + name_) ? "dhcp" : "no client");
         if (!leased.empty()) {
             result_.add(lease, "IPADDR", leased, info_.szIP);
-            result_.add(lease, "NETMASK", value_of(lease, "NETMASK"), *info_.szIP != '\0' ? info_.szMask : "");
+            result_.add(lease, "NETMASK", stored_value(lease, "NETMASK"), *info_.szIP != '\0' ? info_.szMask : "");
         }
     }
 
@@ -186,18 +186,14 @@ private:
 std::vector<std::string> configured_interfaces() {
     constexpr std::string_view kPrefix = "ifcfg-";
     std::vector<std::string> all;
-    std::error_code failed;
-    for (const auto &entry : std::filesystem::directory_iterator(kScripts, failed)) {
-        const std::string file = entry.path().filename();
+    for (const std::string &file : names_in(kScripts)) {
         const std::string name = file.starts_with(kPrefix) ? file.substr(kPrefix.size()) : "";
         const bool is_copy = name.find(".tmp") != std::string::npos || name.ends_with(".saved") ||
                              name.ends_with(".bak") || name.ends_with('~');
-        if (!name.empty() && !is_copy && !refuse_interface_name(name) && is_yes(entry.path(), "ONBOOT")) {
+        if (!name.empty() && !is_copy && !refuse_interface_name(name) &&
+            is_yes(interface_comparison::file_of(name), "ONBOOT")) {
             all.push_back(name);
         }
-    }
-    if (failed) {
-        throw failure{kCallFailed, std::string("cannot read ") + kScripts + ": " + failed.message()};
     }
     std::sort(all.begin(), all.end());
     return all;

@@ -69,7 +69,8 @@ public:
         }
         compare_advertisements(mode);
         if (mode == "static") {
-            const std::string address = wanted("IPV6ADDR") + "/" + wanted("IPV6PREFIXLENG");
+            const std::string address =
+                wanted("IPV6ADDR").empty() ? "" : wanted("IPV6ADDR") + "/" + wanted("IPV6PREFIXLENG");
             add("IPV6ADDR", address, like(address, ipv6_addresses(), is_same_prefix));
             if (const std::string router = wanted("IPV6_DEFAULTGW"); !router.empty()) {
                 add("IPV6_DEFAULTGW", router, like(router, ipv6_routers(name_), is_same_ipv6));
@@ -78,7 +79,7 @@ public:
     }
 
 private:
-    [[nodiscard]] std::string wanted(const std::string &key) const { return value_of(file_, key); }
+    [[nodiscard]] std::string wanted(const std::string &key) const { return stored_value(file_, key); }
     void add(const std::string &key, const std::string &is_wanted, const std::string &actual) {
         result_.add(file_, key, is_wanted, actual);
     }

@@ -33,7 +33,7 @@ std::string session_device() {
 }
 
 void compare_pppoe(comparison &result) {
-    const bool is_wanted = strcasecmp(value_of(kKovaInfo, "pppoe_enable").c_str(), "yes") == 0;
+    const bool is_wanted = strcasecmp(stored_value(kKovaInfo, "pppoe_enable").c_str(), "yes") == 0;
     const bool has_client = KLIBCPs("pppoe-connect", nullptr, 0, 0) > 0;
     const bool is_connected = has_client && !pppoe_interface().empty();
     if (!is_wanted) {
@@ -43,7 +43,7 @@ void compare_pppoe(comparison &result) {
     const char *const unconnected = has_client ? "dialling" : "no client";
     result.add(kKovaInfo, "pppoe_enable", "yes", is_connected ? "yes" : unconnected);
     if (is_connected) {
-        result.add(kPppoe, "ETH", value_of(kPppoe, "ETH"), session_device());
+        result.add(kPppoe, "ETH", stored_value(kPppoe, "ETH"), session_device());
     }
 }
 
@@ -96,15 +96,15 @@ std::string running_tunnel() {
 }
 
 void compare_run_keys(comparison &result) {
-    std::error_code failed;
-    for (const auto &entry : std::filesystem::directory_iterator(kRunKeys, failed)) {
-        const std::string service = entry.path().stem();
+    for (const std::string &file : names_in(kRunKeys)) {
+        const std::filesystem::path path = std::filesystem::path{kRunKeys} / file;
+        const std::string service = path.stem();
         int run = KLIB_SERVICE_DO_NOT_RUN;
         const bool is_tunnel = service == kTunnel;
         const bool has_state = is_tunnel || KLIBCFileExist(("/usr/kova/service/" + service).c_str()) == 1;
-        if (entry.path().extension() == ".conf" && has_state && KLIBServicecfgRunKeyGet(service.c_str(), &run) == 0) {
+        if (path.extension() == ".conf" && has_state && KLIBServicecfgRunKeyGet(service.c_str(), &run) == 0) {
             const bool is_running = !is_tunnel && KLIBServiceIsRunning(service.c_str()) == 1;
-            result.add(entry.path(), "run", yes_or_no(run == KLIB_SERVICE_RUN),
+            result.add(path, "run", yes_or_no(run == KLIB_SERVICE_RUN),
                        is_tunnel ? running_tunnel() : yes_or_no(is_running));
         }
     }

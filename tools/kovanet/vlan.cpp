@@ -73,14 +73,8 @@ struct vlan_words {
 };
 
 int id_of(const std::string &text) {
-    constexpr size_t kMostDigits = 4;
-    const bool is_number =
-        !text.empty() && text.size() <= kMostDigits && text.find_first_not_of("0123456789") == std::string::npos;
-    const int id = is_number ? std::stoi(text) : 0;
-    if (KLIBNetVlanValidId(id) != 0) {
-        throw failure{kNo, "VLAN id \"" + text + "\" is not valid: it is a number from 1 to 4094"};
-    }
-    return id;
+    constexpr int kHighest = 4094;
+    return static_cast<int>(number_within("VLAN id", text, 1, kHighest));
 }
 
 std::string name_for(const std::string &row_device, int id) {

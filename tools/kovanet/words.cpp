@@ -1,5 +1,7 @@
 #include "words.h"
 
+#include "errors.h"
+
 #include <algorithm>
 #include <charconv>
 #include <numeric>
@@ -42,23 +44,37 @@ CLI::Validator choice(const std::vector<std::string> &names) {
     return {complaint, "{" + CLI::detail::join(names, ",") + "}"};
 }
 
-CLI::Validator number_from(int least, int most) {
-    const std::string limits = "from " + std::to_string(least) + " to " + std::to_string(most);
-    const auto complaint = [least, most, limits](const std::string &word) {
-        int number = 0;
-        const char *const end = word.data() + word.size();
-        const auto [stop, error] = std::from_chars(word.data(), end, number);
-        const bool is_valid = error == std::errc{} && stop == end && number >= least && number <= most;
-        return is_valid ? "" : "\"" + word + "\" is no number " + limits;
-    };
-    return {complaint, "NUMBER"};
-}
-
 CLI::Validator keyword_before(const std::string &word, const std::string &value_name) {
     const auto complaint = [word, value_name](const std::string &given) {
         return given == word ? "" : "\"" + given + "\" is not expected here: write " + word + " " + value_name;
     };
     return {complaint, "{" + word + "}"};
+}
+
+std::optional<int64_t> decimal_in(const std::string &text, int64_t least, int64_t most) {
+    int64_t number = 0;
+    const char *const end = text.data() + text.size();
+    const auto [stop, error] = std::from_chars(text.data(), end, number);
+    const bool is_valid = error == std::errc{} && stop == end && number >= least && number <= most;
+    return is_valid ? std::optional{number} : std::nullopt;
+}
+
+int64_t number_within(const char *kind, const std::string &text, int64_t least, int64_t most) {
+    if (const std::optional<int64_t> number = decimal_in(text, least, most)) {
+        return *number;
+    }
+    throw failure{kNo, std::string(kind) + " \"" + text + "\" is not valid: it is a number from " +
+                           std::to_string(least) + " to " + std::to_string(most)};
+}
+
+CLI::Option &add_words(CLI::App &command, const char *name, std::vector<std::string> &words,
+                       const std::string &description) {
+    constexpr int kAnyNumber = CLI::detail::expected_max_vector_size;
+    // what may be repeated without end is split at brackets, what is expected that often is not; any number is taken
+    return *command.add_option(name, words, description)
+                ->multi_option_policy(CLI::MultiOptionPolicy::TakeAll)
+                ->expected(kAnyNumber, kAnyNumber)
+                ->allow_extra_args(false);
 }
 
 } // namespace kova
