@@ -114,4 +114,4 @@ def test_kovanet_refuses_what_is_no_port_and_no_protocol():
     assert complaint("ports", "used", "tcp", 9, 8, status=NO) == "the lowest port, 9, is above the highest, 8"
     for words in (("used", "tcp", "65536"), ("used", "tcp", "x"), ("used", "tcp", "0x1"), ("list", "tcp", "--", "-1")):
         assert complaint("ports", *words, status=NO) == f'port "{words[-1]}" is not valid: it is a number from 0 to 65535'
-    assert "--help" in complaint("ports", "used", "sctp", "1", status=USAGE)
+    assert complaint("ports", "used", "sctp", "1", status=USAGE) == '"sctp" is none of tcp, udp; did you mean tcp?'
