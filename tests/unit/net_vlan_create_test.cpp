@@ -420,6 +420,10 @@ TEST_F(net_vlan_create, KLIBNetVlanCreate_eachStepFails_stopsThereAndTellsTheRes
     fail_each(steps);
 }
 
+TEST_F(net_vlan_create, KLIBNetVlanCreate_diskThatTakesNothing_leavesTheInterfaceFiles) {
+    disk_that_takes_nothing();
+}
+
 TEST_F(net_vlan_create, KLIBNetVlanCreate_rowFileThatCannotBeReplaced_failsSilently) {
     rig.answer(commands_[0], 0, "", [&] { shell("rm " + ifcfg("eth0") + " && mkdir " + ifcfg("eth0")); });
     EXPECT_OUTCOME(create(), {.result = -1, .commands = {commands_[0]}, .events = events(-1), .locks = locks_});

@@ -298,6 +298,10 @@ TEST_F(net_vlan_remove, KLIBNetVlanRemove_vlanFileThatStays_isNotLookedAt) {
     EXPECT_EQ((texts{"ifcfg-eth0", "ifcfg-eth0.10"}), list_dir("/etc/sysconfig/network-scripts"));
 }
 
+TEST_F(net_vlan_remove, KLIBNetVlanRemove_diskThatTakesNothing_leavesTheInterfaceFiles) {
+    disk_that_takes_nothing();
+}
+
 TEST_F(net_vlan_remove, KLIBNetVlanRemove_rowFileThatCannotBeReplaced_failsSilently) {
     rig.answer(commands_[0], 0, "", [&] { shell("rm " + ifcfg("eth0") + " && mkdir " + ifcfg("eth0")); });
     EXPECT_OUTCOME(remove(), {.result = -1, .commands = {commands_[0]}, .events = events(-1), .locks = locks_});

@@ -148,6 +148,20 @@ protected:
         }
     }
 
+    /** Nothing can be written where the interface files are. */
+    void disk_that_takes_nothing() {
+        const std::string folder = "/etc/sysconfig/network-scripts";
+        shell("cp -a " + folder + " /tmp/scripts && mount -t tmpfs tmpfs " + folder + " && cp -a /tmp/scripts/. " +
+              folder + " && mount -o remount,ro " + folder);
+        const outcome got = change();
+        EXPECT_EQ(-1, got.result);
+        EXPECT_EQ(0x900U, got.code);
+        EXPECT_EQ(texts{}, got.commands);
+        EXPECT_EQ(events(-1), got.events);
+        expect_files(kMtu);
+        shell("umount " + folder + " && rm -r /tmp/scripts");
+    }
+
     // ---- events
 
     void event_that_cannot_be_opened() {
