@@ -189,7 +189,10 @@ def test_a_connection_is_started_told_about_and_stopped(secret, tmp_path, system
         assert shown("pppoe", "status") == {"state": "connected", "interface": "ppp0", "address": record["address"],
                                             "mask": "255.255.255.255"}  # fmt: skip
         wait_for_answer(SERVER)
+        ends = "The PPPoE connection over eth0 ends, and is switched off.\n"
+        assert ends in asked("vlan", "create", "eth0", "10", "dhcp", answer=b"n\n")[1]
         kovanet("pppoe", "stop")
+        assert ends not in asked("vlan", "create", "eth0", "10", "dhcp", answer=b"n\n")[1]
         assert nothing_is_left() and is_enabled() == "no"
         assert shown("pppoe", "status")["state"] == "off"
 
