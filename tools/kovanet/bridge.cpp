@@ -232,6 +232,8 @@ void set(const bridge_words &words) {
     require_possible(words.name, role, wanted.peer);
     confirm(effects_of(words.name, role, wanted), words.is_confirmed);
 
+    const change_lock others;
+    require_possible(words.name, role, wanted.peer); // it may have become wrong while somebody read
     const BRIDGEINFO part = part_of(words.name, role, wanted.peer);
     NETINFO record = record_of(wanted.settings.value_or(ipv4_settings{}));
     record.blLinkUp = 1;                             // brought up at boot
