@@ -5,11 +5,10 @@
 import os
 import pathlib
 import shutil
-import signal
 import socket
 
 import pytest
-from conftest import DhcpServer, kovanet, on_other_side, processes, run, wait_for
+from conftest import DhcpServer, kill, kovanet, on_other_side, processes, run, wait_for
 from test_kovanet import NETWORK, interface_file, kernel_addresses
 from test_tunnel import SECRET, SERVER, LabBroker
 from verify_lab import differences, expect_agreement
@@ -33,6 +32,10 @@ def write_file(name, network):
                                     "NETMASK=255.255.255.0\n")  # fmt: skip
 
 
+def wait_for_resolver():
+    wait_for(lambda: not processes("/usr/kova/lib/resolver-update"), what="the end of the updates in the background")
+
+
 @pytest.fixture(autouse=True)
 def machine(keep):
     """Two cards with a fixed address, as a boot leaves them, and nothing else; so it is again afterwards."""
@@ -43,7 +46,7 @@ def machine(keep):
         on_other_side("ip", "addr", "replace", f"{network}.1/24", "dev", card)
         write_file(card, network)
     run("/etc/rc.network", "start", "eth0", "lan0")
-    wait_for(lambda: not processes("/usr/kova/lib/resolver-update"), 30, "the end of the updates in the background")
+    wait_for_resolver()
     yield
     shutil.rmtree(DHCPD, ignore_errors=True)
     run("/etc/rc.network", "nat-restart-dhcp")
@@ -113,9 +116,9 @@ def test_verify_agrees_behind_a_change(what):
 
 def test_verify_agrees_with_a_lease(dhcp):
     kovanet("card", "set", "lan0", "dhcp")
-    wait_for(lambda: kernel_addresses("lan0") and "10.9.0.7/24" not in kernel_addresses("lan0"), 30, "the lease")
+    wait_for(lambda: kernel_addresses("lan0") not in ([], ["10.9.0.7/24"]), what="the lease")
     expect_agreement()
-    leased = kernel_addresses("lan0")[0].partition("/")[0]
+    [leased] = (address.partition("/")[0] for address in kernel_addresses("lan0"))
     run("ip", "addr", "flush", "dev", "lan0", "scope", "global")
     lease = "/etc/dhclient/ipv4/dhcpcd-lan0.info"
     assert differences() == [(lease, "IPADDR", leased, "none"), (lease, "NETMASK", "255.255.255.0", "none")]
@@ -155,6 +158,7 @@ def test_host_name():
 
 def test_name_servers():
     kovanet("dns", "set", "10.9.0.1", "10.9.0.2")
+    wait_for_resolver()
     RESOLV.write_text("nameserver 10.9.0.2\n")
     assert differences() == [("/etc/resolv.conf.static", "nameserver", "10.9.0.1 10.9.0.2", "10.9.0.2")]
 
@@ -171,9 +175,7 @@ def test_static_routes():
 
 def test_dhcp_client_that_is_not_there():
     kovanet("card", "set", "lan0", "dhcp")
-    for pid in processes("dhclient -4"):
-        os.kill(pid, signal.SIGKILL)
-    wait_for(lambda: not processes("dhclient -4"), what="the client's end")
+    kill(wait_for(lambda: processes("dhclient -4"), what="the client"))
     assert differences() == [("ifcfg-lan0", "BOOTPROTO", "dhcp", "no client")]
 
 
@@ -245,9 +247,7 @@ def test_dhcpv6_client(mode, kind):
 
 def test_dhcp_server_that_died():
     serve(*SUBNET)
-    [pid] = processes("dnsmasq --conf-file=/run/kova/dhcp-server/dnsmasq.conf")
-    os.kill(pid, signal.SIGKILL)
-    wait_for(lambda: not pathlib.Path(f"/proc/{pid}").exists(), what="its end")
+    kill(processes("dnsmasq --conf-file=/run/kova/dhcp-server/dnsmasq.conf"))
     assert differences() == [(f"{DHCPD}/dhcpd.info", "enable", "yes", "no server")]
 
 

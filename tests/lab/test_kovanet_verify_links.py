@@ -2,13 +2,11 @@
 # needs: vlan bonding bridge ppp pppoe
 """kovanet verify behind changes of VLANs, bonds and PPPoE, and when a connection or a relay is not what is stored."""
 
-import os
 import pathlib
 import shutil
-import signal
 
 import pytest
-from conftest import DhcpServer, kovanet, on_other_side, processes, run, wait_for
+from conftest import DhcpServer, kill, kovanet, on_other_side, processes, run, wait_for
 from pppoe_lab import (CONF, KOVAINFO, PASSWORD, RELAY_SETTINGS, SECRETS, USER, PppoeServer, nothing_is_left, relays,
                        write_bridge_files)
 from test_kovanet import NETWORK, interface_file, kernel_addresses
@@ -66,11 +64,6 @@ def test_verify_agrees_with_a_bond_that_takes_over_a_lease(tmp_path):
 # ---- PPPoE ----------------------------------------------------------------------------------------------------------
 
 
-def kill(program):
-    for pid in processes(program):
-        os.kill(pid, signal.SIGKILL)
-
-
 def test_a_connection(tmp_path):
     """With the default route, up, then in every way not what is stored."""
     with PppoeServer(tmp_path):
@@ -92,10 +85,10 @@ def test_a_connection(tmp_path):
         assert differences() == [(str(KOVAINFO), "pppoe_enable", "no", "yes")]
         KOVAINFO.write_text(wanted)
 
-        kill("/usr/sbin/pppd plugin pppoe.so")
+        kill(processes("/usr/sbin/pppd plugin pppoe.so"))
         wait_for(lambda: not pathlib.Path("/sys/class/net/ppp0").exists(), what="the loss")
         assert (str(KOVAINFO), "pppoe_enable", "yes", "dialling") in differences()
-        kill("/usr/sbin/pppoe-connect")
+        kill(processes("/usr/sbin/pppoe-connect"))
         assert (str(KOVAINFO), "pppoe_enable", "yes", "no client") in differences()
         kovanet("pppoe", "stop", timeout=60)
         wait_for(nothing_is_left, what="the end of the connection")
