@@ -367,11 +367,11 @@ def test_the_network_script_leaves_the_switch_as_it_is(partner):
 
 
 def test_the_dhcp_server_goes_along_to_the_port_and_back(tmp_path, started_again):
-    on_other_side("ip", "addr", "flush", "dev", "eth0")
-    run("ip", "addr", "flush", "dev", "ovs_eth0")
+    on_other_side("ip", "-4", "addr", "flush", "dev", "eth0")
+    run("ip", "-4", "addr", "flush", "dev", "ovs_eth0")
     with clean_server("eth0"):
         serve("eth0", "192.168.60")
-        run("ip", "addr", "flush", "dev", "eth0")
+        run("ip", "-4", "addr", "flush", "dev", "eth0")
         run("ip", "addr", "replace", "192.168.60.1/24", "dev", "ovs_eth0")
         assert library.DHCPDConfChangeInterface(b"eth0", b"ovs_eth0") == 0, register()
         assert library.DHCPServerRestart() == 0, register()
